@@ -1,0 +1,85 @@
+#include "device_root.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+
+namespace host {
+
+namespace {
+
+constexpr mode_t kOwnerOnly = 0700;
+
+bool IsSet(const char* text) { return text != nullptr && *text != '\0'; }
+
+void MakeFolders(const std::string& path) {
+    for (size_t end = path.find('/', 1); end != std::string::npos; end = path.find('/', end + 1)) {
+        mkdir(path.substr(0, end).c_str(), kOwnerOnly);
+    }
+    mkdir(path.c_str(), kOwnerOnly);
+}
+
+int Refuse(const std::string& path, const char* why) {
+    fprintf(stderr, "device root %s: %s\n", path.c_str(), why);
+    return -1;
+}
+
+int OpenRoot() {
+    const std::string path = DeviceRootPath();
+    if (path.empty()) {
+        return Refuse("", "neither TPD_DEVICE_ROOT, XDG_STATE_HOME nor HOME names a place for it");
+    }
+    constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
+    int root = open(path.c_str(), kFlags);
+    if (root < 0 && errno == ENOENT) {
+        MakeFolders(path);
+        root = open(path.c_str(), kFlags);
+    }
+    if (root < 0) {
+        return Refuse(path, strerror(errno));
+    }
+    struct stat status = {};
+    const char* why = nullptr;
+    if (fstat(root, &status) != 0) {
+        why = strerror(errno);
+    } else if (status.st_uid != geteuid()) {
+        why = "belongs to another user";
+    } else if ((status.st_mode & 0077) != 0) {
+        why = "is open to other users; its mode must be 0700";
+    }
+    if (why != nullptr) {
+        close(root);
+        return Refuse(path, why);
+    }
+    return root;
+}
+
+}  // namespace
+
+std::string DeviceRootPath() {
+    std::string path;
+    if (const char* const root = getenv("TPD_DEVICE_ROOT"); IsSet(root)) {
+        path = root;
+    } else if (const char* const state = getenv("XDG_STATE_HOME"); IsSet(state)) {
+        path = std::string(state) + "/tpd-device";
+    } else if (const char* const home = getenv("HOME"); IsSet(home)) {
+        path = std::string(home) + "/.local/state/tpd-device";
+    }
+    // A trailing slash would follow a symbolic link in the folder's place.
+    while (path.length() > 1 && path.back() == '/') {
+        path.pop_back();
+    }
+    return path;
+}
+
+int DeviceRoot() {
+    static const int root = OpenRoot();
+    return root;
+}
+
+}  // namespace host

@@ -1,0 +1,17 @@
+// The folder that stands for the device: its properties, its log, its binder driver.
+#pragma once
+
+#include <string>
+
+namespace host {
+
+// Its path: the environment variable TPD_DEVICE_ROOT, else a folder of the user's own state
+// directory.
+std::string DeviceRootPath();
+
+// A descriptor of it for the *at() calls, which the process keeps. The folder is made when it is
+// missing. -1, after one message on standard error, when it cannot be made or is not a folder of
+// this user's own that is closed to everybody else.
+int DeviceRoot();
+
+}  // namespace host

@@ -1,0 +1,35 @@
+// Host stand-in for the platform's binder objects on either side of a call.
+#pragma once
+
+#include <binder/IBinder.h>
+
+namespace android {
+
+// Service side: a binder of this process. Calls from several threads arrive at once.
+class BBinder : public IBinder {
+  public:
+    virtual const String16& getInterfaceDescriptor() const;
+    status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags = 0) final;
+    status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
+                         uint32_t flags = 0) override;
+    status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
+                           uint32_t flags = 0, wp<DeathRecipient>* outRecipient = nullptr) override;
+
+  protected:
+    // Carries one call out. UNKNOWN_TRANSACTION for a code the service does not know.
+    virtual status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply,
+                                uint32_t flags = 0);
+};
+
+// Client side: what a proxy holds its binder with.
+class BpRefBase : public virtual RefBase {
+  protected:
+    explicit BpRefBase(const sp<IBinder>& remote);
+    ~BpRefBase() override;
+    IBinder* remote() const { return mRemote.get(); }
+
+  private:
+    const sp<IBinder> mRemote;
+};
+
+}  // namespace android

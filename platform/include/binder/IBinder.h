@@ -1,0 +1,48 @@
+// Host stand-in for the platform's binder object, local or remote.
+#pragma once
+
+#include <cstdint>
+
+#include <utils/Errors.h>
+#include <utils/RefBase.h>
+#include <utils/String16.h>
+
+namespace android {
+
+class IInterface;
+class Parcel;
+
+class IBinder : public virtual RefBase {
+  public:
+    enum {
+        FIRST_CALL_TRANSACTION = 0x00000001,
+        FLAG_ONEWAY = 0x00000001,
+    };
+
+    class DeathRecipient : public virtual RefBase {
+      public:
+        // Called once, on the thread whose binder call found the owner dead.
+        virtual void binderDied(const wp<IBinder>& who) = 0;
+    };
+
+    // The implementation when it lives in this process, otherwise null.
+    virtual sp<IInterface> queryLocalInterface(const String16& descriptor);
+
+    // Delivers the request and waits for the reply; with FLAG_ONEWAY it does not wait and leaves
+    // the reply empty. Returns 0 or a status, as its owner or the driver gives it.
+    virtual status_t transact(uint32_t code, const Parcel& data, Parcel* reply,
+                              uint32_t flags = 0) = 0;
+
+    // Registers a recipient, of which only a weak reference is kept. DEAD_OBJECT when it is too
+    // late, INVALID_OPERATION on a binder of this process.
+    virtual status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
+                                 uint32_t flags = 0) = 0;
+
+    // Ends one registration with the same arguments. NAME_NOT_FOUND when there is none, DEAD_OBJECT
+    // when the recipients have been told.
+    virtual status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
+                                   uint32_t flags = 0,
+                                   wp<DeathRecipient>* outRecipient = nullptr) = 0;
+};
+
+}  // namespace android

@@ -1,0 +1,31 @@
+// Host stand-in for the platform's service manager.
+#pragma once
+
+#include <binder/IInterface.h>
+
+namespace android {
+
+class IServiceManager : public IInterface {
+  public:
+    enum { DUMP_FLAG_PRIORITY_DEFAULT = 1 << 3 };
+
+    // The service's binder, waiting up to 5 s for it; null when it does not appear. The environment
+    // variable TPD_GET_SERVICE_MS sets another limit in milliseconds.
+    virtual sp<IBinder> getService(const String16& name) const = 0;
+
+    // The service's binder, or null when it is not there now.
+    virtual sp<IBinder> checkService(const String16& name) const = 0;
+
+    // Publishes a binder of this process, in the place of another of that name.
+    virtual status_t addService(const String16& name, const sp<IBinder>& service,
+                                bool allowIsolated = false,
+                                int dumpsysFlags = DUMP_FLAG_PRIORITY_DEFAULT) = 0;
+};
+
+// The process's service manager, null when the device root cannot be used.
+sp<IServiceManager> defaultServiceManager();
+
+// Puts another in its place; for tests.
+void setDefaultServiceManager(const sp<IServiceManager>& manager);
+
+}  // namespace android

@@ -1,0 +1,28 @@
+// Host stand-in for the platform's per-process binder state: which driver the process uses.
+#pragma once
+
+#include <string>
+
+#include <utils/RefBase.h>
+
+namespace android {
+
+class ProcessState : public virtual RefBase {
+  public:
+    // The process's one state, on "/dev/binder" unless initWithDriver() came first.
+    static sp<ProcessState> self();
+
+    // Chooses the driver, a folder of this path in the device root. Another driver after the first
+    // is fatal.
+    static sp<ProcessState> initWithDriver(const char* driver);
+
+    const std::string& getDriverName() const { return mDriver; }
+
+  private:
+    explicit ProcessState(std::string driver);
+    ~ProcessState() override;
+
+    const std::string mDriver;
+};
+
+}  // namespace android
