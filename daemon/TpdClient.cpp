@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cstring>
 
 #include "binder/corvane_sys_binder_client.h"
 #include "property/Property.h"
@@ -82,7 +83,7 @@ std::string TpdClient::RunCmd(const char* cmd, const char* params) {
 
 bool TpdClient::IsCaptestInRt(std::string cmd, std::string params) {
     return cmd == kCaptest && !params.empty() &&
-           std::string(kRunningTestModes).find(params.c_str()) != std::string::npos;
+           strstr(kRunningTestModes, params.c_str()) != nullptr;
 }
 
 bool TpdClient::IsDaemonAlive(std::string& info) {

@@ -63,7 +63,7 @@ void DieAfterReply() {
 std::string TakeFault() {
     static std::mutex counting;
     const std::lock_guard<std::mutex> lock(counting);
-    const std::string fault = PropertyText("sim.fault");
+    std::string fault = PropertyText("sim.fault");
     if (fault.empty() || PropertyText("sim.fault_count").empty()) {
         return fault;
     }

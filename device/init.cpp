@@ -27,6 +27,8 @@ constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 constexpr char kRestartsKey[] = "odm.thp.dae_reboot_times";
 // A daemon that cannot live is not started at a rate that would eat the machine.
 constexpr useconds_t kRestartPauseUs = 50000;
+constexpr int kLockTries = 20;
+constexpr useconds_t kLockPauseUs = 10000;
 
 struct BootProperty {
     const char* key;
@@ -205,6 +207,20 @@ int Fail(const char* what) {
     return 1;
 }
 
+// Whether this process is the device's one init; its number is then in the locked file. Somebody
+// who only asks whether the device runs holds the lock for a moment.
+bool LockDevice() {
+    const int file =
+            openat(host::DeviceRoot(), "init.pid", O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600);
+    for (int tries = 0; tries < kLockTries; ++tries) {
+        if (flock(file, LOCK_EX | LOCK_NB) == 0) {
+            return ftruncate(file, 0) == 0 && dprintf(file, "%d\n", getpid()) > 0;
+        }
+        usleep(kLockPauseUs);
+    }
+    return false;
+}
+
 std::string ProgramBesideThisOne(const char* name) {
     char path[4096];
     const ssize_t length = readlink("/proc/self/exe", path, sizeof(path) - 1);
@@ -219,13 +235,8 @@ int main() {
     if (host::DeviceRoot() < 0) {
         return 1;
     }
-    const int lock =
-            openat(host::DeviceRoot(), "init.pid", O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600);
-    if (lock < 0 || flock(lock, LOCK_EX | LOCK_NB) != 0) {
+    if (!LockDevice()) {
         return Fail("this device runs already");
-    }
-    if (ftruncate(lock, 0) != 0 || dprintf(lock, "%d\n", getpid()) < 0) {
-        return Fail("init.pid");
     }
 
     sigset_t signals;

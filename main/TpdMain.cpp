@@ -46,8 +46,7 @@ std::string ThpDebugExecuteCmd(std::string cmd, std::string params) {
     if (!g_tpdCmd->IsSelinuxPermissive()) {
         return "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n";
     }
-    const std::string ret =
-            g_tpdCmd->GetTpdclient()->ThpExecuteCmdParams(kTwoWayMarker + cmd, params);
+    std::string ret = g_tpdCmd->GetTpdclient()->ThpExecuteCmdParams(kTwoWayMarker + cmd, params);
     __android_log_print(ANDROID_LOG_INFO, kTag, "ret = %s", ret.c_str());
     return ret;
 }

@@ -47,7 +47,7 @@ class DriverServiceManager : public IServiceManager {
     sp<IBinder> getService(const String16& name) const override {
         const auto deadline = std::chrono::steady_clock::now() + GetServiceLimit();
         for (;;) {
-            const sp<IBinder> binder = checkService(name);
+            sp<IBinder> binder = checkService(name);
             if (binder != nullptr ||
                 std::chrono::steady_clock::now() + kGetServicePause > deadline) {
                 return binder;

@@ -243,13 +243,13 @@ void* RunClient(void* argument) {
 
 // A client that no thread can be had for is hung up on.
 void StartClient(int connection, const sp<IBinder>& service) {
-    auto client = std::make_unique<Client>(Client{connection, service});
+    auto* const client = new Client{connection, service};
     pthread_t thread;
-    if (pthread_create(&thread, nullptr, RunClient, client.get()) != 0) {
+    if (pthread_create(&thread, nullptr, RunClient, client) != 0) {
         close(connection);
+        delete client;
         return;
     }
-    client.release();
     pthread_detach(thread);
 }
 
@@ -326,6 +326,7 @@ void ServeServices() {
         listeners = gListeners;
     }
     std::vector<pollfd> waits;
+    waits.reserve(listeners.size());
     for (const Listener& listener : listeners) {
         waits.push_back({listener.socket, POLLIN, 0});
     }
