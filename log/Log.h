@@ -5,7 +5,7 @@
 #include <mutex>
 #include <string>
 
-enum LogLevel {
+enum LogLevel : int {
     LOG_ERROR = 1,
     LOG_WARNING = 2,
     LOG_INFO = 3,
