@@ -28,6 +28,11 @@ need_compiler() {
     need /usr/bin/g++ g++ /usr/bin/cmake cmake /usr/bin/ninja ninja-build
 }
 
+# What the tests are made of and call.
+need_test_tools() {
+    need /usr/include/gtest/gtest.h libgtest-dev /usr/bin/groff groff-base /usr/bin/zsh zsh
+}
+
 # build TARGET...: configures when that was not done yet, and builds.
 build() {
     if [[ ! -f $TPD_BUILD_DIR/build.ninja ]]; then

@@ -63,6 +63,16 @@ completions() {
     done
 }
 
+# The words of the README's session print what stands below them.
+session() {
+    shown=$(awk '/^```$/ { if (inside) exit; inside = 1; next } inside' "$tree/README.md")
+    cd "$tree"
+    same session "$shown" "$(grep '^\$ ' <<<"$shown" | while read -r _ words; do
+        printf '$ %s\n' "$words"
+        bash -c "$words" </dev/null 2>/dev/null
+    done)"
+}
+
 install_tree() {
     DESTDIR=$scratch/root cmake --install "$TPD_BUILD_DIR" --prefix /usr
     same "installed files" "$(printf 'usr/%s\n' bin/tpd share/bash-completion/completions/tpd \
