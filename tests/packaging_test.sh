@@ -1,15 +1,13 @@
 #!/usr/bin/env bash
 # packaging_test BUILD_DIR CHECK [MODULE=SOURCE;...]...: what is shipped beside the program.
 set -euo pipefail
-tree=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
+cd "$(dirname "${BASH_SOURCE[0]}")/.."
 scratch=$(mktemp -d)
 export TPD_BUILD_DIR=$1 TPD_DEVICE_ROOT=$scratch/device
-trap '"$tree/scripts/device" stop 2>/dev/null; rm -rf "$scratch"' EXIT
+trap 'scripts/device stop 2>/dev/null; rm -rf "$scratch"' EXIT
 
 # same WHAT EXPECTED ACTUAL
-same() {
-    diff <(echo "$2") <(echo "$3") || { echo "$1: expected <, got >" >&2 && exit 1; }
-}
+same() { diff <(echo "$2") <(echo "$3") || { echo "$1: expected <, got >" >&2 && exit 1; }; }
 
 # The modules of Android.bp have the sources that the build here has.
 android_bp() {
@@ -17,7 +15,7 @@ android_bp() {
         same "$module" "$(tr ';' '\n' <<<"${module#*=}" | sort)" "$(
             awk -F'"' -v module="${module%%=*}" '/name: / { inside = $2 == module }
                 /srcs: / { list = inside } list { for (i = 2; i <= NF; i += 2) print $i }
-                /]/ { list = 0 }' "$tree/Android.bp" | sort
+                /]/ { list = 0 }' Android.bp | sort
         )"
     done
 }
@@ -25,18 +23,18 @@ android_bp() {
 # The page renders. It and the README tell of every result text and local command of the sources.
 page() {
     same warnings "" "$(groff -man -Tutf8 -ww -z "$TPD_BUILD_DIR/docs/tpd.1" 2>&1)"
-    sed 's/\\f[A-Z]//g; s/\\-/-/g' "$tree/docs/tpd.1" >"$scratch/page"
-    cat "$tree"/{main,daemon,binder}/*.cpp >"$scratch/sources"
+    sed 's/\\f[A-Z]//g; s/\\-/-/g' docs/tpd.1 >"$scratch/page"
+    cat {main,daemon,binder}/*.cpp >"$scratch/sources"
     for text in "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux" \
         "0P_1P; " "check_time: " bypass-when-fw-updating "0F_1F; failed to get binder service" \
         "corvane_daemon binder server execute command return ERROR, may caused by processing" \
         "can NOT alloc memory for g_tpdCmd" "can NOT Init g_tpdCmd"; do
-        for place in "$scratch/sources" "$scratch/page" "$tree/README.md"; do
+        for place in "$scratch/sources" "$scratch/page" README.md; do
             grep -qF "$text" "$place" || same "$place" "$text" ""
         done
     done
-    same commands "$(sed -n 's/.*AddTpdCmd("\([^"]*\)".*/.B \1/p' "$tree/main/TpdMain.cpp")" \
-        "$(sed -n '/^.SH LOCAL/,/^.SH FORW/p' "$tree/docs/tpd.1" | grep -A 1 '^.TP' | grep '^.B')"
+    same commands "$(sed -n 's/.*AddTpdCmd("\([^"]*\)".*/.B \1/p' main/TpdMain.cpp)" \
+        "$(sed -n '/^.SH LOCAL/,/^.SH FORW/p' docs/tpd.1 | grep -A 1 '^.TP' | grep '^.B')"
 }
 
 bash_words() { bash -c '. "$1"; shift; COMP_WORDS=(tpd "$@"); COMP_CWORD=$#; _tpd
@@ -48,8 +46,8 @@ zsh_words() { zsh -f -c '_describe() { print -l ${${(P)4}%%:*} }; compadd() { pr
 
 # Both shells offer what the help lists, and know what a second word may be.
 completions() {
-    "$tree/scripts/device" start
-    help=$("$tree/scripts/device" shell "setenforce 0; tpd help" | sed '/:$/d; /^$/d; /^\/\//d' | sort)
+    scripts/device start
+    help=$(scripts/device shell "setenforce 0; tpd help" | sed '/:$/d; /^$/d; /^\/\//d' | sort)
     for words in bash_words zsh_words; do
         same "$words" "$help" "$($words "")"
         same "$words" $'running_test\nrunning_test_lasttime' "$($words captest r)"
@@ -59,7 +57,6 @@ completions() {
 
 # What the words of the README's session print stands below them.
 session() {
-    cd "$tree"
     shown=$(awk '/^```$/ { if (inside) exit; inside = 1; next } inside' README.md)
     same session "$shown" "$(sed -n 's/^\$ //p' <<<"$shown" | while IFS= read -r words; do
         printf '$ %s\n' "$words" && bash -c "$words" </dev/null 2>/dev/null
