@@ -2,6 +2,7 @@
 
 #include <android/log.h>
 
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <new>
@@ -192,6 +193,8 @@ int main(int argc, char** argv) {
     InitTpdCmds();
 
     const std::string ret = Dispatch(argc, argv);
+    // A reader that has gone must not end the tool. Only now: children would inherit it.
+    signal(SIGPIPE, SIG_IGN);
     printf("%s", ret.c_str());
     putchar('\n');
 
