@@ -29,7 +29,18 @@ int Refuse(const std::string& path, const char* why) {
     return -1;
 }
 
+// Standard descriptors that were closed must not become files of the device, which the program's
+// output would go to.
+void FillStandardDescriptors() {
+    int null = open("/dev/null", O_RDWR);
+    while (null >= 0 && null <= STDERR_FILENO) {
+        null = open("/dev/null", O_RDWR);
+    }
+    close(null);
+}
+
 int OpenRoot() {
+    FillStandardDescriptors();
     const std::string path = DeviceRootPath();
     if (path.empty()) {
         return Refuse("", "neither TPD_DEVICE_ROOT, XDG_STATE_HOME nor HOME names a place for it");
