@@ -36,6 +36,9 @@ constexpr uint32_t kAcceptFds = 0x10;
 constexpr int kBacklog = 128;
 constexpr useconds_t kNoDescriptorPauseUs = 10000;
 constexpr int kMaxNameBytes = 80;
+// The kernel takes a dying process's descriptors away from the highest down. With the listener
+// above the connections, whoever sees a call die finds nobody listening, as with a real driver.
+constexpr int kListenerDescriptor = 900;
 
 struct RequestHead {
     uint32_t code;
@@ -304,9 +307,14 @@ status_t PublishService(const std::string& driver, const std::string& name,
     if (service == nullptr || DeviceRoot() < 0 || !SocketAddress(driver, name, address)) {
         return android::BAD_VALUE;
     }
-    const int socket = NewSocket();
+    int socket = NewSocket();
     if (socket < 0) {
         return -errno;
+    }
+    const int high = fcntl(socket, F_DUPFD_CLOEXEC, kListenerDescriptor);
+    if (high >= 0) {
+        close(socket);
+        socket = high;
     }
     MakeDriverFolder(driver);
     if (!ListenAt(socket, address)) {
