@@ -5,6 +5,7 @@
 #include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
 #include <binder/ProcessState.h>
+#include <malloc.h>
 
 #include <chrono>
 #include <cstdio>
@@ -119,7 +120,12 @@ BpRefBase::BpRefBase(const sp<IBinder>& remote) : mRemote(remote) {}
 
 BpRefBase::~BpRefBase() = default;
 
-ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {}
+// On the device the driver's receive buffer is mapped once for the life of the process. Here
+// parcels take it from the heap, which therefore keeps the memory of one call for the next.
+ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {
+    mallopt(M_MMAP_THRESHOLD, 2 * host::kMaxTransactionBytes);
+    mallopt(M_TRIM_THRESHOLD, 8 * host::kMaxTransactionBytes);
+}
 
 ProcessState::~ProcessState() = default;
 
