@@ -1,38 +1,24 @@
 #!/usr/bin/env bash
 # packaging_test BUILD_DIR CHECK [MODULE=SOURCE;...]...: what is shipped beside the program.
 set -euo pipefail
-cd "$(dirname "${BASH_SOURCE[0]}")/.."
-scratch=$(mktemp -d)
+cd "$(dirname "${BASH_SOURCE[0]}")/.." && scratch=$(mktemp -d)
 export TPD_BUILD_DIR=$1 TPD_DEVICE_ROOT=$scratch/device
 trap 'scripts/device stop 2>/dev/null; rm -rf "$scratch"' EXIT
 
 # same WHAT EXPECTED ACTUAL
 same() { diff <(echo "$2") <(echo "$3") || { echo "$1: expected <, got >" >&2 && exit 1; }; }
 
-# The modules of Android.bp have the sources that the build here has.
 android_bp() {
     for module in "$@"; do
-        same "$module" "$(tr ';' '\n' <<<"${module#*=}" | sort)" "$(
-            awk -F'"' -v module="${module%%=*}" '/name: / { inside = $2 == module }
-                /srcs: / { list = inside } list { for (i = 2; i <= NF; i += 2) print $i }
-                /]/ { list = 0 }' Android.bp | sort
-        )"
+        same "$module" "$(tr ';' '\n' <<<"${module#*=}")" "$(
+            awk -F'"' -v module="${module%%=*}" '/name: / { inside = $2 == module } /srcs: / { list = inside }
+                list { for (i = 2; i <= NF; i += 2) print $i } /]/ { list = 0 }' Android.bp)"
     done
 }
 
-# The page renders. It and the README tell of every result text and local command of the sources.
+# The page renders, and tells of the local commands in the order of the sources.
 page() {
     same warnings "" "$(groff -man -Tutf8 -ww -z "$TPD_BUILD_DIR/docs/tpd.1" 2>&1)"
-    sed 's/\\f[A-Z]//g; s/\\-/-/g' docs/tpd.1 >"$scratch/page"
-    cat {main,daemon,binder}/*.cpp >"$scratch/sources"
-    for text in "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux" \
-        "0P_1P; " "check_time: " bypass-when-fw-updating "0F_1F; failed to get binder service" \
-        "corvane_daemon binder server execute command return ERROR, may caused by processing" \
-        "can NOT alloc memory for g_tpdCmd" "can NOT Init g_tpdCmd"; do
-        for place in "$scratch/sources" "$scratch/page" README.md; do
-            grep -qF "$text" "$place" || same "$place" "$text" ""
-        done
-    done
     same commands "$(sed -n 's/.*AddTpdCmd("\([^"]*\)".*/.B \1/p' main/TpdMain.cpp)" \
         "$(sed -n '/^.SH LOCAL/,/^.SH FORW/p' docs/tpd.1 | grep -A 1 '^.TP' | grep '^.B')"
 }
@@ -53,14 +39,6 @@ completions() {
         same "$words" $'running_test\nrunning_test_lasttime' "$($words captest r)"
         same "$words" "THP_SetAccData " "$($words TSA_ExecuteCommand THP_SetA) $($words stop "")"
     done
-}
-
-# What the words of the README's session print stands below them.
-session() {
-    shown=$(awk '/^```$/ { if (inside) exit; inside = 1; next } inside' README.md)
-    same session "$shown" "$(sed -n 's/^\$ //p' <<<"$shown" | while IFS= read -r words; do
-        printf '$ %s\n' "$words" && bash -c "$words" </dev/null 2>/dev/null
-    done)"
 }
 
 install_tree() {
