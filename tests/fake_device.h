@@ -56,7 +56,7 @@ class Device : public testing::Test {
     std::set<std::string> refuses;                               // writes to these
     std::map<std::string, std::pair<int, std::string>> appears;  // at the n-th read from now
     std::optional<std::string> bootLine = "", getenforce = "";   // none: cannot be opened, run
-    int closeStatus = 0;                                         // of getenforce
+    int closeStatus = 256;                                       // of getenforce
     std::deque<bool> lookups;    // whether the next ones find the service; then they all do
     std::deque<Answer> answers;  // to the next calls; then the standard one
     int failingAllocation = 0;   // the n-th from now of those that may fail
