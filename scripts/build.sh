@@ -30,7 +30,8 @@ need_compiler() {
 
 # What the tests are made of and call.
 need_test_tools() {
-    need /usr/include/gtest/gtest.h libgtest-dev /usr/bin/groff groff-base /usr/bin/zsh zsh
+    need /usr/include/gtest/gtest.h libgtest-dev /usr/bin/groff groff-base /usr/bin/zsh zsh \
+        /usr/bin/python3 python3 /usr/bin/pgrep procps
 }
 
 # build TARGET...: configures when that was not done yet, and builds.
