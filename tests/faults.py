@@ -12,7 +12,7 @@ TIMEOUT = ("corvane_daemon binder server execute command return ERROR, may cause
 REFUSED = "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
 NO_SERVICE, RESET = "0F_1F; failed to get binder service\n", "service_enable=0 service_enable=1"
 # fake: a shell command of that name. when: done once the log holds that. put: unseen by init.
-VERBS = """export R=$TPD_DEVICE_ROOT; P=$R/properties
+VERBS = """R=$TPD_DEVICE_ROOT; P=$R/properties; export R P
 fake() { printf '#!/bin/sh\\n%s\\n' "$2" >bin/$1; chmod +x bin/$1; }
 when() { (while ! grep -q "$1" $R/log; do sleep .01; done; shift; "$@") >/dev/null 2>&1 & }
 put() { printf "$2" >$P/$1; }\n"""
@@ -25,7 +25,7 @@ def shell(root, words):
     path = f"{root}/bin:{SOURCE}/device/bin:{SOURCE}/scripts:{BUILD}:{os.environ['PATH']}"
     env = os.environ | {"PATH": path, "TPD_DEVICE_ROOT": str(root), "TPD_BUILD_DIR": str(BUILD)}
     return subprocess.run(["sh", "-c", VERBS + words], capture_output=True, encoding="latin-1",
-                          timeout=60, cwd=root, env=env | {"TPD_GET_SERVICE_MS": "300"})
+                          timeout=90, cwd=root, env=env | {"TPD_GET_SERVICE_MS": "300"})
 
 
 def frame(body=b"done\0\0\0\0", status=0, size=None):
@@ -49,7 +49,7 @@ def rows():
     ok, done, dead, absent = [frame()], "done\n", "retry =*2 " + RESET, "failed*2 " + RESET
     null, other, own = "debug.selinux.permissive=null", "unknown command: x\n", "unshare -rm sh -c "
     down = "0P_1P; check_time: 10.thp.dae_alive : {}. thp.binder: {} reboot_times: 0\n"
-    flip = "put odm.thp.dae_alive 0; when 'CheckAlive {}' setprop odm.thp.{} true"
+    flip = "put odm.thp.dae_alive 0; printf true >y; when 'CheckAlive {}' mv y $P/odm.thp.{}"
     late = f"mv {SERVICE} x; (sleep {{}}; mv x {SERVICE}) & TPD_GET_SERVICE_MS=1000 tpd x"
     yield from (
         ([], "", "tpd x", NO_SERVICE, absent, .4), ([UNREAD, *ok], "", "tpd x", done, "retry ="),
@@ -62,8 +62,8 @@ def rows():
         (ok, flip.format(9, "dae_alive"), "tpd x", done, "CheckAlive*10", 1.8),
         (ok, flip.format(4, "is_updating_fw"), "tpd x", "0P_1P; bypass-when-fw-updatingcheck_time: "
          "5.thp.dae_alive : 0. thp.binder: 1\n", "CheckAlive*5", .8),
-        (ok, "put odm.thp.binder 0; when 'CheckAlive 4' sh -c 'setprop odm.thp.dae_alive 0; "
-         "setprop odm.thp.binder 1'", "tpd x", down.format(0, 1), "CheckAlive*11", 2),
+        (ok, "put odm.thp.binder 0; put x 0; put y 1; when 'CheckAlive 4' sh -c 'cd $P; mv x odm.thp."
+         "dae_alive; mv y odm.thp.binder'", "tpd x", down.format(0, 1), "CheckAlive*11", 2),
         (REAL, "setprop sim.fault_arg 9000; setprop sim.fault hang", "when 'Binder ret' setprop "
          "odm.thp.service_enable 0; tpd x", NO_SERVICE, "retry = failed*2 service_enable=1", .4))
     for die, *got in (("before", TIMEOUT, dead), ("during", TIMEOUT, dead), ("after", other, "")):
@@ -74,8 +74,8 @@ def rows():
         yield [reply], "", "tpd x", TIMEOUT, dead
     for size in (0, 1, 91, 92, 4096, 1040384 - 1):
         yield [frame(b"r" * size + b"\0")], "", "tpd x", "r" * size + "\n", ""
-    yield ([HANG] * 3 + ok, "", "for s in INT TERM KILL; do timeout -s $s .2 tpd x version:3+main;"
-           " done; tpd x", done, "screen_status=version:3+main", .6)
+    yield ([HANG] * 3 + ok, "", "for s in INT TERM KILL; do timeout -s $s .3 tpd x version:3+main;"
+           " done; tpd x", done, "screen_status=version:3+main", .9)
     # Every property in every state: key, words, default, readings, value written, what follows
     for key, words, default, reads, value, after in (
         ("odm.thp.dae_alive", "x", "false", 11, "", "CheckAlive*11"),
@@ -109,7 +109,7 @@ def rows():
             (passes, f"fake getenforce '{said}'") for passes, said in (
                 (0, "true"), (1, "sleep 1; echo Permissive"), (0, "exit 1"), (0, "kill -9 $$"),
                 (0, 'printf Permissive%290s | tr " " x'), (1, "echo PermissiveX"),
-                (1, 'printf Permissive%189s | tr " " x'), (0, "echo; echo Enforcing Permissive")))):
+                (1, 'printf Permissive%189s | tr " " x'), (0, "echo NotPermissive")))):
         yield (ok, "rm $P/*permissive; " + given, "tpd x", done if passes else REFUSED, null +
                " debug.selinux.permissive=true" * (passes and "fake" in given), "sleep" in given)
     yield ok, "rm $P/*permissive", f"PATH={BUILD}:/bin; tpd x; tpd showtouch", REFUSED + "\n", null
@@ -168,7 +168,7 @@ def run(row):
 
 if __name__ == "__main__":
     tries = list(rows()) * int((sys.argv + ["1"])[1])
-    with concurrent.futures.ThreadPoolExecutor(12) as pool:
+    with concurrent.futures.ThreadPoolExecutor(8) as pool:
         held = sum(pool.map(run, tries))
     print(f"{len(list(rows()))} faults, {held} of {len(tries)} runs hold")
     sys.exit(held < len(tries))
