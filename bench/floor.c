@@ -44,8 +44,8 @@ static void Log(const char* head, const char* text, size_t size) {
     memcpy(entry, head, headSize);
     memcpy(entry + headSize, text, cut);
     entry[headSize + cut] = '\n';
-    getpid();
     syscall(SYS_gettid);
+    getpid();
     WriteAll(logFile, entry, headSize + cut + 1);
 }
 
