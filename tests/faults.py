@@ -62,7 +62,7 @@ def rows():
         (ok, flip.format(9, "dae_alive"), "tpd x", done, "CheckAlive*10", 1.8),
         (ok, flip.format(4, "is_updating_fw"), "tpd x", "0P_1P; bypass-when-fw-updatingcheck_time: "
          "5.thp.dae_alive : 0. thp.binder: 1\n", "CheckAlive*5", .8),
-        (ok, "put odm.thp.binder 0; put x 0; put y 1; when 'CheckAlive 4' sh -c 'cd $P; mv x odm.thp."
+        (ok, "put odm.thp.binder 0; put x 0; put y 1; when 'Alive 4' sh -c 'cd $P; mv x odm.thp."
          "dae_alive; mv y odm.thp.binder'", "tpd x", down.format(0, 1), "CheckAlive*11", 2),
         (REAL, "setprop sim.fault_arg 9000; setprop sim.fault hang", "when 'Binder ret' setprop "
          "odm.thp.service_enable 0; tpd x", NO_SERVICE, "retry = failed*2 service_enable=1", .4))
