@@ -10,7 +10,6 @@
 #include <cstdarg>
 #include <cstdint>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <string>
 #include <utility>
@@ -63,6 +62,22 @@ std::string LineHead(int priority, const char* tag) {
     return std::string(head) + (tag != nullptr ? tag : program_invocation_short_name) + ": ";
 }
 
+// What an entry keeps of its text. A stream hands the rest over in large pieces to be dropped,
+// where vsnprintf goes through it byte by byte and vasprintf copies it: half the time of a large
+// reply.
+struct EntryText {
+    char bytes[kEntryBytes] = {};
+    size_t length = 0;
+};
+
+ssize_t Keep(void* entryText, const char* bytes, size_t size) {
+    auto* const text = static_cast<EntryText*>(entryText);
+    const size_t kept = std::min(size, kEntryBytes - 1 - text->length);
+    memcpy(text->bytes + text->length, bytes, kept);
+    text->length += kept;
+    return static_cast<ssize_t>(size);
+}
+
 }  // namespace
 
 int __android_log_print(int priority, const char* tag, const char* format, ...) {
@@ -70,16 +85,20 @@ int __android_log_print(int priority, const char* tag, const char* format, ...) 
     if (log < 0) {
         return -EBADF;
     }
-    // Formatted whole and cut then: vsnprintf goes through what does not fit byte by byte.
-    char* text = nullptr;
+    EntryText kept;
+    FILE* const stream = fopencookie(&kept, "w", {nullptr, Keep, nullptr, nullptr});
+    if (stream == nullptr) {
+        return -ENOMEM;
+    }
     va_list args;
     va_start(args, format);
-    const int length = vasprintf(&text, format, args);
+    const bool formatted = vfprintf(stream, format, args) >= 0;
     va_end(args);
-    if (length < 0) {
+    fclose(stream);
+    if (!formatted) {
         return -EINVAL;
     }
-    text[std::min<size_t>(static_cast<size_t>(length), kEntryBytes - 1)] = '\0';
+    const char* const text = kept.bytes;
     const std::string head = LineHead(priority, tag);
     std::string entry;
     for (const char* line = text; line == text || *line != '\0';) {
@@ -87,7 +106,6 @@ int __android_log_print(int priority, const char* tag, const char* format, ...) 
         entry.append(head).append(line, end).append("\n");
         line = *end != '\0' ? end + 1 : end;
     }
-    free(text);
     // One append, so that the lines of other processes never come between or inside.
     const ssize_t written = write(log, entry.data(), entry.size());
     return written < 0 ? -errno : static_cast<int>(written);
