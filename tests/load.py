@@ -1,7 +1,7 @@
 """load.py [COMMANDS]: 16 clients at once, in peace, then while the daemon is killed and switched"""
 import collections, concurrent.futures, os, pathlib, random, re, sys, tempfile, time
 
-from faults import BASE, NO_SERVICE, TIMEOUT, shell
+from virtual_device import BASE, NO_SERVICE, TIMEOUT, shell
 
 CLIENTS, GROWTH_KIB, COMMANDS = 16, 2048, int((sys.argv + ["10000"])[1])
 ROOT, counts = pathlib.Path(tempfile.mkdtemp(dir=BASE.name)), collections.Counter()
