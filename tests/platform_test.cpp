@@ -1,14 +1,20 @@
 // The platform's stand-in itself, over a device root of this process's own.
 #include <android/log.h>
+#include <binder/Parcel.h>
 #include <gtest/gtest.h>
 #include <regex.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
 
 #include <fstream>
+#include <thread>
 
 #include "platform/device_root.h"
+#include "platform/vndbinder.h"
+
+using android::Parcel;
 
 // Tests take turns in this folder; each uses names of its own.
 static const struct Root : std::string {
@@ -55,6 +61,47 @@ TEST(Log, PrintsALineForALine) {
     EXPECT_EQ(regexec(&form, text.c_str(), 0, nullptr, 0), 0) << text;
     regfree(&form);
     EXPECT_EQ(std::count(text.begin(), text.end(), 'x'), 1023);
+}
+
+// Answers with the flags it was called with; code 1 ends the connection.
+struct FlagService : android::BBinder {
+    explicit FlagService(int connection) : mConnection(connection) {}
+    android::status_t onTransact(uint32_t code, const Parcel& /* data */, Parcel* reply,
+                                 uint32_t flags) override {
+        mSeen += std::to_string(flags) + " ";
+        reply->writeCString(mSeen.c_str());
+        return code == 0 ? android::OK : shutdown(mConnection, SHUT_RDWR);
+    }
+    const int mConnection;
+    std::string mSeen;
+};
+
+struct Mourner : android::IBinder::DeathRecipient {
+    void binderDied(const android::wp<android::IBinder>& /* who */) override { ++mTimes; }
+    int mTimes = 0;
+};
+
+TEST(VndBinder, CarriesCallsUntilTheOwnerDies) {
+    int ends[2];
+    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
+    std::thread serving(host::ServeClient, ends[1], new FlagService(ends[1]));
+    const auto proxy = host::NewProxy(ends[0]);
+    const android::sp<Mourner> mourner(new Mourner), other(new Mourner);
+    EXPECT_EQ(proxy->linkToDeath(mourner) + proxy->linkToDeath(other), android::OK);
+    EXPECT_EQ(proxy->unlinkToDeath(other), android::OK);
+    EXPECT_EQ(proxy->unlinkToDeath(other), android::NAME_NOT_FOUND);
+    Parcel request, reply;
+    EXPECT_EQ(proxy->transact(0, request, &reply, android::IBinder::FLAG_ONEWAY), android::OK);
+    EXPECT_EQ(reply.dataSize(), 0U);
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::OK);
+    EXPECT_STREQ(reply.readCString(), "17 16 ");
+    request.resizeForOverwrite(host::kMaxTransactionBytes + 1);
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::FAILED_TRANSACTION);
+    request.resizeForOverwrite(0);
+    EXPECT_EQ(proxy->transact(1, request, &reply), android::DEAD_OBJECT);
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
+    EXPECT_EQ(std::to_string(mourner->mTimes) + std::to_string(other->mTimes), "10");
+    serving.join();
 }
 
 TEST(DeviceRoot, MustBeThisUsersOwn) {

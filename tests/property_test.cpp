@@ -47,4 +47,14 @@ TEST_F(PropertyStore, ConfirmsAWriteOrGivesUpAfterTheSixth) {
     EXPECT_EQ(Shape(), "rwprwprwprwprwprwp");
 }
 
+TEST_F(PropertyStore, TakesTrueAndOneForAFlag) {
+    for (const std::string text : {"true", "1", "false", "2", "11", "TRUE", " true", "1\n", ""}) {
+        holds = {{kAlive, text}};
+        EXPECT_EQ(Property().GetDaeAlive(), text == "true" || text == "1") << text;
+        EXPECT_EQ(holds[kAlive], text.empty() ? "false" : text);
+    }
+    EXPECT_EQ(Property().GetItem("Rotate").key + Property().GetItem("rotate").alias,
+              "odm.thp.rotateVerSys");
+}
+
 }  // namespace test

@@ -75,6 +75,13 @@ TEST_F(Client, JudgesACapacityTest) {
         EXPECT_EQ(client.RunCmd(row[0].c_str(), row[1].c_str()), "answer" + row[5]);
         EXPECT_EQ(Shape("read call") + std::to_string(client.daemonUnavailable), "rcrrr0");
     }
+    StartsAfresh();
+    lookups = {false, false};
+    EXPECT_EQ(client.RunCmd("c", ""), kNoService);
+    const std::string trail = Trail("log");
+    EXPECT_EQ(trail.substr(trail.find("; E corvane")) + std::to_string(client.daemonUnavailable),
+              "; E corvane_daemon: RunCmd, failed to Get binder service. "
+              "thp.service_enable: 1\n1");
     EXPECT_FALSE(TpdClient::IsCaptestInRt("captest", "lasttimerunning"));
     EXPECT_FALSE(TpdClient::IsCaptestInRt("captest", "") || TpdClient::IsCaptestInRt("", "test"));
 }

@@ -52,6 +52,8 @@ class wp {
     wp(T* object)  // NOLINT(google-explicit-constructor)
         : mObject(object), mRefs(object != nullptr ? object->createWeak(this) : nullptr) {}
     wp(const sp<T>& object) : wp(object.get()) {}  // NOLINT(google-explicit-constructor)
+    template <typename U>
+    wp(const sp<U>& object) : wp(object.get()) {}  // NOLINT(google-explicit-constructor)
     wp(const wp& other) : mObject(other.mObject), mRefs(other.mRefs) {
         if (mRefs != nullptr) {
             mRefs->incWeak(this);

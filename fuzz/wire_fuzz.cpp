@@ -1,4 +1,5 @@
-// Both ends of a connection against a hostile peer, which says the input and hangs up.
+// Both ends of a connection against a hostile peer, which says the input and hangs up, and the
+// reading of its parcels in the order that the call's code spells.
 #include <binder/Parcel.h>
 #include <sys/socket.h>
 
@@ -15,8 +16,18 @@ class Echo : public android::BBinder {
   protected:
     android::status_t onTransact(uint32_t code, const android::Parcel& data, android::Parcel* reply,
                                  uint32_t /* flags */) override {
-        const char* const text = data.readCString();
-        return text != nullptr ? reply->writeCString(text) : static_cast<android::status_t>(code);
+        const char* text = nullptr;
+        for (; code != 0; code >>= 2) {
+            if (code % 4 == 1) {
+                data.enforceInterface(android::String16("x"));
+            } else if (code % 4 == 2) {
+                data.setDataPosition(static_cast<size_t>(data.readInt32()));
+            } else if (code % 4 == 3) {
+                text = data.readCString();
+            }
+            Check(data.dataPosition() <= data.dataSize());
+        }
+        return reply->writeCString(text);
     }
 };
 
