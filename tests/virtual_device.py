@@ -59,7 +59,7 @@ def run(row):
     result = (done.stdout.replace(str(root), "ROOT"), got, done.returncode,
               shell(root, "device stop; ls tmp").stdout)
     good = result == (printed, trail, 0, "") and sum(wait) <= took < sum(wait) + SLACK_S
-    print("holds" if good else "FAILS", f"{replies!r:.50} {given:.99} {typed:.99}",
+    print("holds" if good else "FAILS", f"{replies!r:.40} {given + ' ' + typed!r:.150}",
           f"{(printed, trail, 0)!r:.120}", f"{result!r:.120}", f"{took:.2f} s", sep=" | ")
     shutil.rmtree(root)
     return good
@@ -67,6 +67,7 @@ def run(row):
 
 def campaign(rows, rounds=1):
     tries = rows * rounds
+    print("result | case | expected: text, steps, status | got, and files left | time")
     with concurrent.futures.ThreadPoolExecutor(8) as pool:
         held = sum(pool.map(run, tries))
     print(f"{len(rows)} cases, {held} of {len(tries)} runs hold")
