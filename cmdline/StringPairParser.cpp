@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <climits>
 #include <cstdlib>
+#include <utility>
 
 std::vector<std::string> Split(std::string text, std::string delimiter) {
     if (delimiter.empty()) {
@@ -13,7 +14,7 @@ std::vector<std::string> Split(std::string text, std::string delimiter) {
     while (begin < text.length()) {
         const size_t end = std::min(text.find(delimiter, begin), text.length());
         if (end > begin) {
-            fields.push_back(text.substr(begin, end - begin));
+            fields.emplace_back(text, begin, end - begin);
         }
         begin = end + delimiter.length();
     }
@@ -22,10 +23,10 @@ std::vector<std::string> Split(std::string text, std::string delimiter) {
 
 void StringPairParser::Init(const std::string& text, const std::string& pairSeparator,
                             const std::string& keyValueSeparator) {
-    for (const std::string& piece : Split(text, pairSeparator)) {
-        const std::vector<std::string> fields = Split(piece, keyValueSeparator);
+    for (std::string& piece : Split(text, pairSeparator)) {
+        std::vector<std::string> fields = Split(std::move(piece), keyValueSeparator);
         if (fields.size() == 2) {
-            mPairs.emplace(fields[0], fields[1]);
+            mPairs.try_emplace(std::move(fields[0]), std::move(fields[1]));
         }
     }
 }

@@ -66,8 +66,8 @@ std::string LineHead(int priority, const char* tag) {
 // where vsnprintf goes through it byte by byte and vasprintf copies it: half the time of a large
 // reply.
 struct EntryText {
-    char bytes[kEntryBytes] = {};
-    size_t length = 0;
+    char bytes[kEntryBytes];
+    size_t length;
 };
 
 ssize_t Keep(void* entryText, const char* bytes, size_t size) {
@@ -82,29 +82,28 @@ ssize_t Keep(void* entryText, const char* bytes, size_t size) {
 
 int __android_log_print(int priority, const char* tag, const char* format, ...) {
     static const int log = OpenLog();
-    if (log < 0) {
+    static EntryText text;  // for the holder of the stream's lock
+    static FILE* const stream = fopencookie(&text, "w", {nullptr, Keep, nullptr, nullptr});
+    if (log < 0 || stream == nullptr) {
         return -EBADF;
     }
-    EntryText kept;
-    FILE* const stream = fopencookie(&kept, "w", {nullptr, Keep, nullptr, nullptr});
-    if (stream == nullptr) {
-        return -ENOMEM;
-    }
-    va_list args;
-    va_start(args, format);
-    const bool formatted = vfprintf(stream, format, args) >= 0;
-    va_end(args);
-    fclose(stream);
-    if (!formatted) {
-        return -EINVAL;
-    }
-    const char* const text = kept.bytes;
     const std::string head = LineHead(priority, tag);
     std::string entry;
-    for (const char* line = text; line == text || *line != '\0';) {
+    flockfile(stream);
+    text.length = 0;
+    va_list args;
+    va_start(args, format);
+    const bool formatted = vfprintf(stream, format, args) >= 0 && fflush(stream) == 0;
+    va_end(args);
+    text.bytes[text.length] = '\0';
+    for (const char* line = text.bytes; line == text.bytes || *line != '\0';) {
         const char* const end = strchrnul(line, '\n');
         entry.append(head).append(line, end).append("\n");
         line = *end != '\0' ? end + 1 : end;
+    }
+    funlockfile(stream);
+    if (!formatted) {
+        return -EINVAL;
     }
     // One append, so that the lines of other processes never come between or inside.
     const ssize_t written = write(log, entry.data(), entry.size());
