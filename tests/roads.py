@@ -1,4 +1,4 @@
-"""roads.py: each road a command can take through the shipped tool, on a virtual device of its own"""
+"""roads.py: each road that a command can take through the shipped tool on a virtual device"""
 from virtual_device import NO_SERVICE, REAL, REFUSED, RESET, TIMEOUT, campaign
 
 UP = "; until [ $(getprop odm.thp.binder) = 1 ]; do sleep .02; done"
@@ -18,7 +18,7 @@ ROADS = (
     ("", "tpd stop now", "unknown command: stop\n", ""),
     ("", "tpd TSA_ExecuteCommand captest", PASS, ""),
     ("", "tpd TSA_ExecuteCommand THP_SetFoldState 1", FOLDED, ""),
-    ("", "tpd TSA_ExecuteCommand '' x; tpd tsa_executecommand captest x; tpd a b c d", "\n\n\n", ""),
+    ("", "tpd TSA_ExecuteCommand '' x; tpd tsa_executecommand help x; tpd a b c d", "\n\n\n", ""),
     ("", "tpd | sed '1,/aaa/d' | xargs; tpd help | sed '1,/aaa/d' | xargs", LOCAL * 2, ""),
     ("", "tpd help | head -n 2", "corvane_daemon commands:\nTHP_GetScreenState\n", ""),
     ("", "tpd THP_GetScreenState version:3+main,1; getprop odm.thp.screen_status",
@@ -28,7 +28,7 @@ ROADS = (
      "tpd captest", PASS * 2, "debug.selinux.permissive=true"),
     ("", "tpd stop" + OFF + STATE, "\nfalse\n0\n0\n", "service_enable=0"),
     ("tpd stop" + OFF, "tpd start" + UP + STATE, "\ntrue\n1\n0\n", "service_enable=1"),
-    ("", "tpd reboot; sleep .2" + UP + "; tpd captest" + STATE, "\n" + PASS + "true\n1\n0\n", RESET),
+    ("", "tpd reboot; sleep .2" + UP + "; tpd captest" + STATE, f"\n{PASS}true\n1\n0\n", RESET),
     ("", "tpd log_enable; tpd log_enable" + UP + "; tpd THP_GetStatus | head -n 1",
      "\n\nthplog: true\n", "persist.thplog_enabled=true " + RESET),
     ("setprop persist.odm.thp.thplog_enabled true", "tpd log_disable; getprop odm.thp.ver_dae",

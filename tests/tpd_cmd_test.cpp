@@ -62,4 +62,10 @@ TEST_F(Controller, StopsCommandsWhenItCannotFindOut) {
     EXPECT_FALSE(TpdCmd().IsSelinuxPermissive());
 }
 
+TEST_F(Controller, ReadsTheClockInMilliseconds) {
+    timespec now;
+    clock_gettime(CLOCK_MONOTONIC, &now);
+    EXPECT_NEAR(TpdCmd::GetMonotonicTime(), now.tv_sec * 1e3 + now.tv_nsec / 1e6, 2000);
+}
+
 }  // namespace test

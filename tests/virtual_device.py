@@ -59,16 +59,18 @@ def run(row):
     result = (done.stdout.replace(str(root), "ROOT"), got, done.returncode,
               shell(root, "device stop; ls tmp").stdout)
     good = result == (printed, trail, 0, "") and sum(wait) <= took < sum(wait) + SLACK_S
-    print("holds" if good else "FAILS", f"{replies!r:.40} {given + ' ' + typed!r:.150}",
-          f"{(printed, trail, 0)!r:.120}", f"{result!r:.120}", f"{took:.2f} s", sep=" | ")
     shutil.rmtree(root)
-    return good
+    case, expected = f"{replies!r:.40} {given + ' ' + typed!r:.150}", (printed, trail, 0)
+    return (f"{'holds' if good else 'FAILS'} | {case} | {expected!r:.120} | {result!r:.120} | "
+            f"{took:.2f} s")
 
 
 def campaign(rows, rounds=1):
-    tries = rows * rounds
+    tries, held = rows * rounds, 0
     print("result | case | expected: text, steps, status | got, and files left | time")
     with concurrent.futures.ThreadPoolExecutor(8) as pool:
-        held = sum(pool.map(run, tries))
+        for line in pool.map(run, tries):
+            print(line)
+            held += line.startswith("holds")
     print(f"{len(rows)} cases, {held} of {len(tries)} runs hold")
     sys.exit(held < len(tries))
