@@ -55,7 +55,7 @@ std::string LineHead(int priority, const char* tag) {
     const auto [month, day] = MonthAndDay(now.tv_sec / 86400);
     const auto second = static_cast<int>(now.tv_sec % 86400);
     const bool known = priority >= 0 && priority <= ANDROID_LOG_SILENT;
-    char head[64];
+    char head[96];
     snprintf(head, sizeof(head), "%02d-%02d %02d:%02d:%02d.%03ld %5d %5d %c ", month, day,
              second / 3600, second / 60 % 60, second % 60, now.tv_nsec / 1000000, getpid(),
              static_cast<int>(syscall(SYS_gettid)), known ? kPriorityLetters[priority] : '?');
