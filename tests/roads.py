@@ -1,5 +1,5 @@
 """roads.py: each road that a command can take through the shipped tool on a virtual device"""
-from virtual_device import NO_SERVICE, REAL, REFUSED, RESET, TIMEOUT, campaign
+from virtual_device import NO_SERVICE, REAL, REFUSED, RESET, SOURCE, TIMEOUT, campaign
 
 UP = "; until [ $(getprop odm.thp.binder) = 1 ]; do sleep .02; done"
 AGAIN = "; until [ $(getprop odm.thp.dae_reboot_times) = 1 ]; do sleep .02; done" + UP
@@ -20,6 +20,8 @@ ROADS = (
     ("", "tpd TSA_ExecuteCommand THP_SetFoldState 1", FOLDED, ""),
     ("", "tpd TSA_ExecuteCommand '' x; tpd tsa_executecommand help x; tpd a b c d", "\n\n\n", ""),
     ("", "tpd | sed '1,/aaa/d' | xargs; tpd help | sed '1,/aaa/d' | xargs", LOCAL * 2, ""),
+    ("", f"tpd help >x; grep -o '\"THP_[^\"]*' {SOURCE}/binder/*.cpp | tr -d '\"' | grep -cxFf x",
+     "41\n", ""),  # the daemon knows every one-way name
     ("", "tpd help | head -n 2", "corvane_daemon commands:\nTHP_GetScreenState\n", ""),
     ("", "tpd THP_GetScreenState version:3+main,1; getprop odm.thp.screen_status",
      "screen state: version:3+main,1\nversion:3+main,1\n", "screen_status=version:3+main,1"),
