@@ -79,8 +79,8 @@ TEST_F(Binder, TriesAgainThenRestartsTheDaemon) {
     for (const auto& [cmd, finds, failures, result, shape] : kCases) {
         StartsAfresh();
         holds[kEnable] = "true";
-        for (const char found : finds) {
-            lookups.push_back(found == '1');
+        for (const char find : finds) {
+            lookups.push_back(find == '1');
         }
         answers.resize(failures.length(), {-32});
         EXPECT_EQ(RunCmdParms(cmd, ""), result);

@@ -11,6 +11,7 @@
 
 #include "daemon/TpdCmd.h"
 #include "main/TpdMain.h"
+#include "platform/device_root.h"
 
 using namespace android;
 
@@ -78,7 +79,6 @@ class ServiceManager : public IServiceManager {
 
 Device::Device() {
     gDevice = this;
-    setenv("TPD_DEVICE_ROOT", "/dev/null", 1);  // no test reaches a device on disk
     StartsAfresh();
     setDefaultServiceManager(new ServiceManager);
 }
@@ -123,6 +123,8 @@ std::string Device::Shape(const std::string& kinds) const {
 }  // namespace test
 
 using test::gDevice;
+
+int host::DeviceRoot() { return -1; }  // no test reaches a device on disk
 
 int __system_property_get(const char* name, char* value) {
     gDevice->Note("read", name);

@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# packaging_test BUILD_DIR CHECK [MODULE=SOURCE;...]...: what is shipped beside the program.
+# packaging_test BUILD_DIR CHECK: what is shipped beside the program.
 set -euo pipefail
 cd "$(dirname "${BASH_SOURCE[0]}")/.." && scratch=$(mktemp -d)
 export TPD_BUILD_DIR=$1 TPD_DEVICE_ROOT=$scratch/device
@@ -7,14 +7,6 @@ trap 'scripts/device stop 2>/dev/null; rm -rf "$scratch"' EXIT
 
 # same WHAT EXPECTED ACTUAL
 same() { diff <(echo "$2") <(echo "$3") || { echo "$1: expected <, got >" >&2 && exit 1; }; }
-
-android_bp() {
-    for module in "$@"; do
-        same "$module" "$(tr ';' '\n' <<<"${module#*=}")" "$(
-            awk -F'"' -v module="${module%%=*}" '/name: / { inside = $2 == module } /srcs: / { list = inside }
-                list { for (i = 2; i <= NF; i += 2) print $i } /]/ { list = 0 }' Android.bp)"
-    done
-}
 
 # The page renders, and tells of the local commands in the order of the sources.
 page() {
