@@ -33,7 +33,7 @@ void LogBase::Printf(LogLevel level, std::string function, int line, ...) {
     if (GetLogLevel() < static_cast<int>(level)) {
         return;
     }
-    // Zero-filled: what a failed formatting leaves behind is still a terminated text.
+    // Zero-filled: what a failed formatting leaves behind is still terminated.
     char message[kMessageBytes] = {};
     va_list args;
     va_start(args, line);
