@@ -54,5 +54,6 @@ def service(stopped_device):
     stopped_device.watch()
     for key in (PERMISSIVE, "odm.thp.dae_alive", "odm.thp.binder"):
         stopped_device.setprop(key, "true")
+    stopped_device.setprop("odm.thp.dae_reboot_times", "0")
     stopped_device.setprop("odm.thp.service_enable", "1")
     return Service(stopped_device)
