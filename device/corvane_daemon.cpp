@@ -64,12 +64,13 @@ const device::Fault* TakeFault(const std::string& command) {
     if (fault == nullptr || (fault->kind == FaultKind::kRestart && command != "captest")) {
         return nullptr;
     }
-    if (!GetProperty("sim.fault_count").empty()) {
-        const int64_t count = GetPropertyNumber("sim.fault_count");
-        if (count <= 0) {
+    const std::string count = GetProperty("sim.fault_count");
+    if (!count.empty()) {
+        const int64_t left = strtoll(count.c_str(), nullptr, 10);
+        if (left <= 0) {
             return nullptr;
         }
-        __system_property_set("sim.fault_count", std::to_string(count - 1).c_str());
+        __system_property_set("sim.fault_count", std::to_string(left - 1).c_str());
     }
     host::TraceEvent("fault")
             .Add("name", fault->name)

@@ -141,7 +141,7 @@ class DaemonMinder {
     void Stop() {
         mIsStartPlanned = false;
         if (mDaemon > 0) {
-            host::TraceEvent("daemon_stop").Add("pid", mDaemon);
+            host::TraceEvent("daemon_stop").Add("daemon", mDaemon);
             kill(mDaemon, SIGKILL);
             waitpid(mDaemon, nullptr, 0);
             DaemonGone();
@@ -178,7 +178,7 @@ class DaemonMinder {
         }
         const bool signalled = WIFSIGNALED(status);
         host::TraceEvent("daemon_exit")
-                .Add("pid", mDaemon)
+                .Add("daemon", mDaemon)
                 .Add(signalled ? "signal" : "status",
                      signalled ? WTERMSIG(status) : WEXITSTATUS(status));
         const bool wasAlive = device::IsDaemonAlive();
@@ -203,7 +203,7 @@ class DaemonMinder {
         } else if (mDaemon < 0) {
             PlanStart();
         } else {
-            host::TraceEvent("daemon_start").Add("pid", mDaemon);
+            host::TraceEvent("daemon_start").Add("daemon", mDaemon);
         }
     }
 
