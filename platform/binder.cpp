@@ -6,6 +6,7 @@
 #include <binder/Parcel.h>
 #include <binder/ProcessState.h>
 #include <malloc.h>
+#include <unistd.h>
 
 #include <chrono>
 #include <cstdio>
@@ -85,14 +86,6 @@ IInterface::IInterface() = default;
 
 IInterface::~IInterface() = default;
 
-sp<IBinder> IInterface::asBinder(const IInterface* interface) {
-    return interface != nullptr ? const_cast<IInterface*>(interface)->onAsBinder() : nullptr;
-}
-
-sp<IBinder> IInterface::asBinder(const sp<IInterface>& interface) {
-    return asBinder(interface.get());
-}
-
 sp<IInterface> IBinder::queryLocalInterface(const String16& /* descriptor */) { return nullptr; }
 
 const String16& BBinder::getInterfaceDescriptor() const {
@@ -160,7 +153,11 @@ IPCThreadState* IPCThreadState::self() {
     return &state;
 }
 
-void IPCThreadState::joinThreadPool(bool /* isMain */) { host::ServeServices(); }
+void IPCThreadState::joinThreadPool(bool /* isMain */) {
+    for (;;) {
+        pause();
+    }
+}
 
 sp<IServiceManager> defaultServiceManager() {
     if (gServiceManager == nullptr && host::DeviceRoot() >= 0) {

@@ -23,11 +23,11 @@ Parcel::Parcel() = default;
 void Parcel::setDataPosition(size_t position) const { mPosition = std::min(position, mSize); }
 
 status_t Parcel::setData(const uint8_t* buffer, size_t size) {
-    uint8_t* const room = resizeForOverwrite(size);
-    if (room == nullptr) {
+    uint8_t* const bytes = resizeForOverwrite(size);
+    if (bytes == nullptr) {
         return NO_MEMORY;
     }
-    std::copy_n(buffer, size, room);
+    std::copy_n(buffer, size, bytes);
     return OK;
 }
 
@@ -46,7 +46,8 @@ uint8_t* Parcel::resizeForOverwrite(size_t size) {
     return mData.get();
 }
 
-// Room for `size` bytes at the end, padded with zeros; null when there is no memory.
+// Adds `size` bytes to the end for the caller to fill, padded with zeros; null when there is no
+// memory.
 uint8_t* Parcel::append(size_t size) {
     const size_t padded = Padded(size);
     if (padded < size || padded > std::numeric_limits<size_t>::max() / 2 - mSize) {
@@ -63,10 +64,10 @@ uint8_t* Parcel::append(size_t size) {
         mData = std::move(grown);
         mCapacity = capacity;
     }
-    uint8_t* const room = mData.get() + mSize;
-    memset(room + size, 0, padded - size);
+    uint8_t* const end = mData.get() + mSize;
+    memset(end + size, 0, padded - size);
     mSize = needed;
-    return room;
+    return end;
 }
 
 // The next `size` bytes and their padding, as far as the content has it; null when it is too short.
@@ -79,41 +80,24 @@ const uint8_t* Parcel::take(size_t size) const {
     return bytes;
 }
 
-status_t Parcel::writeInt32(int32_t value) {
-    uint8_t* const room = append(sizeof(value));
-    if (room == nullptr) {
+status_t Parcel::write(const void* bytes, size_t size) {
+    uint8_t* const end = append(size);
+    if (end == nullptr) {
         return NO_MEMORY;
     }
-    memcpy(room, &value, sizeof(value));
+    memcpy(end, bytes, size);
     return OK;
 }
 
+status_t Parcel::writeInt32(int32_t value) { return write(&value, sizeof(value)); }
+
 status_t Parcel::writeCString(const char* text) {
-    if (text == nullptr) {
-        return BAD_VALUE;
-    }
-    const size_t size = strlen(text) + 1;
-    uint8_t* const room = append(size);
-    if (room == nullptr) {
-        return NO_MEMORY;
-    }
-    memcpy(room, text, size);
-    return OK;
+    return text != nullptr ? write(text, strlen(text) + 1) : BAD_VALUE;
 }
 
 status_t Parcel::writeString16(const String16& text) {
-    const size_t bytes = text.size() * sizeof(char16_t);
     const status_t status = writeInt32(static_cast<int32_t>(text.size()));
-    if (status != OK) {
-        return status;
-    }
-    uint8_t* const room = append(bytes + sizeof(char16_t));
-    if (room == nullptr) {
-        return NO_MEMORY;
-    }
-    memcpy(room, text.string(), bytes);
-    memset(room + bytes, 0, sizeof(char16_t));
-    return OK;
+    return status == OK ? write(text.string(), (text.size() + 1) * sizeof(char16_t)) : status;
 }
 
 status_t Parcel::writeInterfaceToken(const String16& interface) {

@@ -166,7 +166,7 @@ bool Connect(int socket, const sockaddr_un& address) {
 
 sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
     sockaddr_un address;
-    const int connection = SocketAddress(driver, name, address) ? NewSocket() : -1;
+    const int connection = NewSocket(driver, name, address);
     if (connection < 0) {
         return nullptr;
     }

@@ -1,17 +1,16 @@
 #include <fcntl.h>
-#include <poll.h>
 #include <pthread.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
+#include <chrono>
 #include <cstring>
 #include <deque>
 #include <functional>
 #include <memory>
 #include <mutex>
-#include <vector>
+#include <thread>
 
 #include <binder/Parcel.h>
 
@@ -31,7 +30,7 @@ namespace host {
 namespace {
 
 constexpr int kBacklog = 128;
-constexpr useconds_t kNoDescriptorPauseUs = 10000;
+constexpr std::chrono::milliseconds kNoDescriptorPause(10);
 // The kernel takes a dying process's descriptors away from the highest down. With the listener
 // above the connections, whoever sees a call die finds nobody listening, as with a real driver.
 constexpr int kListenerDescriptor = 900;
@@ -109,14 +108,6 @@ class OneWayQueue : public android::BBinder {
     std::deque<Call> mCalls;  // the first is the one being carried out
 };
 
-struct Listener {
-    int socket;
-    sp<IBinder> service;
-};
-
-std::mutex gListenersMutex;
-std::vector<Listener> gListeners;
-
 // Binds beside the name and moves the socket there, so that a dead service's socket is replaced and
 // nobody finds one that does not listen yet.
 bool ListenAt(int socket, const sockaddr_un& address) {
@@ -137,64 +128,44 @@ bool ListenAt(int socket, const sockaddr_un& address) {
     return false;
 }
 
+// Serves each client on a thread of its own, for ever.
+void AcceptClients(int listener, const sp<IBinder>& service) {
+    for (;;) {
+        const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
+        if (connection < 0) {
+            // Out of descriptors, say: leave the clients time to give some back.
+            std::this_thread::sleep_for(kNoDescriptorPause);
+        } else if (!IsOwnPeer(connection) ||
+                   !StartThread([connection, service] { ServeClient(connection, service); })) {
+            close(connection);
+        }
+    }
+}
+
 }  // namespace
 
 status_t PublishService(const std::string& driver, const std::string& name,
-                        const sp<IBinder>& service) {
-    sockaddr_un address;
-    if (service == nullptr || !SocketAddress(driver, name, address)) {
+                        const sp<IBinder>& binder) {
+    if (binder == nullptr) {
         return android::BAD_VALUE;
     }
-    int socket = NewSocket();
+    sockaddr_un address;
+    const int socket = NewSocket(driver, name, address);
     if (socket < 0) {
         return -errno;
     }
     const int high = fcntl(socket, F_DUPFD_CLOEXEC, kListenerDescriptor);
-    if (high >= 0) {
-        close(socket);
-        socket = high;
-    }
+    const int listener = high >= 0 ? high : dup(socket);
+    close(socket);
     MakeFolders(DeviceRoot(), driver.substr(1));
-    if (!ListenAt(socket, address)) {
-        const status_t status = errno != 0 ? -errno : android::UNKNOWN_ERROR;
-        close(socket);
-        return status;
+    const sp<IBinder> service(new OneWayQueue(binder));
+    if (ListenAt(listener, address) &&
+        StartThread([listener, service] { AcceptClients(listener, service); })) {
+        return android::OK;
     }
-    const std::lock_guard<std::mutex> lock(gListenersMutex);
-    gListeners.push_back({socket, new OneWayQueue(service)});
-    return android::OK;
-}
-
-void ServeServices() {
-    std::vector<Listener> listeners;
-    {
-        const std::lock_guard<std::mutex> lock(gListenersMutex);
-        listeners = gListeners;
-    }
-    std::vector<pollfd> waits;
-    waits.reserve(listeners.size());
-    for (const Listener& listener : listeners) {
-        waits.push_back({listener.socket, POLLIN, 0});
-    }
-    for (;;) {
-        poll(waits.data(), waits.size(), -1);
-        for (size_t i = 0; i < waits.size(); ++i) {
-            if (waits[i].revents == 0) {
-                continue;
-            }
-            const int connection = accept4(waits[i].fd, nullptr, nullptr, SOCK_CLOEXEC);
-            if (connection < 0) {
-                // Out of descriptors, say: leave the others time to give some back.
-                usleep(kNoDescriptorPauseUs);
-                continue;
-            }
-            const sp<IBinder> service = listeners[i].service;
-            if (!IsOwnPeer(connection) ||
-                !StartThread([connection, service] { ServeClient(connection, service); })) {
-                close(connection);
-            }
-        }
-    }
+    const status_t status = errno != 0 ? -errno : android::UNKNOWN_ERROR;
+    close(listener);
+    return status;
 }
 
 void ServeClient(int connection, const sp<IBinder>& service) {

@@ -1,4 +1,4 @@
-// Host stand-in for the platform's binder objects on either side of a call.
+// Host implementation of the platform's binder objects on either side of a call.
 #pragma once
 
 #include <binder/IBinder.h>

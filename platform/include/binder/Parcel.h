@@ -1,4 +1,4 @@
-// Host stand-in for the platform's message buffer, byte for byte as it is on the wire.
+// Host implementation of the platform's message buffer, byte for byte as it is on the wire.
 #pragma once
 
 #include <cstddef>
@@ -26,7 +26,7 @@ class Parcel {
     status_t setData(const uint8_t* buffer, size_t size);
 
     // Replaces the content with `size` bytes for the caller to fill; null when there is no memory.
-    // Of this stand-in only: a transport reads into it without another copy.
+    // Of this implementation only: a transport reads into it without another copy.
     uint8_t* resizeForOverwrite(size_t size);
 
     // Writers return 0, BAD_VALUE or NO_MEMORY.
@@ -39,11 +39,12 @@ class Parcel {
     bool enforceInterface(const String16& interface) const;
     // The next number; 0 when there is none.
     int32_t readInt32() const;
-    // The next text, which the parcel keeps; null when no terminator is left.
+    // The next string, which the parcel owns; null when no terminator is left.
     const char* readCString() const;
 
   private:
     uint8_t* append(size_t size);
+    status_t write(const void* bytes, size_t size);
     const uint8_t* take(size_t size) const;
 
     std::unique_ptr<uint8_t[]> mData;

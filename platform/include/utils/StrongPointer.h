@@ -1,4 +1,4 @@
-// Host stand-in for the platform's strong reference to a RefBase object.
+// Host implementation of the platform's strong reference to a RefBase object.
 #pragma once
 
 #include <utility>
