@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cstring>
 #include <limits>
-#include <new>
 
 namespace android {
 
@@ -12,80 +11,41 @@ namespace {
 constexpr int32_t kNoStrictModePolicy = std::numeric_limits<int32_t>::min();  // 0x80000000
 constexpr int32_t kNoWorkSource = -1;
 constexpr int32_t kVendorHeader = 'V' << 24 | 'N' << 16 | 'D' << 8 | 'R';
-constexpr size_t kMinCapacity = 256;
 
 constexpr size_t Padded(size_t size) { return (size + 3) & ~size_t{3}; }
 
 }  // namespace
 
-Parcel::Parcel() = default;
-
-void Parcel::setDataPosition(size_t position) const { mPosition = std::min(position, mSize); }
+void Parcel::setDataPosition(size_t position) const {
+    mPosition = std::min(position, mData.size());
+}
 
 status_t Parcel::setData(const uint8_t* buffer, size_t size) {
-    uint8_t* const bytes = resizeForOverwrite(size);
-    if (bytes == nullptr) {
-        return NO_MEMORY;
-    }
-    std::copy_n(buffer, size, bytes);
+    mData.assign(buffer, buffer + size);
+    mPosition = 0;
     return OK;
 }
 
 uint8_t* Parcel::resizeForOverwrite(size_t size) {
-    mSize = 0;
+    mData.resize(size);
     mPosition = 0;
-    if (size > mCapacity || mData == nullptr) {
-        mCapacity = std::max(size, kMinCapacity);
-        mData.reset(new (std::nothrow) uint8_t[mCapacity]);
-        if (mData == nullptr) {
-            mCapacity = 0;
-            return nullptr;
-        }
-    }
-    mSize = size;
-    return mData.get();
-}
-
-// Adds `size` bytes to the end for the caller to fill, padded with zeros; null when there is no
-// memory.
-uint8_t* Parcel::append(size_t size) {
-    const size_t padded = Padded(size);
-    if (padded < size || padded > std::numeric_limits<size_t>::max() / 2 - mSize) {
-        return nullptr;
-    }
-    const size_t needed = mSize + padded;
-    if (needed > mCapacity) {
-        const size_t capacity = std::max({needed, mCapacity * 2, kMinCapacity});
-        std::unique_ptr<uint8_t[]> grown(new (std::nothrow) uint8_t[capacity]);
-        if (grown == nullptr) {
-            return nullptr;
-        }
-        std::copy_n(mData.get(), mSize, grown.get());
-        mData = std::move(grown);
-        mCapacity = capacity;
-    }
-    uint8_t* const end = mData.get() + mSize;
-    memset(end + size, 0, padded - size);
-    mSize = needed;
-    return end;
+    return mData.data();
 }
 
 // The next `size` bytes and their padding, as far as the content has it; null when it is too short.
 const uint8_t* Parcel::take(size_t size) const {
-    if (size > mSize - mPosition) {
+    if (size > mData.size() - mPosition) {
         return nullptr;
     }
-    const uint8_t* const bytes = mData.get() + mPosition;
-    mPosition += std::min(Padded(size), mSize - mPosition);
+    const uint8_t* const bytes = mData.data() + mPosition;
+    mPosition += std::min(Padded(size), mData.size() - mPosition);
     return bytes;
 }
 
 status_t Parcel::write(const void* bytes, size_t size) {
-    uint8_t* const end = append(size);
-    if (end == nullptr) {
-        return NO_MEMORY;
-    }
-    memcpy(end, bytes, size);
+    const size_t end = mData.size();
+    mData.resize(end + Padded(size));
+    memcpy(mData.data() + end, bytes, size);
     return OK;
 }
 
@@ -131,11 +91,11 @@ int32_t Parcel::readInt32() const {
 }
 
 const char* Parcel::readCString() const {
-    if (mPosition == mSize) {
+    if (mPosition == mData.size()) {
         return nullptr;
     }
-    const uint8_t* const text = mData.get() + mPosition;
-    const void* const end = memchr(text, 0, mSize - mPosition);
+    const uint8_t* const text = mData.data() + mPosition;
+    const void* const end = memchr(text, 0, mData.size() - mPosition);
     if (end == nullptr) {
         return nullptr;
     }

@@ -1,14 +1,10 @@
 #include <fcntl.h>
-#include <pthread.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <chrono>
-#include <cstring>
 #include <deque>
-#include <functional>
-#include <memory>
 #include <mutex>
 #include <thread>
 
@@ -35,24 +31,6 @@ constexpr std::chrono::milliseconds kNoDescriptorPause(10);
 // above the connections, whoever sees a call die finds nobody listening, as with a real driver.
 constexpr int kListenerDescriptor = 900;
 
-// Does the work on a thread of its own. False when none can be had.
-bool StartThread(std::function<void()> work) {
-    auto* const task = new std::function<void()>(std::move(work));
-    const auto run = [](void* argument) -> void* {
-        const std::unique_ptr<std::function<void()>> owned(
-                static_cast<std::function<void()>*>(argument));
-        (*owned)();
-        return nullptr;
-    };
-    pthread_t thread;
-    if (pthread_create(&thread, nullptr, run, task) != 0) {
-        delete task;
-        return false;
-    }
-    pthread_detach(thread);
-    return true;
-}
-
 // Carries out the one-way calls of all clients of a service one after another, in the order in
 // which they were read, while two-way calls pass them. Any number may wait.
 class OneWayQueue : public android::BBinder {
@@ -64,12 +42,8 @@ class OneWayQueue : public android::BBinder {
         if ((flags & FLAG_ONEWAY) == 0) {
             return mService->transact(code, data, reply, flags);
         }
-        if (!Append(code, data, flags)) {
-            return android::OK;
-        }
-        const sp<OneWayQueue> keep(this);
-        if (!StartThread([keep] { keep->CarryOut(); })) {
-            CarryOut();
+        if (Append(code, data, flags)) {
+            std::thread([keep = sp<OneWayQueue>(this)] { keep->CarryOut(); }).detach();
         }
         return android::OK;
     }
@@ -108,24 +82,11 @@ class OneWayQueue : public android::BBinder {
     std::deque<Call> mCalls;  // the first is the one being carried out
 };
 
-// Binds beside the name and moves the socket there, so that a dead service's socket is replaced and
-// nobody finds one that does not listen yet.
+// Takes the place of a socket that another service of that name has left.
 bool ListenAt(int socket, const sockaddr_un& address) {
-    sockaddr_un fresh = address;
-    const size_t length = strlen(fresh.sun_path);
-    if (length + 1 >= sizeof(fresh.sun_path)) {
-        return false;
-    }
-    fresh.sun_path[length] = '~';
-    unlink(fresh.sun_path);
-    if (bind(socket, reinterpret_cast<const sockaddr*>(&fresh), sizeof(fresh)) != 0) {
-        return false;
-    }
-    if (listen(socket, kBacklog) == 0 && rename(fresh.sun_path, address.sun_path) == 0) {
-        return true;
-    }
-    unlink(fresh.sun_path);
-    return false;
+    unlink(address.sun_path);
+    return bind(socket, reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0 &&
+           listen(socket, kBacklog) == 0;
 }
 
 // Serves each client on a thread of its own, for ever.
@@ -135,9 +96,8 @@ void AcceptClients(int listener, const sp<IBinder>& service) {
         if (connection < 0) {
             // Out of descriptors, say: leave the clients time to give some back.
             std::this_thread::sleep_for(kNoDescriptorPause);
-        } else if (!IsOwnPeer(connection) ||
-                   !StartThread([connection, service] { ServeClient(connection, service); })) {
-            close(connection);
+        } else {
+            std::thread(ServeClient, connection, service).detach();
         }
     }
 }
@@ -158,14 +118,13 @@ status_t PublishService(const std::string& driver, const std::string& name,
     const int listener = high >= 0 ? high : dup(socket);
     close(socket);
     MakeFolders(DeviceRoot(), driver.substr(1));
-    const sp<IBinder> service(new OneWayQueue(binder));
-    if (ListenAt(listener, address) &&
-        StartThread([listener, service] { AcceptClients(listener, service); })) {
-        return android::OK;
+    if (!ListenAt(listener, address)) {
+        const status_t status = -errno;
+        close(listener);
+        return status;
     }
-    const status_t status = errno != 0 ? -errno : android::UNKNOWN_ERROR;
-    close(listener);
-    return status;
+    std::thread(AcceptClients, listener, sp<IBinder>(new OneWayQueue(binder))).detach();
+    return android::OK;
 }
 
 void ServeClient(int connection, const sp<IBinder>& service) {
@@ -173,8 +132,7 @@ void ServeClient(int connection, const sp<IBinder>& service) {
     while (Receive(connection, &header, sizeof(header)) && header.size <= kMaxTransactionBytes) {
         Parcel request;
         Parcel reply;
-        uint8_t* const buffer = request.resizeForOverwrite(header.size);
-        if (buffer == nullptr || !Receive(connection, buffer, header.size)) {
+        if (!Receive(connection, request.resizeForOverwrite(header.size), header.size)) {
             break;
         }
         LookForTrace();

@@ -54,13 +54,6 @@ bool Receive(int connection, void* buffer, size_t size) {
     return true;
 }
 
-bool IsOwnPeer(int connection) {
-    ucred peer = {};
-    socklen_t size = sizeof(peer);
-    return getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &size) == 0 &&
-           peer.uid == geteuid();
-}
-
 int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address) {
     constexpr size_t kMaxNameBytes = 80;
     if (DeviceRoot() < 0 || name.empty() || name.front() == '.' ||

@@ -31,9 +31,6 @@ bool SendMessage(int connection, const void* header, size_t headerSize,
 // Receives exactly `size` bytes. False when the peer is gone before.
 bool Receive(int connection, void* buffer, size_t size);
 
-// Whether the peer is of this user: nobody talks to another one's service or client.
-bool IsOwnPeer(int connection);
-
 // A new socket, which the caller closes, and the address of the service's socket below the driver's
 // folder. -1 when there is no root, the name is no file name or there is no socket; errno says why.
 int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address);

@@ -7,8 +7,6 @@ namespace android {
 
 class IInterface : public virtual RefBase {
   protected:
-    IInterface();
-    ~IInterface() override;
     virtual IBinder* onAsBinder() = 0;
 };
 

@@ -20,7 +20,6 @@ class ProcessState : public virtual RefBase {
 
   private:
     explicit ProcessState(std::string driver);
-    ~ProcessState() override;
 
     const std::string mDriver;
 };
