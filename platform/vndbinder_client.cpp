@@ -3,7 +3,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdio>
 #include <vector>
 
 #include <binder/Parcel.h>
@@ -98,8 +97,7 @@ class RemoteBinder : public IBinder {
             OwnerDied();
             return android::FAILED_TRANSACTION;
         }
-        uint8_t* const buffer = reply.resizeForOverwrite(header.size);
-        if (buffer == nullptr || !Receive(mConnection, buffer, header.size)) {
+        if (!Receive(mConnection, reply.resizeForOverwrite(header.size), header.size)) {
             reply.resizeForOverwrite(0);
             return OwnerDied();
         }
@@ -166,16 +164,11 @@ bool Connect(int socket, const sockaddr_un& address) {
 
 sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
     sockaddr_un address;
-    const int connection = SocketAddress(driver, name, address) ? NewSocket() : -1;
+    const int connection = NewSocket(driver, name, address);
     if (connection < 0) {
         return nullptr;
     }
     if (!Connect(connection, address)) {
-        close(connection);
-        return nullptr;
-    }
-    if (!IsOwnPeer(connection)) {
-        fprintf(stderr, "%s: served by another user\n", name.c_str());
         close(connection);
         return nullptr;
     }
