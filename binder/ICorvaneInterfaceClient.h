@@ -1,5 +1,5 @@
-// The daemon's binder interface as a client sees it: one operation, "execute this command with this
-// parameter text and answer with a text".
+// The daemon's binder interface as a client sees it: one operation, "execute this command with
+// these parameters and answer with a text".
 #pragma once
 
 #include <string>
@@ -25,7 +25,7 @@ class ICorvaneInterfaceClient : public android::IInterface {
 
     virtual const android::String16& getInterfaceDescriptor() const;
 
-    // Has the daemon execute `cmd` with `params`. A command that carries the marker "[TPD]" is sent
+    // Has the daemon execute `cmd` with `params`. A command that carries kTwoWayMarker is sent
     // without everything up to and including it, and always two-way; any other goes one-way when
     // the lists below name it. Two-way: returns 0 with the daemon's answer in `reply` (empty when
     // it answered without a text), or the transport's status with `reply` untouched. One-way:
@@ -43,7 +43,7 @@ class BpCorvaneInterfaceClient : public android::BpInterface<ICorvaneInterfaceCl
                                      std::string params) override;
 };
 
-// Notes the daemon's death in the log and ends its own registration. It repairs nothing: the next
+// Records the daemon's death in the log and ends its own registration. It repairs nothing: the next
 // call on the dead binder fails, and the runner looks the service up afresh.
 class MyDeathRecipient : public android::IBinder::DeathRecipient {
   public:
@@ -59,7 +59,7 @@ class MyDeathRecipient : public android::IBinder::DeathRecipient {
 // Whether any entry of `list` occurs in `text`, byte for byte; an empty entry occurs in every text.
 bool IsAsync(const std::vector<std::string>& list, std::string text);
 
-// What is sent one-way: matched against the command text and the parameter text. Read-only.
+// What is sent one-way: matched against the command and against the parameters. Read-only.
 extern const std::vector<std::string> g_asyncCmds;
 extern const std::vector<std::string> g_asyncThpCmds;
 

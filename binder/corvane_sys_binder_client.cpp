@@ -70,7 +70,6 @@ namespace {
 
 constexpr char kDriver[] = "/dev/vndbinder";
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
-constexpr char kTwoWayMarker[] = "[TPD]";
 constexpr uint32_t kExecuteCommandCode = 0;
 constexpr int kLookupTries = 2;
 constexpr int kExecuteAttempts = 2;
@@ -81,12 +80,12 @@ constexpr size_t kPropertyBufferBytes = 128;
 constexpr int kPropertyWrites = 6;
 constexpr useconds_t kPropertyPauseUs = 100;
 
-constexpr char kNoServiceText[] = "0F_1F; failed to get binder service";
 constexpr char kTimeoutText[] =
         "corvane_daemon binder server execute command return ERROR, may caused by processing "
         "timeout.";
 
-// The binder client logs without a tag of its own; readers show the program's name instead.
+// The interface fixes all log lines below: without a tag, so that readers show the program's name;
+// many at ERROR though nothing failed; and with a 1 behind "retry:", whichever write it is.
 constexpr const char* kNoTag = nullptr;
 
 const android::StaticString16 kDescriptor(
@@ -218,7 +217,7 @@ std::string RunCmdParms(std::string cmd, std::string params) {
         }
         if (g_thpBinder == nullptr) {
             ResetDaemon();
-            return kNoServiceText;
+            return std::string(kNoServicePrefix) + "failed to get binder service";
         }
         const status_t status = ICorvaneInterfaceClient::asInterface(g_thpBinder)
                                         ->ExecuteCommand(result, cmd, params);

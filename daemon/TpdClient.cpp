@@ -12,18 +12,17 @@
 namespace {
 
 constexpr char kTag[] = "corvane_daemon";
-constexpr int kPatientChecks = 11;
-constexpr int kImpatientChecks = 1;
+constexpr int kMaxChecks = 11;
+constexpr int kChecksAfterFailures = 1;
 constexpr int kMaxFailedWaits = 2;
 constexpr useconds_t kCheckPauseUs = 200000;
 
 constexpr char kNotSentPrefix[] = "0P_1P; ";
-constexpr char kNoServicePrefix[] = "0F_1F; ";
 constexpr char kNoServiceMark[] = "0F_1F";
 constexpr char kErrorMark[] = "ERROR";
 
 constexpr char kCaptest[] = "captest";
-// Both mode names in one text: a parameter text that is any fragment of it selects the mode.
+// Both mode names in one string: parameters that are any fragment of it select the mode.
 constexpr char kRunningTestModes[] =
         "running_test"
         "running_test_lasttime";
@@ -42,7 +41,7 @@ int failedWaitCount = 0;
 TpdClient::TpdClient() : daemonUnavailable(1) {}
 
 std::string TpdClient::ThpExecuteCmdParams(std::string cmd, std::string params) {
-    const int checks = failedWaitCount < kMaxFailedWaits ? kPatientChecks : kImpatientChecks;
+    const int checks = failedWaitCount < kMaxFailedWaits ? kMaxChecks : kChecksAfterFailures;
     failedWaitCount = std::min(failedWaitCount + 1, kMaxFailedWaits);
     std::string report = WaitDaemonAlive(checks);
     if (daemonUnavailable != 0) {

@@ -18,8 +18,9 @@ constexpr char kGetenforce[] = "getenforce";
 constexpr char kPermissive[] = "Permissive";
 constexpr size_t kSelinuxModeBytes = 200;
 
-// User types whose log is on while its property says nothing.
-constexpr int kUserTypesWithLog[] = {3, 5};
+// Whether the log is on for this user type ("ro.logsystem.usertype") while its property says
+// nothing.
+bool IsUserTypeWithLog(int userType) { return userType == 3 || userType == 5; }
 
 }  // namespace
 
@@ -61,7 +62,7 @@ bool TpdCmd::IsThplogEnable() {
     if (Property().GetUserType(userType) < 0) {
         return false;
     }
-    return userType == kUserTypesWithLog[0] || userType == kUserTypesWithLog[1];
+    return IsUserTypeWithLog(userType);
 }
 
 void TpdCmd::EnableThplog() {

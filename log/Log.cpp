@@ -33,7 +33,7 @@ void LogBase::Printf(LogLevel level, std::string function, int line, ...) {
     if (GetLogLevel() < static_cast<int>(level)) {
         return;
     }
-    // Zero-filled: what a failed formatting leaves behind is still a terminated text.
+    // Zero-filled: what a failed formatting leaves behind is still terminated.
     char message[kMessageBytes] = {};
     va_list args;
     va_start(args, line);
@@ -44,7 +44,7 @@ void LogBase::Printf(LogLevel level, std::string function, int line, ...) {
         __android_log_print(ANDROID_LOG_INFO, kTag, "over size 0");
         message[sizeof(message) - 1] = '\0';
     }
-    AndroidLog(level, PrettyTrim(std::move(function)), line, message);
+    AndroidLog(static_cast<unsigned int>(level), PrettyTrim(std::move(function)), line, message);
 }
 
 void LogBase::Append(std::string /* text */) const {}

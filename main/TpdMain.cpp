@@ -7,6 +7,7 @@
 #include <cstdlib>
 #include <new>
 
+#include "binder/corvane_sys_binder_client.h"
 #include "daemon/TpdCmd.h"
 #include "property/Property.h"
 
@@ -18,8 +19,9 @@ namespace {
 constexpr char kTag[] = "corvane_daemon";
 constexpr char kHelp[] = "help";
 constexpr char kTsaExecuteCommand[] = "TSA_ExecuteCommand";
-constexpr char kTwoWayMarker[] = "[TPD]";
 
+// The interface fixes the log lines, the numbers in brackets (no source lines) among them, and the
+// texts for users as they stand, "g_tpdCmd" included.
 void LogEnter(const char* function, int line) {
     __android_log_print(ANDROID_LOG_INFO, kTag, "%s[%d] +\n", function, line);
 }
@@ -60,11 +62,11 @@ std::string Dispatch(int argc, char** argv) {
             ret += CmdsToStr();
             break;
         case 2: {
-            const std::string word = argv[1];
-            if (!ExcuteTpdCmd(word)) {
-                ret = ThpDebugExecuteCmd(word, "");
+            const std::string cmd = argv[1];
+            if (!ExcuteTpdCmd(cmd)) {
+                ret = ThpDebugExecuteCmd(cmd, "");
             }
-            if (word == kHelp) {
+            if (cmd == kHelp) {
                 ret += CmdsToStr();
             }
             break;

@@ -1,5 +1,5 @@
-// The command front end: the local command table, and the way of a command word through it or on to
-// the daemon.
+// The command front end: the local command table, and the dispatch of a command to it or to the
+// daemon.
 #pragma once
 
 #include <functional>
@@ -27,11 +27,12 @@ void AddAfelogTpdCmds();
 void AddShowtouchTpdCmds();
 
 // Runs the local command of exactly this name and drops its confirmation. False when there is none.
+// The interface fixes this spelling.
 bool ExcuteTpdCmd(std::string name);
 
 // The help text that lists the local commands.
 std::string CmdsToStr();
 
-// Has the daemon run "TSA_ExecuteCommand" with both words, joined by a blank, and returns the
-// result text. Empty, with nothing sent, when the first word is empty.
+// Has the daemon run "TSA_ExecuteCommand" with both arguments, joined by a space, as its parameters
+// and returns the result text. Empty, with nothing sent, when the first argument is empty.
 std::string Thp_runCommand(std::string first, std::string second);
