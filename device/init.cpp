@@ -23,6 +23,7 @@
 #include <cstring>
 #include <set>
 #include <string>
+#include <tuple>
 
 #include "common.h"
 #include "platform/device_root.h"
@@ -65,13 +66,13 @@ void ClearLeftovers() {
 }
 
 // Whether a boot, which empties folders, destroys nothing of anybody else's: the folder was booted
-// before, is empty, or has only what the tool and the device's commands make in a new root. Some of
-// these names say little: alone, they do not make a device.
+// before, is empty, or has only what earlier versions, the tool and the device's commands make in a
+// root. Some of these names say little: alone, they do not make a device.
 bool IsDeviceRoot() {
     const std::set<std::string> files = device::FilesIn(".");
     const std::set<std::string> common = {"dev", "log", "tmp"};
-    const std::set<std::string> own = {"dev",     "log",      "proc", "properties",
-                                       "selinux", "settings", "tmp",  "trace"};
+    std::set<std::string> own = {"init.pid", "proc", "properties", "selinux", "settings", "trace"};
+    own.insert(common.begin(), common.end());
     const auto areAmong = [&files](const std::set<std::string>& names) {
         return std::includes(names.begin(), names.end(), files.begin(), files.end());
     };
@@ -118,22 +119,18 @@ class DaemonMinder {
         }
     }
 
+    // What changed until the daemon has ended is followed with this.
     void Restart() {
         Stop();
         mPauseMs = kMinRestartPauseMs;
+        mFollowed = EnablingWrite();
         Start();
     }
 
-    // After any change of the enabling property. Each change but the last may have been overtaken
-    // by the next before it was read: "1" for a running daemon means that a "0" was.
+    // After each write of the enabling property that was not followed yet. Each but the last may
+    // have been overtaken by the next: "1" for a running daemon means that a "0" was.
     void FollowServiceEnable() {
-        struct stat status = {};
-        const std::string path = std::string("properties/") + device::kServiceEnableKey;
-        if (fstatat(host::DeviceRoot(), path.c_str(), &status, 0) == 0 &&
-            (status.st_ino != mSeenInode || status.st_ctim.tv_sec != mSeenTime.tv_sec ||
-             status.st_ctim.tv_nsec != mSeenTime.tv_nsec)) {
-            mSeenInode = status.st_ino;
-            mSeenTime = status.st_ctim;
+        if (EnablingWrite() != mFollowed) {
             Restart();
         }
     }
@@ -157,6 +154,16 @@ class DaemonMinder {
     }
 
   private:
+    // The file and its time: of no two writes the same.
+    using Write = std::tuple<ino_t, time_t, int64_t>;
+
+    static Write EnablingWrite() {
+        struct stat status = {};
+        const std::string path = std::string("properties/") + device::kServiceEnableKey;
+        fstatat(host::DeviceRoot(), path.c_str(), &status, AT_SYMLINK_NOFOLLOW);
+        return {status.st_ino, status.st_ctim.tv_sec, status.st_ctim.tv_nsec};
+    }
+
     // Whatever becomes of init, its daemon goes with it: also when init is gone before this begins.
     [[noreturn]] static void RunDaemon(pid_t init) {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
@@ -192,8 +199,7 @@ class DaemonMinder {
 
     pid_t mDaemon = -1;
     int mPauseMs = kMinRestartPauseMs;  // before the next start
-    ino_t mSeenInode = 0;
-    timespec mSeenTime = {};
+    Write mFollowed;
 };
 
 // Whether init goes on.
@@ -303,7 +309,7 @@ int main(int argc, char** argv) {
     }
     ReportBoot();
     DaemonMinder minder;
-    minder.FollowServiceEnable();
+    minder.Restart();
     pollfd waits[] = {{signals, POLLIN, 0}, {watch, POLLIN, 0}};
     for (bool running = true; running;) {
         if (poll(waits, std::size(waits), -1) > 0) {
