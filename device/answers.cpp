@@ -1,6 +1,7 @@
 #include "answers.h"
 
 #include <algorithm>
+#include <cstring>
 
 #include "common.h"
 
@@ -8,49 +9,20 @@ namespace device {
 
 namespace {
 
-// The daemon's commands that act and have nothing to tell.
-constexpr const char* kActions[] = {"THP_ASA_EnableFreqShift",
-                                    "THP_ASA_ForceSetToNewFreq",
-                                    "THP_ASA_SetTpPenMatchCode",
-                                    "THP_DisableBaselineUpdate",
-                                    "THP_DisableFeature",
-                                    "THP_DisableScenario",
-                                    "THP_EnableBaselineUpdate",
-                                    "THP_EnableFeature",
-                                    "THP_EnableScenario",
-                                    "THP_InformTypingStatus",
-                                    "THP_InformUserAppCrash",
-                                    "THP_Log_Commander",
-                                    "THP_Log_GhostTouch",
-                                    "THP_ResetBaseline",
-                                    "THP_Ring_AddSideGesture",
-                                    "THP_Ring_EnterBetaTask",
-                                    "THP_Ring_EnterSpecialBeta",
-                                    "THP_Ring_ExitBetaTask",
-                                    "THP_Ring_ExitSpecialBeta",
-                                    "THP_Ring_ExposeSideArea",
-                                    "THP_Ring_MapSideArea",
-                                    "THP_Ring_MapSideGestureToKeyCode",
-                                    "THP_Ring_MapSideGestureToTPEvent",
-                                    "THP_Ring_RemoveSideArea",
-                                    "THP_Ring_ResetSideGesture",
-                                    "THP_Ring_SetGestureTag",
-                                    "THP_Ring_SetVolumeGUIInfo",
-                                    "THP_SetAccData",
-                                    "THP_SetEnvironmentTemperature",
-                                    "THP_SetFoldState",
-                                    "THP_SetPressureGesture",
-                                    "THP_SetRunTimePrmt",
-                                    "THP_SetSensorData",
-                                    "THP_SetSensorGesture",
-                                    "THP_SetSensorGestureWithTimeStamp",
-                                    "THP_SetSupportedSensorGesture",
-                                    "THP_SetTuneTimePrmt",
-                                    "THP_SetVirtualKey",
-                                    "THP_SetVolumeGUIInfo",
-                                    "THP_SetXCoreArea",
-                                    "THP_UpdateViewsLocation",
-                                    "aftouch"};
+// The daemon's commands that act and have nothing to tell, each between spaces.
+constexpr char kActions[] =
+        " THP_ASA_EnableFreqShift THP_ASA_ForceSetToNewFreq THP_ASA_SetTpPenMatchCode"
+        " THP_DisableBaselineUpdate THP_DisableFeature THP_DisableScenario"
+        " THP_EnableBaselineUpdate THP_EnableFeature THP_EnableScenario THP_InformTypingStatus"
+        " THP_InformUserAppCrash THP_Log_Commander THP_Log_GhostTouch THP_ResetBaseline"
+        " THP_Ring_AddSideGesture THP_Ring_EnterBetaTask THP_Ring_EnterSpecialBeta"
+        " THP_Ring_ExitBetaTask THP_Ring_ExitSpecialBeta THP_Ring_ExposeSideArea"
+        " THP_Ring_MapSideArea THP_Ring_MapSideGestureToKeyCode THP_Ring_MapSideGestureToTPEvent"
+        " THP_Ring_RemoveSideArea THP_Ring_ResetSideGesture THP_Ring_SetGestureTag"
+        " THP_Ring_SetVolumeGUIInfo THP_SetAccData THP_SetEnvironmentTemperature THP_SetFoldState"
+        " THP_SetPressureGesture THP_SetRunTimePrmt THP_SetSensorData THP_SetSensorGesture"
+        " THP_SetSensorGestureWithTimeStamp THP_SetSupportedSensorGesture THP_SetTuneTimePrmt"
+        " THP_SetVirtualKey THP_SetVolumeGUIInfo THP_SetXCoreArea THP_UpdateViewsLocation aftouch ";
 
 std::string GetOrUnset(const char* key) {
     const std::string value = GetProperty(key);
@@ -108,9 +80,9 @@ std::string Help(const std::string& /* params */) {
         text += std::string("\n") + query.name +
                 (query.isSimulated ? " (virtual device only)" : "");
     }
-    for (const char* const action : kActions) {
-        text += std::string("\n") + action;
-    }
+    std::string actions = kActions;
+    std::replace(actions.begin(), actions.end(), ' ', '\n');
+    text.append(actions, 0, actions.length() - 1);
     return text;
 }
 
@@ -122,7 +94,8 @@ std::string Answer(const std::string& command, const std::string& params) {
             return query.answer(params);
         }
     }
-    if (std::find(std::begin(kActions), std::end(kActions), command) != std::end(kActions)) {
+    const bool isName = !command.empty() && command.find(' ') == std::string::npos;
+    if (isName && strstr(kActions, (" " + command + " ").c_str()) != nullptr) {
         return command + ": done" + (params.empty() ? "" : " (" + params + ")");
     }
     return "unknown command: " + command;

@@ -1,11 +1,14 @@
 #include "common.h"
 
+#include <dirent.h>
+#include <fcntl.h>
 #include <limits.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
 
 #include <cstdlib>
 
+#include "platform/device_root.h"
 #include "platform/files.h"
 
 namespace device {
@@ -37,6 +40,21 @@ std::string SelinuxMode() {
     }
     const std::string text(mode, static_cast<size_t>(length));
     return text.substr(0, text.find('\n'));
+}
+
+std::set<std::string> FilesIn(const std::string& folder) {
+    std::set<std::string> names;
+    DIR* const files = fdopendir(openat(host::DeviceRoot(), folder.c_str(),
+                                        O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    while (const dirent* const file = files != nullptr ? readdir(files) : nullptr) {
+        names.insert(file->d_name);
+    }
+    if (files != nullptr) {
+        closedir(files);
+    }
+    names.erase(".");
+    names.erase("..");
+    return names;
 }
 
 std::string PathBesideProgram(const std::string& name) {

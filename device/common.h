@@ -2,13 +2,13 @@
 #pragma once
 
 #include <cstdint>
+#include <set>
 #include <string>
 
 namespace device {
 
 // The file that init holds a record lock on for its life.
 constexpr char kInitLock[] = "init.lock";
-// The properties that tell how the daemon is.
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
@@ -27,6 +27,9 @@ bool IsDaemonEnabled();
 
 // What `getenforce` prints: Enforcing, Permissive or Disabled.
 std::string SelinuxMode();
+
+// The names in a folder of the device root, sorted. Empty when there is no such folder.
+std::set<std::string> FilesIn(const std::string& folder);
 
 // The path of a file in the folder of the program that runs, links to which are resolved.
 std::string PathBesideProgram(const std::string& name);

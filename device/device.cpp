@@ -1,10 +1,10 @@
 // The virtual device for people and scripts: its life, and the ways into it. The kernel says who
 // runs it: init holds a record lock, and asking for that lock's holder takes nothing.
 #include <fcntl.h>
+#include <limits.h>
 #include <poll.h>
 #include <sys/file.h>
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -36,13 +36,25 @@ constexpr int kStartLimitMs = 10000;
 constexpr int kStopLimitMs = 5000;
 constexpr std::chrono::milliseconds kPollPause(5);
 
+constexpr char kUsage[] =
+        "usage: device start [--permissive]  boots it, SELinux Enforcing unless told otherwise;\n"
+        "                                    status 0 once its daemon is alive\n"
+        "       device stop | status | root  status 3 when it is stopped\n"
+        "       device shell [COMMAND...]    as `adb shell`\n"
+        "       device run [ARGUMENT...]     runs the tool; starts a stopped device, Permissive\n"
+        "       device trace [--bytes] [--json | --mermaid] ARGUMENT...\n"
+        "                                    runs the tool and shows what everybody did\n"
+        "       device fault [NAME [ARGUMENT] [COUNT] | none]\n"
+        "                                    gives the daemon a fault; alone: lists them\n";
+
+int Usage() {
+    fputs(kUsage, stderr);
+    return kWrongUse;
+}
+
 int Fail(const std::string& why) {
     fprintf(stderr, "device: %s\n", why.c_str());
     return 1;
-}
-
-void Say(const char* what) {
-    fprintf(stderr, "device: %s in %s\n", what, host::DeviceRootPath().c_str());
 }
 
 bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
@@ -88,61 +100,57 @@ bool IsCurrentBuild(pid_t init) {
            (!RunsOtherFile(daemon, "corvane_daemon") || !RunsOtherFile(daemon, "init"));
 }
 
-// Asks the process to end, and ends it when it does not. The descriptor stands for this one process
-// even when its number passes to another.
-bool EndProcess(int process) {
-    for (const int signal : {SIGTERM, SIGKILL}) {
-        pollfd ended = {process, POLLIN, 0};
-        if (pidfd_send_signal(process, signal, nullptr, 0) != 0 ||
-            poll(&ended, 1, kStopLimitMs) > 0) {
-            return true;
-        }
-    }
-    return false;
-}
-
-int Stop() {
+// Asks init to end, and ends it when it does not. The descriptor stands for this one process even
+// when its number passes to another.
+int Stop(int, char**) {
     const pid_t init = FindInit();
-    if (init == 0) {
+    const int process = init != 0 ? pidfd_open(init, 0) : -1;
+    // Init may have ended before the descriptor was there, which is then somebody else's.
+    if (process < 0 || FindInit() != init) {
+        close(process);
         return 0;
     }
-    const int process = pidfd_open(init, 0);
-    // Init may have ended before the descriptor was there, which is then somebody else's.
-    const bool isInit = process >= 0 && FindInit() == init;
-    const bool hasEnded = !isInit || EndProcess(process);
+    pollfd ended = {process, POLLIN, 0};
+    pidfd_send_signal(process, SIGTERM, nullptr, 0);
+    if (poll(&ended, 1, kStopLimitMs) == 0) {
+        pidfd_send_signal(process, SIGKILL, nullptr, 0);
+        poll(&ended, 1, kStopLimitMs);
+    }
     close(process);
-    if (!hasEnded) {
+    if (ended.revents == 0) {
         return Fail("process " + std::to_string(init) + " does not end");
     }
-    Say("stopped");
+    fputs("device: stopped\n", stderr);
     return 0;
 }
 
 int AwaitDaemon() {
-    const bool isUp = WaitUntil(kStartLimitMs, [] {
-        return device::IsDaemonAlive() || FindInit() == 0 || !device::IsDaemonEnabled();
+    WaitUntil(kStartLimitMs, [] {
+        return device::IsDaemonAlive() || !device::IsDaemonEnabled() || FindInit() == 0;
     });
-    if (device::IsDaemonAlive() && FindInit() != 0) {
-        return 0;
+    if (FindInit() == 0) {
+        return Fail("init has ended");
     }
-    return Fail(FindInit() == 0 ? "init has ended"
-                : isUp          ? "the daemon is stopped: odm.thp.service_enable is not 1"
-                       : "the daemon is not alive yet; `device shell logcat -d` may say why");
+    if (!device::IsDaemonEnabled()) {
+        return Fail("the daemon is stopped; `device shell tpd start` starts it");
+    }
+    return device::IsDaemonAlive()
+                   ? 0
+                   : Fail("the daemon is not alive; `device shell logcat -d` may say why");
 }
 
-// Starts init and waits until it has booted the device. What fails is said by init.
+// Starts init and waits until it has booted the device. What fails there is said by init.
 int Boot(const char* selinuxMode) {
     int report[2];
     if (pipe2(report, O_CLOEXEC) != 0) {
         return Fail(strerror(errno));
     }
+    const std::string program = device::PathBesideProgram("init");
     const pid_t init = fork();
     if (init == 0) {
         dup2(report[1], STDOUT_FILENO);
-        const std::string program = device::PathBesideProgram("init");
         execl(program.c_str(), program.c_str(), selinuxMode, nullptr);
-        Fail(program + ": " + strerror(errno));
-        _exit(1);
+        _exit(Fail(program + ": " + strerror(errno)));
     }
     close(report[1]);
     pollfd booted = {report[0], POLLIN, 0};
@@ -153,44 +161,52 @@ int Boot(const char* selinuxMode) {
     if (!isBooted) {
         return Fail("did not start");
     }
-    Say("started");
-    fprintf(stderr, "device: SELinux is %s\n", selinuxMode);
-    return 0;
+    fprintf(stderr, "device: started in %s, SELinux is %s\n", host::DeviceRootPath().c_str(),
+            selinuxMode);
+    return AwaitDaemon();
 }
 
-// Boots the device unless it runs already, from this build, and then leaves it as it is. Waits for
-// a start in progress.
-int Start(const char* selinuxMode) {
+// Boots the device unless it runs already, from this build: then it stays as it is. Waits for a
+// start in progress, which holds a lock on the root.
+int StartIfStopped(const char* selinuxMode) {
     const int root = openat(host::DeviceRoot(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
     if (!WaitUntil(2 * kStartLimitMs, [root] { return flock(root, LOCK_EX | LOCK_NB) == 0; })) {
         return Fail("another start does not end");
     }
     const pid_t init = FindInit();
-    if (init != 0 && IsCurrentBuild(init)) {
-        close(root);
-        return 0;
+    if (init != 0 && !IsCurrentBuild(init)) {
+        fputs("device: runs another build\n", stderr);
+        Stop(0, nullptr);
     }
-    if (init != 0) {
-        Say("another build runs");
-        Stop();
-    }
-    int status = Boot(selinuxMode);
-    status = status != 0 ? status : AwaitDaemon();
+    const int status = FindInit() != 0 ? 0 : Boot(selinuxMode);
     close(root);
     return status;
 }
 
-int Status() {
+int Start(int argc, char** argv) {
+    if (argc > 1 || (argc == 1 && argv[0] != std::string("--permissive"))) {
+        return Usage();
+    }
+    const int status = StartIfStopped(argc == 1 ? "Permissive" : "Enforcing");
+    return status != 0 ? status : AwaitDaemon();
+}
+
+int Status(int, char**) {
     const pid_t init = FindInit();
     if (init == 0) {
         puts("stopped");
         return kStopped;
     }
     printf("running in %s, process %d%s\n", host::DeviceRootPath().c_str(), init,
-           IsCurrentBuild(init) ? "" : ", from another build than this");
+           IsCurrentBuild(init) ? "" : ", another build");
     printf("daemon alive: %s, binder: %s, SELinux: %s\n",
            device::GetProperty(device::kDaemonAliveKey).c_str(),
            device::GetProperty(device::kDaemonBinderKey).c_str(), device::SelinuxMode().c_str());
+    return 0;
+}
+
+int Root(int, char**) {
+    puts(host::DeviceRootPath().c_str());
     return 0;
 }
 
@@ -205,14 +221,11 @@ int Become(const std::string& program, std::vector<const char*> arguments) {
     return Fail(program + ": " + strerror(errno));
 }
 
-// What `adb shell` is to a phone: the arguments, joined by spaces, are one shell command.
+// The arguments, joined by spaces, are one shell command, as for `adb shell`.
 int Shell(int argc, char** argv) {
-    std::string command;
-    for (int i = 0; i < argc; ++i) {
-        command += (i > 0 ? " " : "") + std::string(argv[i]);
-    }
-    if (argc == 0) {
-        return Become("/bin/sh", {"sh"});
+    std::string command = argc > 0 ? argv[0] : "exec sh";
+    for (int i = 1; i < argc; ++i) {
+        command.append(" ").append(argv[i]);
     }
     return Become("/bin/sh", {"sh", "-c", command.c_str()});
 }
@@ -223,63 +236,34 @@ int BecomeBeside(const char* name, int argc, char** argv) {
     return Become(device::PathBesideProgram(name), arguments);
 }
 
-int Usage() {
-    fputs("usage: device start [--permissive]  boots it; 0 once its daemon is alive\n"
-          "       device stop | status | root  status: 3 when it is stopped\n"
-          "       device shell [COMMAND...]    as `adb shell`\n"
-          "       device run [ARGUMENT...]     runs the tool; starts a stopped device, Permissive\n"
-          "       device trace [--bytes] [--json | --mermaid] ARGUMENT...\n"
-          "                                    runs the tool and shows what everybody did\n"
-          "       device fault [NAME [ARGUMENT] [COUNT] | none]\n"
-          "                                    gives the daemon a fault; alone: lists them\n",
-          stderr);
-    return kWrongUse;
+int Run(int argc, char** argv) {
+    const int status = StartIfStopped("Permissive");
+    return status != 0 ? status : BecomeBeside("bin/tpd", argc, argv);
 }
+
+int Trace(int argc, char** argv) {
+    return FindInit() != 0 ? BecomeBeside("trace.py", argc, argv) : Fail("is stopped");
+}
+
+int Fault(int argc, char** argv) {
+    return argc == 0 || FindInit() != 0 ? device::FaultCommand(argc, argv) : Fail("is stopped");
+}
+
+constexpr struct {
+    const char* name;
+    int maxArguments;
+    int (*run)(int argc, char** argv);
+} kVerbs[] = {{"start", 1, Start},       {"stop", 0, Stop},         {"status", 0, Status},
+              {"root", 0, Root},         {"shell", INT_MAX, Shell}, {"run", INT_MAX, Run},
+              {"trace", INT_MAX, Trace}, {"fault", 3, Fault}};
 
 }  // namespace
 
 int main(int argc, char** argv) {
-    const std::string verb = argc > 1 ? argv[1] : "";
-    const int count = argc - 2;
-    char** const arguments = argv + 2;
-    const bool permissive = count == 1 && arguments[0] == std::string("--permissive");
-    if (verb == "fault" && count == 0) {
-        return device::FaultCommand(0, nullptr);
+    for (const auto& verb : kVerbs) {
+        if (argc > 1 && argv[1] == std::string(verb.name) && argc - 2 <= verb.maxArguments) {
+            return host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
+        }
     }
-    const bool isLone = verb == "stop" || verb == "status" || verb == "root";
-    if (verb.empty() || (isLone && count > 0) || (verb == "start" && count > 0 && !permissive)) {
-        return Usage();
-    }
-    if (host::DeviceRoot() < 0) {
-        return 1;
-    }
-    if (verb == "start") {
-        const int status = Start(permissive ? "Permissive" : "Enforcing");
-        return status != 0 ? status : AwaitDaemon();
-    }
-    if (verb == "stop") {
-        return Stop();
-    }
-    if (verb == "status") {
-        return Status();
-    }
-    if (verb == "root") {
-        puts(host::DeviceRootPath().c_str());
-        return 0;
-    }
-    if (verb == "shell") {
-        return Shell(count, arguments);
-    }
-    if (verb == "run") {
-        const int status = Start("Permissive");
-        return status != 0 ? status : BecomeBeside("bin/tpd", count, arguments);
-    }
-    if (verb != "trace" && verb != "fault") {
-        return Usage();
-    }
-    if (FindInit() == 0) {
-        return Fail("is stopped; `device start` boots it");
-    }
-    return verb == "trace" ? BecomeBeside("trace.py", count, arguments)
-                           : device::FaultCommand(count, arguments);
+    return Usage();
 }

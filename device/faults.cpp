@@ -10,37 +10,29 @@ namespace device {
 
 namespace {
 
-constexpr int64_t kMaxSleepMs = 1'000'000'000;  // eleven days
+constexpr int64_t kMaxSleepMs = 1'000'000'000;
 constexpr int64_t kMaxTextBytes = 64 << 20;
 constexpr int kWrongUse = 2;
 
 constexpr Fault kFaults[] = {
-        {FaultKind::kDieBefore, "die_before", nullptr, 0, 0,
-         "the daemon dies before it works on the command; no reply"},
-        {FaultKind::kDieDuring, "die_during", nullptr, 0, 0,
-         "the daemon works on the command, then dies; no reply"},
-        {FaultKind::kDieAfter, "die_after", nullptr, 0, 0, "the daemon replies, then dies"},
-        {FaultKind::kRestart, "captest_restart", nullptr, 0, 0,
-         "as die_after, for the command captest only"},
-        {FaultKind::kHang, "hang", "MILLISECONDS", 0, kMaxSleepMs, "the reply comes late"},
-        {FaultKind::kStatus, "status", "STATUS", INT32_MIN, INT32_MAX,
-         "a status and no reply text"},
-        {FaultKind::kNoText, "no_text", nullptr, 0, 0, "a reply without a text"},
-        {FaultKind::kHuge, "huge", "BYTES", 0, kMaxTextBytes, "a reply text of that size"},
+        {FaultKind::kDieBefore, "die_before", "dies before it works on the command", nullptr, 0, 0},
+        {FaultKind::kDieDuring, "die_during", "works, then dies before it replies", nullptr, 0, 0},
+        {FaultKind::kDieAfter, "die_after", "replies, then dies", nullptr, 0, 0},
+        {FaultKind::kRestart, "captest_restart", "die_after, for captest only", nullptr, 0, 0},
+        {FaultKind::kHang, "hang", "replies late", "MILLISECONDS", 0, kMaxSleepMs},
+        {FaultKind::kStatus, "status", "replies with a status", "STATUS", INT32_MIN, INT32_MAX},
+        {FaultKind::kNoText, "no_text", "replies without a text", nullptr, 0, 0},
+        {FaultKind::kHuge, "huge", "replies with a long text", "BYTES", 0, kMaxTextBytes},
 };
 
 void ListFaults() {
     for (const Fault& fault : kFaults) {
-        const std::string name =
-                std::string(fault.name) + " " + (fault.argument != nullptr ? fault.argument : "");
-        printf("%-18s %s", name.c_str(), fault.effect);
+        printf("%-16s the daemon %s", fault.name, fault.effect);
         if (fault.argument != nullptr) {
-            printf(" (%lld to %lld)", static_cast<long long>(fault.min),
-                   static_cast<long long>(fault.max));
+            printf("; %s: %jd to %jd", fault.argument, intmax_t{fault.min}, intmax_t{fault.max});
         }
         putchar('\n');
     }
-    printf("%-18s the daemon behaves\n", "none");
 }
 
 bool IsNumberWithin(const char* text, int64_t min, int64_t max) {
@@ -51,20 +43,20 @@ bool IsNumberWithin(const char* text, int64_t min, int64_t max) {
 }
 
 int Refuse(const char* what, const char* why) {
-    fprintf(stderr, "device: fault %s: %s\n", what, why);
+    fprintf(stderr, "device: fault %s: %s; `device fault` lists what there is\n", what, why);
     return kWrongUse;
 }
 
 // The fault comes last, so that no call meets it with another one's argument.
 int SetFault(const char* name, const char* argument, const char* count) {
-    const bool set = __system_property_set("sim.fault", "") == 0 &&
-                     __system_property_set("sim.fault_arg", argument) == 0 &&
-                     __system_property_set("sim.fault_count", count) == 0 &&
-                     __system_property_set("sim.fault", name) == 0;
-    if (!set) {
-        fprintf(stderr, "device: fault: the device refuses the property\n");
+    const bool isSet = __system_property_set("sim.fault", "") == 0 &&
+                       __system_property_set("sim.fault_arg", argument) == 0 &&
+                       __system_property_set("sim.fault_count", count) == 0 &&
+                       __system_property_set("sim.fault", name) == 0;
+    if (!isSet) {
+        fputs("device: fault: the property is refused\n", stderr);
     }
-    return set ? 0 : 1;
+    return isSet ? 0 : 1;
 }
 
 }  // namespace
@@ -88,21 +80,20 @@ int FaultCommand(int argc, char** argv) {
     }
     const Fault* const fault = FindFault(argv[0]);
     if (fault == nullptr) {
-        return Refuse(argv[0], "no such fault; `device fault` lists them");
+        return Refuse(argv[0], "no such fault");
     }
-    const int countAt = fault->argument != nullptr ? 2 : 1;
-    if (argc < countAt || argc > countAt + 1) {
-        return Refuse(argv[0], fault->argument != nullptr ? "takes an argument, then a count"
-                                                          : "takes nothing but a count");
+    const int arguments = fault->argument != nullptr ? 1 : 0;
+    if (argc <= arguments || argc > arguments + 2) {
+        return Refuse(argv[0], arguments > 0 ? "takes an argument and a count" : "takes a count");
     }
-    if (fault->argument != nullptr && !IsNumberWithin(argv[1], fault->min, fault->max)) {
-        return Refuse(argv[1], "no number that this fault takes; `device fault` tells which");
+    if (arguments > 0 && !IsNumberWithin(argv[1], fault->min, fault->max)) {
+        return Refuse(argv[1], "not an argument of this fault");
     }
-    const char* const count = argc > countAt ? argv[countAt] : "";
+    const char* const count = argc > arguments + 1 ? argv[arguments + 1] : "";
     if (*count != '\0' && !IsNumberWithin(count, 1, INT32_MAX)) {
-        return Refuse(count, "no count of calls");
+        return Refuse(count, "not a count of calls");
     }
-    return SetFault(fault->name, fault->argument != nullptr ? argv[1] : "", count);
+    return SetFault(fault->name, arguments > 0 ? argv[1] : "", count);
 }
 
 }  // namespace device

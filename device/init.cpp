@@ -5,7 +5,6 @@
 // on standard output says that the device is booted; what fails before is said on standard error.
 // Ends on SIGTERM or SIGINT, or when the device root goes away.
 #include <android/log.h>
-#include <dirent.h>
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/inotify.h>
@@ -13,18 +12,18 @@
 #include <sys/signalfd.h>
 #include <sys/stat.h>
 #include <sys/system_properties.h>
+#include <sys/time.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <chrono>
 #include <csignal>
 #include <cstdio>
 #include <cstring>
-#include <functional>
+#include <set>
 #include <string>
-#include <vector>
+#include <tuple>
 
 #include "common.h"
 #include "platform/device_root.h"
@@ -34,16 +33,11 @@
 
 namespace {
 
-using device::GetProperty;
-using std::chrono::milliseconds;
-using std::chrono::steady_clock;
-
-constexpr char kTag[] = "init";
 constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 constexpr char kRestartsKey[] = "odm.thp.dae_reboot_times";
 // A daemon that was alive is back soon; the pause doubles for one that ends before it is.
-constexpr milliseconds kMinRestartPause(50);
-constexpr milliseconds kMaxRestartPause(5000);
+constexpr int kMinRestartPauseMs = 50;
+constexpr int kMaxRestartPauseMs = 5000;
 
 constexpr struct {
     const char* key;
@@ -56,33 +50,14 @@ constexpr struct {
         {device::kServiceEnableKey, "1"},
 };
 
-// Calls `visit` with the folder's descriptor and the name of each of its files. False when there is
-// no such folder.
-bool VisitFolder(const char* folder, const std::function<void(int, const std::string&)>& visit) {
-    const int descriptor =
-            openat(host::DeviceRoot(), folder, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
-    DIR* const files = descriptor >= 0 ? fdopendir(descriptor) : nullptr;
-    if (files == nullptr) {
-        return false;
-    }
-    while (const dirent* const file = readdir(files)) {
-        const std::string name = file->d_name;
-        if (name != "." && name != "..") {
-            visit(descriptor, name);
-        }
-    }
-    closedir(files);
-    return true;
-}
-
 // Empties a folder of the device root, but for the files whose names begin with `kept`.
-void ClearFolder(const char* folder, const char* kept = nullptr) {
+void ClearFolder(const std::string& folder, const char* kept = nullptr) {
     host::MakeFolders(host::DeviceRoot(), folder);
-    VisitFolder(folder, [kept](int descriptor, const std::string& name) {
+    for (const std::string& name : device::FilesIn(folder)) {
         if (kept == nullptr || name.rfind(kept, 0) != 0) {
-            unlinkat(descriptor, name.c_str(), 0);
+            unlinkat(host::DeviceRoot(), (folder + "/" + name).c_str(), 0);
         }
-    });
+    }
 }
 
 void ClearLeftovers() {
@@ -91,25 +66,23 @@ void ClearLeftovers() {
 }
 
 // Whether a boot, which empties folders, destroys nothing of anybody else's: the folder was booted
-// before, is empty, or has only what the tool and the device's commands make in a new root.
+// before, is empty, or has only what earlier versions, the tool and the device's commands make in a
+// root. Some of these names say little: alone, they do not make a device.
 bool IsDeviceRoot() {
-    const std::vector<std::string> telling = {"proc", "properties", "selinux", "settings", "trace"};
-    const std::vector<std::string> common = {"dev", "log", "tmp"};
-    bool isBooted = false;
-    size_t files = 0;
-    size_t tellingFiles = 0;
-    size_t commonFiles = 0;
-    VisitFolder(".", [&](int, const std::string& name) {
-        isBooted |= name == device::kInitLock;
-        ++files;
-        tellingFiles += static_cast<size_t>(std::count(telling.begin(), telling.end(), name));
-        commonFiles += static_cast<size_t>(std::count(common.begin(), common.end(), name));
-    });
-    return isBooted || files == 0 || (tellingFiles > 0 && tellingFiles + commonFiles == files);
+    const std::set<std::string> files = device::FilesIn(".");
+    const std::set<std::string> common = {"dev", "log", "tmp"};
+    std::set<std::string> own = {"init.pid", "proc", "properties", "selinux", "settings", "trace"};
+    own.insert(common.begin(), common.end());
+    const auto areAmong = [&files](const std::set<std::string>& names) {
+        return std::includes(names.begin(), names.end(), files.begin(), files.end());
+    };
+    return files.empty() || files.count(device::kInitLock) > 0 ||
+           (areAmong(own) && !areAmong(common));
 }
 
 // The state of a device that has just been switched on: what persists, and the boot properties.
 bool Boot(const std::string& selinuxMode) {
+    host::TraceEvent("boot");
     ClearLeftovers();
     ClearFolder("properties", "persist.");
     for (const auto& property : kBootProperties) {
@@ -117,85 +90,15 @@ bool Boot(const std::string& selinuxMode) {
             return false;
         }
     }
-    host::TraceEvent("boot");
     return host::WriteFile(host::kLogFile, "") && host::ReplaceFile("selinux", selinuxMode + "\n");
 }
 
 class DaemonMinder {
   public:
-    // How long poll() may wait for something else, in its unit.
-    int MsUntilStart() const {
-        if (!mIsStartPlanned) {
-            return -1;
-        }
-        const auto left = std::chrono::ceil<milliseconds>(mStartTime - steady_clock::now());
-        return static_cast<int>(std::max<milliseconds::rep>(left.count(), 0));
-    }
-
-    void StartIfDue() {
-        if (mIsStartPlanned && steady_clock::now() >= mStartTime) {
-            Start();
-        }
-    }
-
-    void Stop() {
-        mIsStartPlanned = false;
-        if (mDaemon > 0) {
-            host::TraceEvent("daemon_stop").Add("daemon", mDaemon);
-            kill(mDaemon, SIGKILL);
-            waitpid(mDaemon, nullptr, 0);
-            DaemonGone();
-        }
-    }
-
-    // After any change of the enabling property. Each change but the last may have been overtaken
-    // by the next before it was read: "1" for a running daemon means that a "0" was.
-    void FollowServiceEnable() {
-        struct stat status = {};
-        const std::string path = std::string("properties/") + device::kServiceEnableKey;
-        if (fstatat(host::DeviceRoot(), path.c_str(), &status, 0) != 0 ||
-            (status.st_ino == mSeenInode && status.st_ctim.tv_sec == mSeenTime.tv_sec &&
-             status.st_ctim.tv_nsec == mSeenTime.tv_nsec)) {
-            return;
-        }
-        mSeenInode = status.st_ino;
-        mSeenTime = status.st_ctim;
-        Restart();
-    }
-
-    void Restart() {
-        Stop();
-        mPause = kMinRestartPause;
-        if (device::IsDaemonEnabled()) {
-            Start();
-        }
-    }
-
-    void ReapDaemon() {
-        int status = 0;
-        if (mDaemon <= 0 || waitpid(mDaemon, &status, WNOHANG) != mDaemon) {
-            return;
-        }
-        const bool signalled = WIFSIGNALED(status);
-        host::TraceEvent("daemon_exit")
-                .Add("daemon", mDaemon)
-                .Add(signalled ? "signal" : "status",
-                     signalled ? WTERMSIG(status) : WEXITSTATUS(status));
-        const bool wasAlive = device::IsDaemonAlive();
-        DaemonGone();
-        const int64_t restarts = device::GetPropertyNumber(kRestartsKey) + 1;
-        __system_property_set(kRestartsKey, std::to_string(restarts).c_str());
-        if (wasAlive) {
-            mPause = kMinRestartPause;
-        }
-        if (device::IsDaemonEnabled()) {
-            PlanStart();
-        }
-    }
-
-  private:
     void Start() {
-        mIsStartPlanned = false;
+        if (mDaemon > 0 || !device::IsDaemonEnabled()) {
+            return;
+        }
         const pid_t init = getpid();
         mDaemon = fork();
         if (mDaemon == 0) {
@@ -205,6 +108,60 @@ class DaemonMinder {
         } else {
             host::TraceEvent("daemon_start").Add("daemon", mDaemon);
         }
+    }
+
+    void Stop() {
+        if (mDaemon > 0) {
+            host::TraceEvent("daemon_stop").Add("daemon", mDaemon);
+            kill(mDaemon, SIGKILL);
+            waitpid(mDaemon, nullptr, 0);
+            DaemonGone();
+        }
+    }
+
+    // What changed until the daemon has ended is followed with this.
+    void Restart() {
+        Stop();
+        mPauseMs = kMinRestartPauseMs;
+        mFollowed = EnablingWrite();
+        Start();
+    }
+
+    // After each write of the enabling property that was not followed yet. Each but the last may
+    // have been overtaken by the next: "1" for a running daemon means that a "0" was.
+    void FollowServiceEnable() {
+        if (EnablingWrite() != mFollowed) {
+            Restart();
+        }
+    }
+
+    void ReapDaemon() {
+        int status = 0;
+        if (mDaemon <= 0 || waitpid(mDaemon, &status, WNOHANG) != mDaemon) {
+            return;
+        }
+        host::TraceEvent("daemon_exit")
+                .Add("daemon", mDaemon)
+                .Add(WIFSIGNALED(status) ? "signal" : "status",
+                     WIFSIGNALED(status) ? WTERMSIG(status) : WEXITSTATUS(status));
+        if (device::IsDaemonAlive()) {
+            mPauseMs = kMinRestartPauseMs;
+        }
+        DaemonGone();
+        const int64_t restarts = device::GetPropertyNumber(kRestartsKey) + 1;
+        __system_property_set(kRestartsKey, std::to_string(restarts).c_str());
+        PlanStart();
+    }
+
+  private:
+    // The file and its time: of no two writes the same.
+    using Write = std::tuple<ino_t, time_t, int64_t>;
+
+    static Write EnablingWrite() {
+        struct stat status = {};
+        const std::string path = std::string("properties/") + device::kServiceEnableKey;
+        fstatat(host::DeviceRoot(), path.c_str(), &status, AT_SYMLINK_NOFOLLOW);
+        return {status.st_ino, status.st_ctim.tv_sec, status.st_ctim.tv_nsec};
     }
 
     // Whatever becomes of init, its daemon goes with it: also when init is gone before this begins.
@@ -220,15 +177,16 @@ class DaemonMinder {
         _exit(127);
     }
 
+    // SIGALRM comes after the pause.
     void PlanStart() {
-        if (mPause == kMinRestartPause * 2) {
-            __android_log_print(ANDROID_LOG_ERROR, kTag,
+        if (mPauseMs == kMinRestartPauseMs * 2) {
+            __android_log_print(ANDROID_LOG_ERROR, nullptr,
                                 "corvane_daemon does not come up; trying again at growing pauses");
         }
-        host::TraceEvent("restart_pause").Add("ms", mPause.count());
-        mStartTime = steady_clock::now() + mPause;
-        mIsStartPlanned = true;
-        mPause = std::min(mPause * 2, kMaxRestartPause);
+        host::TraceEvent("restart_pause").Add("ms", mPauseMs);
+        const itimerval pause = {{0, 0}, {mPauseMs / 1000, mPauseMs % 1000 * 1000}};
+        setitimer(ITIMER_REAL, &pause, nullptr);
+        mPauseMs = std::min(mPauseMs * 2, kMaxRestartPauseMs);
     }
 
     void DaemonGone() {
@@ -240,12 +198,20 @@ class DaemonMinder {
     }
 
     pid_t mDaemon = -1;
-    bool mIsStartPlanned = false;
-    steady_clock::time_point mStartTime;
-    milliseconds mPause = kMinRestartPause;  // before the next start
-    ino_t mSeenInode = 0;
-    timespec mSeenTime = {};
+    int mPauseMs = kMinRestartPauseMs;  // before the next start
+    Write mFollowed;
 };
+
+// Whether init goes on.
+bool HandleSignal(int signals, DaemonMinder& minder) {
+    signalfd_siginfo signal = {};
+    const bool isRead = read(signals, &signal, sizeof(signal)) == sizeof(signal);
+    if (isRead && signal.ssi_signo == SIGALRM) {
+        minder.Start();
+    }
+    minder.ReapDaemon();
+    return isRead && (signal.ssi_signo == SIGALRM || signal.ssi_signo == SIGCHLD);
+}
 
 // Whether the folder of properties is still there after these events.
 bool HandlePropertyEvents(int watch, DaemonMinder& minder) {
@@ -261,16 +227,11 @@ bool HandlePropertyEvents(int watch, DaemonMinder& minder) {
         if (overflow || strcmp(event->name, device::kServiceEnableKey) == 0) {
             minder.FollowServiceEnable();
         } else if (strcmp(event->name, kUpdatingFirmwareKey) == 0 &&
-                   GetProperty(kUpdatingFirmwareKey) == "true") {
+                   device::GetProperty(kUpdatingFirmwareKey) == "true") {
             minder.Restart();
         }
     }
     return true;
-}
-
-int Fail(const char* what, const char* why) {
-    fprintf(stderr, "init: %s: %s\n", what, why);
-    return 1;
 }
 
 // Signal handling, descriptors, session and folder as they are for no caller in particular.
@@ -298,7 +259,7 @@ bool LockDevice() {
 int OpenSignals() {
     sigset_t signals;
     sigemptyset(&signals);
-    for (const int each : {SIGCHLD, SIGTERM, SIGINT}) {
+    for (const int each : {SIGALRM, SIGCHLD, SIGINT, SIGTERM}) {
         sigaddset(&signals, each);
     }
     sigprocmask(SIG_SETMASK, &signals, nullptr);
@@ -308,9 +269,8 @@ int OpenSignals() {
 int OpenPropertyWatch() {
     const int watch = inotify_init1(IN_CLOEXEC);
     const std::string folder = host::DeviceRootPath() + "/properties";
-    const bool watches = inotify_add_watch(watch, folder.c_str(),
-                                           IN_MOVED_TO | IN_DELETE_SELF | IN_MOVE_SELF) >= 0;
-    return watches ? watch : -1;
+    constexpr uint32_t kEvents = IN_MOVED_TO | IN_DELETE_SELF | IN_MOVE_SELF;
+    return inotify_add_watch(watch, folder.c_str(), kEvents) >= 0 ? watch : -1;
 }
 
 // Tells that the device is booted and lets go of whoever waits for that.
@@ -322,30 +282,9 @@ void ReportBoot() {
     }
 }
 
-void Run(int signals, int watch) {
-    DaemonMinder minder;
-    minder.FollowServiceEnable();
-    pollfd waits[] = {{signals, POLLIN, 0}, {watch, POLLIN, 0}};
-    for (bool running = true; running;) {
-        if (poll(waits, std::size(waits), minder.MsUntilStart()) < 0) {
-            continue;
-        }
-        host::LookForTrace();
-        if (waits[0].revents != 0) {
-            signalfd_siginfo signal = {};
-            running = read(signals, &signal, sizeof(signal)) == sizeof(signal) &&
-                      signal.ssi_signo == SIGCHLD;
-            minder.ReapDaemon();
-        }
-        if (running && waits[1].revents != 0) {
-            running = HandlePropertyEvents(watch, minder);
-        }
-        if (running) {
-            minder.StartIfDue();
-        }
-    }
-    minder.Stop();
-    ClearLeftovers();
+int Fail(const char* what, const char* why) {
+    fprintf(stderr, "init: %s: %s\n", what, why);
+    return 1;
 }
 
 }  // namespace
@@ -354,9 +293,8 @@ int main(int argc, char** argv) {
     if (!LeaveCaller() || host::DeviceRoot() < 0) {
         return 1;
     }
-    const std::string root = host::DeviceRootPath();
     if (!IsDeviceRoot()) {
-        return Fail(root.c_str(), "holds files that are no device's; take an empty folder");
+        return Fail(host::DeviceRootPath().c_str(), "has files that are no device's; nothing done");
     }
     if (!LockDevice()) {
         return Fail("this device runs already", strerror(errno));
@@ -370,6 +308,17 @@ int main(int argc, char** argv) {
         return Fail("cannot watch the properties", strerror(errno));
     }
     ReportBoot();
-    Run(signals, watch);
+    DaemonMinder minder;
+    minder.Restart();
+    pollfd waits[] = {{signals, POLLIN, 0}, {watch, POLLIN, 0}};
+    for (bool running = true; running;) {
+        if (poll(waits, std::size(waits), -1) > 0) {
+            host::LookForTrace();
+            running = (waits[0].revents == 0 || HandleSignal(signals, minder)) &&
+                      (waits[1].revents == 0 || HandlePropertyEvents(watch, minder));
+        }
+    }
+    minder.Stop();
+    ClearLeftovers();
     return 0;
 }

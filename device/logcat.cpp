@@ -1,22 +1,21 @@
 #include "logcat.h"
 
-#include <android/log.h>
 #include <fcntl.h>
 #include <getopt.h>
+#include <strings.h>
+#include <sys/stat.h>
 #include <time.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <cctype>
 #include <cerrno>
-#include <chrono>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <deque>
 #include <map>
+#include <set>
 #include <string>
-#include <thread>
 
 #include "platform/device_root.h"
 #include "platform/files.h"
@@ -26,11 +25,10 @@ namespace device {
 
 namespace {
 
-constexpr std::chrono::milliseconds kFollowPause(50);
-// More than any entry has: a longer one is no entry.
-constexpr size_t kMaxEntryBytes = 1 << 20;
-constexpr size_t kTagWidth = 8;
-constexpr char kAllTags[] = "*";
+constexpr timespec kFollowPause = {0, 50'000'000};
+constexpr uint32_t kMaxEntryBytes = 1 << 20;  // what is longer is no entry
+constexpr size_t kTagWidth = 8;               // columns, as on a device
+constexpr char kOtherTags[] = "*";
 
 constexpr char kUsage[] =
         "usage: logcat [-d] [-c] [-t COUNT] [-f FILE] [-s] [-v FORMAT] [TAG[:PRIORITY]...]\n"
@@ -55,92 +53,63 @@ struct Options {
     size_t last = SIZE_MAX;  // how many entries to begin with
     const char* file = nullptr;
     std::string format = "threadtime";
-    std::map<std::string, int> filters = {{kAllTags, ANDROID_LOG_VERBOSE}};  // lowest shown
+    std::map<std::string, int> filters = {{kOtherTags, ANDROID_LOG_VERBOSE}};  // lowest shown
 };
 
-// The priority of the letter, or -1.
-int PriorityOf(const std::string& letter) {
-    for (int priority = ANDROID_LOG_VERBOSE; priority <= ANDROID_LOG_SILENT; ++priority) {
-        if (letter.length() == 1 &&
-            toupper(static_cast<unsigned char>(letter[0])) == host::LogPriorityLetter(priority)) {
-            return priority;
-        }
-    }
-    return -1;
-}
-
 bool AddFilter(const std::string& filter, Options& options) {
-    const size_t colon = filter.rfind(':');
-    const int priority = colon == std::string::npos ? static_cast<int>(ANDROID_LOG_VERBOSE)
-                                                    : PriorityOf(filter.substr(colon + 1));
+    const size_t colon = std::min(filter.rfind(':'), filter.length());
+    const std::string letter = colon < filter.length() ? filter.substr(colon + 1) : "V";
+    int priority = ANDROID_LOG_VERBOSE;
+    while (priority <= ANDROID_LOG_SILENT &&
+           strcasecmp(letter.c_str(), std::string(1, host::LogPriorityLetter(priority)).c_str())) {
+        ++priority;
+    }
     options.filters[filter.substr(0, colon)] = priority;
-    return priority >= 0 && colon != 0 && !filter.empty();
-}
-
-bool ParseCount(const char* text, size_t& count) {
-    char* end = nullptr;
-    errno = 0;
-    count = strtoul(text, &end, 10);
-    return isdigit(static_cast<unsigned char>(*text)) != 0 && *end == '\0' && errno == 0;
+    return colon > 0 && priority <= ANDROID_LOG_SILENT;
 }
 
 // False for wrong use.
 bool ParseOptions(int argc, char** argv, Options& options) {
+    const std::set<std::string> formats = {"threadtime", "brief", "epoch", "raw"};
+    char* end = argv[0] + strlen(argv[0]);
     for (int option = 0; (option = getopt(argc, argv, "dct:f:sv:")) != -1;) {
-        switch (option) {
-            case 'd':
-                options.follows = false;
-                break;
-            case 'c':
-                options.clears = true;
-                break;
-            case 't':
-                options.follows = false;
-                if (!ParseCount(optarg, options.last)) {
-                    return false;
-                }
-                break;
-            case 'f':
-                options.file = optarg;
-                break;
-            case 's':
-                options.filters[kAllTags] = ANDROID_LOG_SILENT;
-                break;
-            case 'v':
-                options.format = optarg;
-                if (options.format != "threadtime" && options.format != "brief" &&
-                    options.format != "epoch" && options.format != "raw") {
-                    return false;
-                }
-                break;
-            default:
-                return false;
+        options.clears |= option == 'c';
+        options.follows &= option != 'd' && option != 't';
+        if (option == 't') {
+            options.last = strtoul(optarg, &end, 10);
+        } else if (option == 'f') {
+            options.file = optarg;
+        } else if (option == 's') {
+            options.filters[kOtherTags] = ANDROID_LOG_SILENT;
+        } else if (option == 'v') {
+            options.format = optarg;
         }
-    }
-    for (; optind < argc; ++optind) {
-        if (!AddFilter(argv[optind], options)) {
+        if (option == '?' || *end != '\0' || end == optarg || formats.count(options.format) == 0) {
             return false;
         }
     }
-    return true;
+    return std::all_of(argv + optind, argv + argc,
+                       [&options](const char* filter) { return AddFilter(filter, options); });
 }
 
 bool IsShown(const Entry& entry, const Options& options) {
-    auto filter = options.filters.find(entry.tag);
-    if (filter == options.filters.end()) {
-        filter = options.filters.find(kAllTags);
-    }
-    return entry.priority >= filter->second && filter->second != ANDROID_LOG_SILENT;
+    const auto filter = options.filters.find(entry.tag);
+    const int lowest =
+            filter != options.filters.end() ? filter->second : options.filters.at(kOtherTags);
+    return entry.priority >= lowest && lowest != ANDROID_LOG_SILENT;
 }
 
 // What stands before each line of the entry.
 std::string LineHeader(const Entry& entry, const std::string& format) {
     const host::LogEntryHeader& header = entry.header;
-    const char letter = host::LogPriorityLetter(entry.priority);
     const std::string tag =
             entry.tag + std::string(kTagWidth - std::min(kTagWidth, entry.tag.length()), ' ');
+    const char letter = host::LogPriorityLetter(entry.priority);
     char fields[96] = "";
     char when[32] = "";
+    if (format == "raw") {
+        return "";
+    }
     if (format == "brief") {
         snprintf(fields, sizeof(fields), "(%5d): ", header.pid);
         return std::string{letter, '/'} + tag + fields;
@@ -160,8 +129,7 @@ std::string LineHeader(const Entry& entry, const std::string& format) {
 
 // An entry of several lines is shown as several lines with the same header.
 void Print(const Entry& entry, const Options& options) {
-    const std::string header =
-            options.format == "raw" ? std::string() : LineHeader(entry, options.format);
+    const std::string header = LineHeader(entry, options.format);
     size_t begin = 0;
     do {
         const size_t end = std::min(entry.text.find('\n', begin), entry.text.length());
@@ -170,58 +138,29 @@ void Print(const Entry& entry, const Options& options) {
     } while (begin < entry.text.length());
 }
 
-class LogReader {
-  public:
-    LogReader()
-        : mFile(openat(host::DeviceRoot(), host::kLogFile,
-                       O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC)) {}
-    LogReader(const LogReader&) = delete;
-    LogReader& operator=(const LogReader&) = delete;
-    ~LogReader() { close(mFile); }
-
-    bool IsOpen() const { return mFile >= 0; }
-
-    // Whether there was a next entry. A log that was emptied meanwhile is read from its beginning.
-    bool Next(Entry& entry) {
-        if (lseek(mFile, 0, SEEK_END) < mOffset) {
-            mOffset = 0;
-        }
-        host::LogEntryHeader& header = entry.header;
-        if (pread(mFile, &header, sizeof(header), mOffset) != sizeof(header) ||
-            header.size > kMaxEntryBytes) {
-            return false;
-        }
-        std::string content(header.size, '\0');
-        const off_t at = mOffset + static_cast<off_t>(sizeof(header));
-        if (pread(mFile, content.data(), content.size(), at) !=
-            static_cast<ssize_t>(content.size())) {
-            return false;
-        }
-        mOffset = at + static_cast<off_t>(content.size());
-        entry.priority = static_cast<unsigned char>(content[0]);
-        entry.tag = content.c_str() + std::min<size_t>(1, content.size());
-        entry.text = content.c_str() + std::min(2 + entry.tag.length(), content.size());
-        return true;
+// Reads the entry at `offset` and moves that behind it. False when there is no whole one yet. A log
+// that was emptied meanwhile is read from its beginning.
+bool ReadEntry(int log, off_t& offset, Entry& entry) {
+    struct stat status = {};
+    if (fstat(log, &status) == 0 && status.st_size < offset) {
+        offset = 0;
     }
-
-  private:
-    const int mFile;
-    off_t mOffset = 0;
-};
-
-void PrintLast(LogReader& log, const Options& options) {
-    std::deque<Entry> last;
-    for (Entry entry = {}; log.Next(entry);) {
-        if (IsShown(entry, options)) {
-            last.push_back(entry);
-        }
-        if (last.size() > options.last) {
-            last.pop_front();
-        }
+    constexpr ssize_t kHeaderBytes = sizeof(entry.header);
+    if (pread(log, &entry.header, kHeaderBytes, offset) != kHeaderBytes ||
+        entry.header.size > kMaxEntryBytes) {
+        return false;
     }
-    for (const Entry& entry : last) {
-        Print(entry, options);
+    const ssize_t size = entry.header.size;
+    // Two more zeros end whatever a damaged entry does not.
+    std::string content(static_cast<size_t>(size) + 2, '\0');
+    if (pread(log, content.data(), static_cast<size_t>(size), offset + kHeaderBytes) != size) {
+        return false;
     }
+    offset += kHeaderBytes + size;
+    entry.priority = content[0];
+    entry.tag = content.c_str() + 1;
+    entry.text = content.c_str() + std::min(content.size() - 1, 2 + entry.tag.length());
+    return true;
 }
 
 int Fail(const char* what) {
@@ -240,22 +179,29 @@ int Logcat(int argc, char** argv) {
     if (options.clears) {
         return host::WriteFile(host::kLogFile, "") ? 0 : Fail("cannot empty the log");
     }
+    const int log = openat(host::DeviceRoot(), host::kLogFile,
+                           O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+    if (log < 0) {
+        return Fail("no log");
+    }
     if (options.file != nullptr && freopen(options.file, "a", stdout) == nullptr) {
         return Fail(options.file);
     }
-    LogReader log;
-    if (!log.IsOpen()) {
-        return Fail("no log");
-    }
-    PrintLast(log, options);
-    while (options.follows && fflush(stdout) == 0) {
-        std::this_thread::sleep_for(kFollowPause);
-        for (Entry entry = {}; log.Next(entry);) {
+    off_t offset = 0;
+    do {
+        std::deque<Entry> entries;
+        for (Entry entry = {}; ReadEntry(log, offset, entry);) {
             if (IsShown(entry, options)) {
-                Print(entry, options);
+                entries.push_back(entry);
+            }
+            if (entries.size() > options.last) {
+                entries.pop_front();
             }
         }
-    }
+        for (const Entry& entry : entries) {
+            Print(entry, options);
+        }
+    } while (fflush(stdout) == 0 && options.follows && nanosleep(&kFollowPause, nullptr) == 0);
     return 0;
 }
 

@@ -1,7 +1,5 @@
 // The device's shell commands in one program, which is found by the name that it is called by. They
 // use the platform's own calls, so that the rules for names, sizes and access are one set.
-#include <dirent.h>
-#include <fcntl.h>
 #include <strings.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
@@ -10,7 +8,6 @@
 #include <csignal>
 #include <cstdio>
 #include <cstring>
-#include <set>
 #include <string>
 
 #include "common.h"
@@ -27,20 +24,9 @@ int Usage(const char* usage) {
     return 1;
 }
 
-// The names in a folder of the device root, sorted. Empty when there is no such folder.
-std::set<std::string> FilesIn(const std::string& folder) {
-    std::set<std::string> names;
-    const int descriptor = openat(host::DeviceRoot(), folder.c_str(),
-                                  O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
-    if (DIR* const files = fdopendir(descriptor); files != nullptr) {
-        while (const dirent* const file = readdir(files)) {
-            if (file->d_name[0] != '.') {
-                names.insert(file->d_name);
-            }
-        }
-        closedir(files);
-    }
-    return names;
+int Fail(const char* what) {
+    fprintf(stderr, "%s: %s\n", what, strerror(errno));
+    return 1;
 }
 
 int Getprop(int argc, char** argv) {
@@ -51,7 +37,7 @@ int Getprop(int argc, char** argv) {
         puts(device::GetProperty(argv[1]).c_str());
         return 0;
     }
-    for (const std::string& name : FilesIn("properties")) {
+    for (const std::string& name : device::FilesIn("properties")) {
         printf("[%s]: [%s]\n", name.c_str(), device::GetProperty(name.c_str()).c_str());
     }
     return 0;
@@ -81,18 +67,13 @@ int Getenforce(int argc, char** /* argv */) {
 }
 
 int Setenforce(int argc, char** argv) {
-    const char* const wanted = argc == 2 ? argv[1] : "";
-    const char* mode = nullptr;
-    if (strcmp(wanted, "0") == 0 || strcasecmp(wanted, "permissive") == 0) {
-        mode = "Permissive\n";
-    } else if (strcmp(wanted, "1") == 0 || strcasecmp(wanted, "enforcing") == 0) {
-        mode = "Enforcing\n";
-    } else {
+    const std::string wanted = argc == 2 ? argv[1] : "";
+    const bool isPermissive = wanted == "0" || strcasecmp(wanted.c_str(), "permissive") == 0;
+    if (!isPermissive && wanted != "1" && strcasecmp(wanted.c_str(), "enforcing") != 0) {
         return Usage("setenforce enforcing|permissive|1|0");
     }
-    if (!host::ReplaceFile("selinux", mode)) {
-        fprintf(stderr, "setenforce: %s\n", strerror(errno));
-        return 1;
+    if (!host::ReplaceFile("selinux", isPermissive ? "Permissive\n" : "Enforcing\n")) {
+        return Fail("setenforce");
     }
     return 0;
 }
@@ -104,35 +85,38 @@ bool IsPlainName(const std::string& name) {
 std::string GetSetting(const std::string& path) {
     std::string value(kMaxSettingBytes, '\0');
     const ssize_t length = host::ReadFile(path, value.data(), value.size());
-    value.resize(length > 0 ? static_cast<size_t>(length) : 0);
-    return length >= 0 ? value : "null";
+    return length < 0 ? "null" : value.substr(0, static_cast<size_t>(length));
 }
 
 int Settings(int argc, char** argv) {
     const std::string verb = argc > 1 ? argv[1] : "";
     const std::string space = argc > 2 ? argv[2] : "";
     const std::string key = argc > 3 ? argv[3] : "";
-    const int wanted = verb == "list" ? 3 : verb == "put" ? 5 : 4;
-    if ((verb != "put" && verb != "get" && verb != "delete" && verb != "list") || argc != wanted ||
-        (space != "system" && space != "secure" && space != "global") ||
-        (verb != "list" && !IsPlainName(key))) {
-        return Usage("settings put|get|delete|list system|secure|global [KEY [VALUE]]");
-    }
     const std::string folder = "settings/" + space;
     const std::string path = folder + "/" + key;
-    if (verb == "list") {
-        for (const std::string& name : FilesIn(folder)) {
+    const bool isListed = verb == "list" && argc == 3;
+    if ((space != "system" && space != "secure" && space != "global") ||
+        (!isListed && !IsPlainName(key))) {
+        argc = 0;
+    }
+    if (isListed && argc > 0) {
+        for (const std::string& name : device::FilesIn(folder)) {
             printf("%s=%s\n", name.c_str(), GetSetting(folder + "/" + name).c_str());
         }
-    } else if (verb == "get") {
-        puts(GetSetting(path).c_str());
-    } else if (verb == "delete") {
-        printf("Deleted %d rows\n", unlinkat(host::DeviceRoot(), path.c_str(), 0) == 0 ? 1 : 0);
-    } else if (strlen(argv[4]) > kMaxSettingBytes || !host::ReplaceFile(path, argv[4])) {
-        fprintf(stderr, "settings: cannot store %s\n", key.c_str());
-        return 1;
+        return 0;
     }
-    return 0;
+    if (verb == "get" && argc == 4) {
+        puts(GetSetting(path).c_str());
+        return 0;
+    }
+    if (verb == "delete" && argc == 4) {
+        printf("Deleted %d rows\n", unlinkat(host::DeviceRoot(), path.c_str(), 0) == 0 ? 1 : 0);
+        return 0;
+    }
+    if (verb == "put" && argc == 5 && strlen(argv[4]) <= kMaxSettingBytes) {
+        return host::ReplaceFile(path, argv[4]) ? 0 : Fail("settings");
+    }
+    return Usage("settings put|get|delete|list system|secure|global [KEY [VALUE]]");
 }
 
 constexpr struct {
@@ -146,8 +130,7 @@ int Finish(int status) {
     if ((fflush(stdout) == 0 && ferror(stdout) == 0) || errno == EPIPE) {
         return status;
     }
-    fprintf(stderr, "%s: %s\n", program_invocation_short_name, strerror(errno));
-    return 1;
+    return Fail(program_invocation_short_name);
 }
 
 }  // namespace

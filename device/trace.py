@@ -21,47 +21,42 @@ def shown(text):
     return "".join(c if c.isprintable() else repr(c)[1:-1] for c in text)
 
 
-def ending(status):
-    """How a process ended that left this wait status"""
-    if os.WIFSIGNALED(status):
-        return f"ended by {signal.Signals(os.WTERMSIG(status)).name}"
-    return f"status {os.WEXITSTATUS(status)}"
-
-
+# `way`, `size` and `end` are made from other fields.
 DESCRIPTIONS = {
-    "property_read": lambda e: f"reads {e['name']}: \"{e['value']}\"",
-    "property_write": lambda e: f"writes {e['name']}: \"{e['old']}\" -> \"{e['new']}\""
-                                + (", refused" if e["status"] else ""),
-    "log": lambda e: f"logs {e['priority']} {e['tag']}: {e['text']}",
-    "pause": lambda e: f"pauses {e['us']} us",
-    "shell": lambda e: f"runs {e['command']}: {ending(e['status'])}",
-    "lookup": lambda e: f"looks {e['service']} up: {'found' if e['found'] else 'not found'}"
-                        f" after {e['us']} us",
-    "link_to_death": lambda e: f"links its death recipient: status {e['status']}",
-    "unlink_to_death": lambda e: f"unlinks its death recipient: status {e['status']}",
-    "binder_died": lambda e: "is told that the binder died",
-    "call": lambda e: f"calls code {e['code']}, {'one-way' if e['flags'] & 1 else 'two-way'},"
-                      f" flags {e['flags']:#x}, {len(e['request']) // 2} bytes",
-    "reply": lambda e: f"has its reply: status {e['status']}, {e['bytes']} bytes"
-                       f" after {e['us']} us",
-    "publish": lambda e: f"publishes {e['service']}",
-    "command": lambda e: f"is given {e['command']}, parameters \"{e['params']}\"",
-    "fault": lambda e: f"has the fault {e['name']} {e['argument']}",
-    "answer": lambda e: f"answers: status {e['status']}, {e['bytes']} bytes",
-    "daemon_start": lambda e: f"starts the daemon, process {e['daemon']}",
-    "daemon_stop": lambda e: f"stops the daemon, process {e['daemon']}",
-    "daemon_exit": lambda e: f"sees the daemon's end, process {e['daemon']}: "
-                             + ending(e.get("signal", 0) | e.get("status", 0) << 8),
-    "restart_pause": lambda e: f"waits {e['ms']} ms before it starts the daemon",
+    "property_read": 'reads {name}: "{value}"',
+    "property_write": 'writes {name}: "{old}" -> "{new}", status {status}',
+    "log": "logs {priority} {tag}: {text}",
+    "pause": "pauses {us} us",
+    "shell": "runs {command}: {end}",
+    "lookup": "looks {service} up: found {found}, after {us} us",
+    "link_to_death": "links its death recipient: status {status}",
+    "unlink_to_death": "unlinks its death recipient: status {status}",
+    "binder_died": "learns that the binder died",
+    "call": "calls code {code}, {way}, flags {flags}, {size} bytes",
+    "reply": "has its reply: status {status}, {bytes} bytes, after {us} us",
+    "publish": "publishes {service}",
+    "command": 'receives {command}, parameters "{params}"',
+    "fault": "has the fault {name} {argument}",
+    "answer": "answers: status {status}, {bytes} bytes",
+    "daemon_start": "starts the daemon, process {daemon}",
+    "daemon_stop": "stops the daemon, process {daemon}",
+    "daemon_exit": "sees the daemon end, process {daemon}: {end}",
+    "restart_pause": "waits {ms} ms before it starts the daemon",
 }
 ARROWS = {"call": "tool->>daemon", "reply": "daemon-->>tool", "daemon_start": "init->>daemon",
           "daemon_stop": "init-xdaemon", "daemon_exit": "daemon--xinit"}
 
 
 def describe(event):
-    fields = {key: shown(value) if isinstance(value, str) else value
-              for key, value in event.items()}
-    return DESCRIPTIONS.get(event["what"], lambda e: e["what"])(fields)
+    fields = {name: shown(value) if isinstance(value, str) else value
+              for name, value in event.items()}
+    ended_by, status = event.get("signal"), event.get("status", 0)
+    if event["what"] == "shell":  # as wait() tells it
+        ended_by, status = status & 0x7F, status >> 8
+    fields["end"] = f"signal {ended_by}" if ended_by else f"status {status}"
+    fields["way"] = "one-way" if event.get("flags", 0) & 1 else "two-way"
+    fields["size"] = len(event.get("request", "")) // 2
+    return DESCRIPTIONS.get(event["what"], event["what"]).format_map(fields)
 
 
 def hexdump(request):
