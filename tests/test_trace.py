@@ -21,12 +21,12 @@ def assert_in_order(shown, *parts):
 def test_shows_who_did_what(trace):
     assert_in_order(
         trace("captest"),
-        "tool runs getenforce: status 0",
+        "tool runs getenforce",
         'tool writes odm.thp.debug.selinux.permissive: "null" -> "true"',
-        "tool looks service.corvaneinterfaceservice up: found",
+        "tool looks service.corvaneinterfaceservice up",
         "tool calls code 0",
-        "daemon is given captest",
-        "daemon answers: status 0",
+        "daemon receives captest",
+        "daemon answers",
         "tool has its reply",
         f"result: {PASS}",
     )
@@ -37,8 +37,7 @@ def test_follows_the_daemon_through_its_death(trace, stopped_device):
     assert_in_order(
         trace("captest"),
         "daemon has the fault die_during",
-        "init sees the daemon's end",
-        "ended by SIGKILL",
+        "init sees the daemon end",
         "init starts the daemon",
         "daemon publishes",
         f"result: {PASS}",

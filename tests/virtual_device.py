@@ -105,7 +105,7 @@ class Device:
         return [(event["name"], event["new"]) for event in events]
 
     def daemon(self):
-        return self.events("daemon_start")[-1]["pid"]
+        return self.events("daemon_start")[-1]["daemon"]
 
     def restarts(self):
         return int(self.getprop("odm.thp.dae_reboot_times"))
