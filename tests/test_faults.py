@@ -1,4 +1,4 @@
-"""The tool when its peer, its files, its surroundings or its arguments are not as they should be"""
+"""The tool when its peer, its files or its surroundings are not as they should be"""
 import os
 import signal
 import subprocess
@@ -6,28 +6,17 @@ import threading
 
 import pytest
 
-from virtual_device import (
-    LIMIT_S,
-    NO_SERVICE,
-    PASS,
-    PERMISSIVE,
-    REFUSED,
-    RESTART,
-    TIMEOUT,
-    Service,
-    reply,
-    wait_until,
-)
+from virtual_device import LIMIT_S, NO_SERVICE, PASS, PERMISSIVE, REFUSED, RESTART, TIMEOUT
+from virtual_device import Service, reply, wait_until
 
-LARGEST = 1040384 - 1  # the receive buffer less the terminator
+LARGEST = 1040384 - 1  # bytes of an answer before its terminator
 
 FAILED_CALLS = {
-    "hangs up unread": Service.UNREAD,
-    "nothing at all": b"",
+    "request not read": Service.UNREAD,
+    "no reply": b"",
     "header cut short": b"\0\0\0",
     "body shorter than announced": reply(b"ab\0", size=8),
     "size beyond the receive buffer": reply(b"x\0", size=2**32 - 1),
-    "text beyond the receive buffer": reply(b"r" * LARGEST + b"rr\0"),
     "status": reply(status=-22),
 }
 
@@ -42,8 +31,7 @@ def test_restarts_the_daemon_after_two_failed_calls(stopped_device, service, raw
 ANSWERS = {
     "empty parcel": (b"", ""),
     "no terminator": (b"abcd", ""),
-    "empty": (b"\0", ""),
-    "failure marker and format": (b"%s%n ERROR \xff\n\0", "%s%n ERROR \xff\n"),
+    "format, failure marker, no UTF-8": (b"%s%n ERROR \xff\n\0", "%s%n ERROR \xff\n"),
     "largest": (b"r" * LARGEST + b"\0", "r" * LARGEST),
 }
 
@@ -58,25 +46,23 @@ def test_prints_an_answer_as_it_is(stopped_device, service, body, text):
 def test_calls_again_after_a_failed_call(stopped_device, service):
     service.answer(Service.UNREAD, reply())
     assert stopped_device.tpd("x") == "done\n"
-    assert stopped_device.written() == []
 
 
-def test_reports_a_service_that_goes_for_good(stopped_device, service):
+def test_reports_a_service_that_ends_in_the_call(stopped_device, service):
     service.answer(Service.GONE)
     assert stopped_device.tpd("x") == NO_SERVICE
     assert stopped_device.written() == RESTART
 
 
 def test_finds_a_service_that_comes_during_the_lookup(stopped_device, service):
-    late = threading.Timer(0.5, service.answer, [reply()])
-    late.start()
-    environment = stopped_device.env | {"TPD_GET_SERVICE_MS": "20000"}
-    assert stopped_device.tpd("x", env=environment) == "done\n"
-    assert stopped_device.events("lookup")[0]["us"] >= 100000
+    threading.Timer(0.5, service.answer, [reply()]).start()
+    patient = stopped_device.env | {"TPD_GET_SERVICE_MS": "20000"}
+    assert stopped_device.tpd("x", env=patient) == "done\n"
+    assert len(stopped_device.events("lookup")) == 1
 
 
-@pytest.mark.parametrize("end", [signal.SIGINT, signal.SIGTERM, signal.SIGKILL])
-def test_ends_by_a_signal_while_the_daemon_hangs(stopped_device, service, end):
+@pytest.mark.parametrize("end", [signal.SIGINT, signal.SIGKILL])
+def test_leaves_a_daemon_that_hangs(stopped_device, service, end):
     service.answer(Service.HANG, reply())
     tool = subprocess.Popen([*stopped_device.tool, "x"], env=stopped_device.env)
     wait_until(lambda: stopped_device.events("lookup"))
@@ -85,32 +71,24 @@ def test_ends_by_a_signal_while_the_daemon_hangs(stopped_device, service, end):
     assert stopped_device.tpd("x") == "done\n"
 
 
-OUTPUTS = {
-    "closed": ["sh", "-c", 'exec "$@" >&-', "sh"],
-    "full": ["sh", "-c", 'exec "$@" >/dev/full', "sh"],
-    "all descriptors closed": ["sh", "-c", 'exec "$@" <&- >&- 2>&-', "sh"],
-}
+OUTPUTS = {"closed": ">&-", "full": ">/dev/full", "no descriptors": "<&- >&- 2>&-"}
 
 
-@pytest.mark.parametrize("launcher", OUTPUTS.values(), ids=OUTPUTS)
-def test_sends_the_command_whatever_its_output(device, launcher):
-    device.output(*launcher, *device.tool, "captest")
-    assert device.events("command")[0]["command"] == "captest"
+@pytest.mark.parametrize("redirection", OUTPUTS.values(), ids=OUTPUTS)
+def test_sends_the_command_whatever_its_output(device, redirection):
+    device.output("sh", "-c", f'exec "$@" {redirection}', "sh", *device.tool, "captest")
+    assert len(device.events("command")) == 1
 
 
-def test_ends_as_usual_when_nobody_reads_its_output(device):
+def test_ends_with_status_0_when_nobody_reads(device):
     reader, writer = os.pipe()
     os.close(reader)
     device.tpd("captest", stdout=writer)
     os.close(writer)
-    assert device.events("command")[0]["command"] == "captest"
 
 
 ARGUMENTS = {
-    "empty": "",
-    "marker": "[TPD]",
-    "format": "%s%n",
-    "no UTF-8": b"\xff\xc0",
+    "no UTF-8": "\udcff\udcc0",
     "shell syntax": "$(touch x);`touch x`|touch x&",
     "longest": "x" * 131071,
 }
@@ -118,13 +96,12 @@ ARGUMENTS = {
 
 @pytest.mark.parametrize("argument", ARGUMENTS.values(), ids=ARGUMENTS)
 def test_forwards_any_argument(device, tmp_path, argument):
-    text = argument.decode("latin-1") if isinstance(argument, bytes) else argument
+    text = os.fsencode(argument).decode("latin-1")
     assert device.tpd(argument, cwd=tmp_path) == f"unknown command: {text}\n"
     assert os.listdir(tmp_path) == []
 
 
 GETENFORCE = {
-    "nothing": ("", REFUSED),
     "killed": ("kill -9 $$", REFUSED),
     "slow": ("sleep 0.5; echo Permissive", PASS),
     "longer than the buffer": ("printf 'Permissive%200s' | tr ' ' x", REFUSED),
@@ -132,7 +109,7 @@ GETENFORCE = {
 
 
 @pytest.mark.parametrize("script, text", GETENFORCE.values(), ids=GETENFORCE)
-def test_passes_commands_only_when_getenforce_prints_so(device, script, text):
+def test_asks_getenforce(device, script, text):
     program = device.programs / "getenforce"
     program.write_text(f"#!/bin/sh\n{script}\n")
     program.chmod(0o755)
@@ -147,7 +124,7 @@ def test_does_without_shell_commands(device):
     assert device.tpd("showtouch", env=environment) == "\n"
 
 
-def test_takes_a_folder_in_place_of_the_kernel_command_line(device):
+def test_takes_a_folder_for_an_empty_kernel_command_line(device):
     device.setprop(PERMISSIVE, "null")
     (device.root / "proc/cmdline").mkdir(parents=True)
     assert device.tpd("captest") == REFUSED
@@ -160,44 +137,36 @@ def test_gives_up_on_a_property_that_is_a_folder(device):
 
 
 def test_takes_a_pipe_for_no_log(device):
-    log = device.root / "log"
-    log.unlink()
-    os.mkfifo(log)
-    with open(os.open(log, os.O_RDONLY | os.O_NONBLOCK), "rb"):
-        pass
+    (device.root / "log").unlink()
+    os.mkfifo(device.root / "log")
+    os.close(os.open(device.root / "log", os.O_RDONLY | os.O_NONBLOCK))
     assert device.tpd("captest") == PASS
 
 
-def test_keeps_files_to_the_user(stopped_device):
-    stopped_device.tpd("debugRawEnable", umask=0)
-    files = [stopped_device.root, *stopped_device.root.rglob("*")]
-    assert [file for file in files if file.stat().st_mode & 0o077] == []
-
-
 @pytest.fixture
-def own_mounts(device):
-    """Runs a script with mounts of its own over the device root."""
+def with_own_mounts(device):
+    """Runs a script that may mount; $1 is the tool."""
 
     def run(script):
-        return device.output("unshare", "--map-root-user", "--mount", "sh", "-ec", script)
+        return device.output("unshare", "-rm", "sh", "-ec", script, "sh", *device.tool)
 
-    if device.run("unshare", "--map-root-user", "--mount", "true").returncode != 0:
+    if device.run("unshare", "-rm", "true").returncode != 0:
         pytest.skip("this machine allows no user namespaces")
     return run
 
 
-def test_works_on_a_read_only_device_root(device, own_mounts):
-    assert own_mounts(
-        f"mount --bind $TPD_DEVICE_ROOT $TPD_DEVICE_ROOT;"
-        f"mount -o remount,bind,ro $TPD_DEVICE_ROOT;"
-        f"cd $TPD_DEVICE_ROOT; {device.tool[-1]} debugRawEnable; {device.tool[-1]} captest"
-    ) == "\n" + PASS
+def test_works_on_a_read_only_device(with_own_mounts):
+    printed = with_own_mounts(
+        "cd $TPD_DEVICE_ROOT; mount --bind . .; mount -o remount,bind,ro $PWD; cd $PWD;"
+        '"$@" debugRawEnable; "$@" captest; ! touch file 2>/dev/null'
+    )
+    assert printed == "\n" + PASS
 
 
-def test_loses_no_property_when_the_disk_is_full(device, own_mounts):
-    assert own_mounts(
-        f"export TPD_DEVICE_ROOT=/mnt/root; mount -t tmpfs -o size=64k none /mnt;"
-        f"mkdir -m 700 /mnt/root; {device.tool[-1]} debugRawEnable;"
-        f"head -c 99999 /dev/zero >/mnt/full || true; {device.tool[-1]} debugDifEnable;"
-        f"getprop thp.debug.raw; ls /mnt/root/tmp"
-    ) == "\n\ntrue\n"
+def test_keeps_a_property_when_the_disk_is_full(with_own_mounts):
+    printed = with_own_mounts(
+        "export TPD_DEVICE_ROOT=/mnt/root; mount -t tmpfs -o size=64k none /mnt;"
+        'mkdir -m 700 /mnt/root; "$@" debugRawEnable; ! head -c 99999 /dev/zero >/mnt/full;'
+        '"$@" debugDifEnable; getprop thp.debug.raw; ls /mnt/root/tmp'
+    )
+    assert printed == "\n\ntrue\n"

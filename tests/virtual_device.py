@@ -1,12 +1,9 @@
-"""What the tests do with a virtual device and with a service of their own in its daemon's place"""
+"""What the tests do with a virtual device, and with a service in its daemon's place"""
 import contextlib
-import fcntl
 import itertools
 import json
 import os
 import pathlib
-import shutil
-import signal
 import socket
 import struct
 import subprocess
@@ -14,8 +11,9 @@ import threading
 import time
 
 SOURCE = pathlib.Path(__file__).resolve().parent.parent
-LIMIT_S = 60  # for anything that must end; a busy machine with sanitizers is slow
+LIMIT_S = 60  # for whatever must end: a busy machine with sanitizers is slow
 SERVICE = "dev/vndbinder/service.corvaneinterfaceservice"
+PERMISSIVE = "odm.thp.debug.selinux.permissive"
 
 PASS = "captest idle_test: PASS\n"
 REFUSED = "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
@@ -25,7 +23,6 @@ TIMEOUT = (
     "may caused by processing timeout.\n"
 )
 RESTART = [("odm.thp.service_enable", "0"), ("odm.thp.service_enable", "1")]
-PERMISSIVE = "odm.thp.debug.selinux.permissive"
 
 
 def wait_until(condition):
@@ -40,9 +37,9 @@ class Device:
 
     def __init__(self, folder, build, tool):
         self.root = folder / "device"
+        self.tool = tool
         self.programs = folder / "bin"  # found before those of the device
         self.programs.mkdir()
-        self.tool = tool
         path = f"{self.programs}:{build}/device/bin:{SOURCE}/scripts:{os.environ['PATH']}"
         self.env = os.environ | {
             "PATH": path,
@@ -52,7 +49,7 @@ class Device:
         }
 
     def run(self, *command, **options):
-        """Runs a program on the device to its end; bytes are characters of the same number."""
+        """Runs a program on the device to its end. Each byte is read as one character."""
         options = {"env": self.env, "timeout": LIMIT_S, "encoding": "latin-1"} | options
         if "stdout" not in options:
             options["capture_output"] = True
@@ -66,15 +63,6 @@ class Device:
     def tpd(self, *arguments, **options):
         return self.output(*self.tool, *arguments, **options)
 
-    def start(self):
-        return self.output("device", "start")
-
-    def stop(self):
-        return self.output("device", "stop")
-
-    def shell(self, command):
-        return self.output("device", "shell", command)
-
     def getprop(self, key):
         return self.output("getprop", key).removesuffix("\n")
 
@@ -82,63 +70,51 @@ class Device:
         self.output("setprop", key, value)
 
     def is_up(self):
-        keys = ("odm.thp.dae_alive", "odm.thp.binder")
-        return [self.getprop(key) for key in keys] == ["true", "1"]
+        return (self.getprop("odm.thp.dae_alive"), self.getprop("odm.thp.binder")) == ("true", "1")
+
+    def restarts(self):
+        return int(self.getprop("odm.thp.dae_reboot_times"))
 
     def watch(self):
-        """Has all processes of the device trace what they do from now on."""
-        self.root.mkdir(mode=0o700, exist_ok=True)
+        """Has all processes of the device record from now on what they do."""
+        self.root.mkdir(mode=0o700)
         (self.root / "trace").write_text("")
 
     def events(self, what, who=None):
         lines = (self.root / "trace").read_text().splitlines()
         events = [json.loads(line) for line in lines]
-        return [
-            event
-            for event in events
-            if event["what"] == what and who in (None, event["who"])
-        ]
+        return [each for each in events if each["what"] == what and who in (None, each["who"])]
 
     def written(self):
         """The properties that the tool wrote, in order."""
-        events = self.events("property_write", who="tpd")
-        return [(event["name"], event["new"]) for event in events]
+        return [(each["name"], each["new"]) for each in self.events("property_write", who="tpd")]
 
-    def daemon(self):
-        return self.events("daemon_start")[-1]["daemon"]
-
-    def restarts(self):
-        return int(self.getprop("odm.thp.dae_reboot_times"))
-
-    def init(self):
-        """The process that holds the device; 0 for none."""
-        query = struct.pack("hhqqi4x", fcntl.F_WRLCK, os.SEEK_SET, 0, 0, 0)
-        with open(self.root / "init.lock", "r+b") as lock:
-            answer = fcntl.fcntl(lock, fcntl.F_GETLK, query)
-        kind, _, _, _, holder = struct.unpack("hhqqi4x", answer)
-        return 0 if kind == fcntl.F_UNLCK else holder
-
-    def processes(self):
-        """All processes that know this device."""
-        mark = f"TPD_DEVICE_ROOT={self.root}\0".encode()
+    def processes(self, program=""):
+        """The processes that know this device and run the program."""
+        known = f"TPD_DEVICE_ROOT={self.root}".encode()
         found = []
-        for environment in pathlib.Path("/proc").glob("[0-9]*/environ"):
+        for process in pathlib.Path("/proc").glob("[0-9]*"):
             with contextlib.suppress(OSError):
-                if mark in environment.read_bytes() + b"\0":
-                    found.append(int(environment.parent.name))
+                if known in (process / "environ").read_bytes().split(b"\0"):
+                    if os.readlink(process / "exe").endswith(program):
+                        found.append(int(process.name))
         return found
+
+    def kill(self, program):
+        for process in self.processes(program):
+            with contextlib.suppress(ProcessLookupError):
+                os.kill(process, 9)
 
 
 def reply(body=b"done\0\0\0\0", status=0, size=None):
-    """A reply as it stands on a socket of the host's binder driver."""
+    """A reply as it travels through a socket of the host's binder driver."""
     return struct.pack("<iI", status, len(body) if size is None else size) + body
 
 
 class Service:
-    """Takes the daemon's place: answers each call with the next of `replies`, then with the last.
+    """Answers each call with the next of some replies, then always with the last.
 
-    A reply is bytes; HANG keeps the client waiting, UNREAD hangs up before reading,
-    GONE withdraws the service.
+    A reply is bytes, or HANG: none comes, UNREAD: the request is not read, GONE: the service ends.
     """
 
     HANG, UNREAD, GONE = "hang", "unread", "gone"
@@ -161,10 +137,6 @@ class Service:
                     self.listener.close()
                     return
                 if each != self.UNREAD:
-                    self._receive(client)
+                    size = struct.unpack("<8xI", client.recv(12, socket.MSG_WAITALL))[0]
+                    client.recv(size, socket.MSG_WAITALL)
                     client.recv(1) if each == self.HANG else client.sendall(each)
-
-    @staticmethod
-    def _receive(client):
-        size = struct.unpack("<8xI", client.recv(12, socket.MSG_WAITALL))[0]
-        client.recv(size, socket.MSG_WAITALL)
