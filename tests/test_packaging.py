@@ -5,7 +5,7 @@ import subprocess
 
 import pytest
 
-from virtual_device import NO_SERVICE, PERMISSIVE, SERVICE, SOURCE, wait_until
+from virtual_device import PERMISSIVE, SERVICE, SOURCE, wait_until
 
 
 def output(*command):
@@ -40,8 +40,7 @@ SHELLS = pytest.mark.parametrize(
 
 @SHELLS
 def test_completes_the_commands_of_the_help(device, build, completions):
-    listed = device.tpd("help").splitlines()
-    commands = [line for line in listed if re.fullmatch(r"\w+", line)]
+    commands = re.findall(r"^\w+$", device.tpd("help"), re.M)
     assert sorted(completions(build, "")) == sorted(commands)
 
 
@@ -54,17 +53,16 @@ def test_completes_parameters(build, completions):
     assert completions(build, "stop", "") == []
 
 
-def test_completes_all_commands_that_the_tool_sends_one_way():
+def test_completes_all_that_the_tool_sends_one_way():
     client = source("binder/corvane_sys_binder_client.cpp")
-    sent = re.search(r"g_asyncThpCmds = {(.*?)}", client, re.S)[1]
-    completed = source("completions/daemon_commands").split()
-    assert re.findall(r'"(\w+)"', sent) == [name for name in completed if name.startswith("THP_")]
+    names = re.search(r"g_asyncThpCmds = {(.*?)}", client, re.S)[1]
+    completed = source("completions/daemon_commands")
+    assert re.findall(r'"(\w+)"', names) == re.findall(r"^THP_\w+", completed, re.M)
 
 
 def test_renders_the_manual_page(build):
-    page = build / "docs/tpd.1"
-    command = ["groff", "-man", "-Tutf8", "-ww", "-rLL=80n", page]
-    done = subprocess.run(command, check=True, capture_output=True, text=True)
+    page = ["groff", "-man", "-Tutf8", "-ww", "-rLL=80n", build / "docs/tpd.1"]
+    done = subprocess.run(page, check=True, capture_output=True, text=True)
     assert done.stderr == ""
     assert "debug and control" in done.stdout
 
@@ -73,26 +71,24 @@ def page_section(title):
     return re.search(rf"^\.SH {title}\n(.*?)^\.SH", source("docs/tpd.1"), re.S | re.M)[1]
 
 
+def local_commands(device):
+    return device.tpd("help").split("//aaa special gTpdCmds\n")[1].split()
+
+
 def test_describes_all_local_commands(device):
     described = re.findall(r"^\.TP\n\.B (\w+)$", page_section("LOCAL COMMANDS"), re.M)
-    listed = device.tpd("help").split("//aaa special gTpdCmds\n")[1]
-    assert sorted(described) == listed.split()
+    assert sorted(described) == local_commands(device)
 
 
 def use_all_properties(device):
     device.setprop(PERMISSIVE, "")
-    device.tpd("captest")
     device.output("setenforce", "0")
     device.tpd("captest", "version:3+main")
     (device.root / SERVICE).unlink()
-    assert device.tpd("captest") == NO_SERVICE
-    for command in device.tpd("help").split("//aaa special gTpdCmds\n")[1].split():
-        device.tpd(command)
+    device.tpd("captest")
     device.setprop("odm.thp.dae_bootflag", "false")
-    device.setprop("persist.odm.thp.thplog_enabled", "true")
-    device.tpd("start")
-    device.tpd("log_disable")
-    device.tpd("stop")
+    for command in [*local_commands(device), "log_enable", "log_disable", "stop"]:
+        device.tpd(command)
     wait_until(lambda: not device.is_up())
     device.tpd("captest")
 
@@ -101,30 +97,29 @@ def test_names_all_properties(device):
     use_all_properties(device)
     read = {event["name"] for event in device.events("property_read", who="tpd")}
     written = {key for key, _ in device.written()}
-    named = [
+    named_read, named_written = (
         set(re.findall(r"^(?:\.B |\\fB)([a-z_]+\.[a-z_.]+)", part, re.M))
         for part in page_section("PROPERTIES").split("Written, by")
-    ]
-    assert read == named[0] | named[1]
-    assert written == named[1]
+    )
+    assert written == named_written
+    assert read == named_read | named_written
 
 
 def test_builds_the_same_sources_for_a_device(build):
     for_device = set(re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp")))
-    entries = json.loads((build / "compile_commands.json").read_text())
     product = re.compile(r" -o (bounded_libc/)?CMakeFiles/(tpd\w*|bounded_libc)\.dir/")
     here = {
-        entry["file"].removeprefix(f"{SOURCE}/")
-        for entry in entries
-        if product.search(entry["command"])
+        each["file"].removeprefix(f"{SOURCE}/")
+        for each in json.loads((build / "compile_commands.json").read_text())
+        if product.search(each["command"])
     }
     assert here == for_device
 
 
 def test_installs(build, tmp_path):
     output("cmake", "--install", build, "--prefix", tmp_path)
-    files = [path for path in tmp_path.rglob("*") if path.is_file()]
-    assert sorted(str(path.relative_to(tmp_path)) for path in files) == [
+    files = [str(file.relative_to(tmp_path)) for file in tmp_path.rglob("*") if file.is_file()]
+    assert sorted(files) == [
         "bin/tpd",
         "share/bash-completion/completions/tpd",
         "share/man/man1/tpd.1",
