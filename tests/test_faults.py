@@ -139,8 +139,10 @@ def test_gives_up_on_a_property_that_is_a_folder(device):
 def test_takes_a_pipe_for_no_log(device):
     (device.root / "log").unlink()
     os.mkfifo(device.root / "log")
-    os.close(os.open(device.root / "log", os.O_RDONLY | os.O_NONBLOCK))
+    reader = os.open(device.root / "log", os.O_RDONLY | os.O_NONBLOCK)
     assert device.tpd("captest") == PASS
+    assert os.read(reader, 1) == b""
+    os.close(reader)
 
 
 @pytest.fixture

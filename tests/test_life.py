@@ -57,13 +57,13 @@ def test_runs_the_commands_of_all_who_start_it_at_once(stopped_device):
 
 
 def test_restarts_a_daemon_whose_caller_ignored_signals(stopped_device):
-    stopped_device.output("sh", "-c", "trap '' CHLD TERM; exec device start")
+    stopped_device.output("env", "--ignore-signal=CHLD", "device", "start")
     stopped_device.kill("corvane_daemon")
     wait_until(lambda: stopped_device.restarts() == 1 and stopped_device.is_up())
 
 
 def test_keeps_nothing_of_its_caller(stopped_device, tmp_path):
-    reader, writer = os.pipe()
+    reader, writer = os.pipe2(os.O_NONBLOCK)
     stopped_device.output("device", "start", pass_fds=[writer], cwd=tmp_path)
     os.close(writer)
     assert os.read(reader, 1) == b""
