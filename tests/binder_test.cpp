@@ -1,114 +1,197 @@
-// The way to the daemon: one transaction's form, which calls do not wait, and the runner around it.
-#include "binder/corvane_sys_binder_client.h"
-
 #include <binder/IServiceManager.h>
 #include <binder/ProcessState.h>
+#include <gmock/gmock.h>
 
+#include "binder/ICorvaneInterfaceClient.h"
+#include "binder/corvane_sys_binder_client.h"
 #include "tests/fake_device.h"
 
 namespace test {
 
-class Binder : public Device {
-  public:
-    android::status_t Execute(const std::string& cmd, const std::string& params) {
-        RunCmdParms("[TPD]first", "");
-        const auto service = ICorvaneInterfaceClient::asInterface(g_thpBinder);
-        StartsAfresh();
-        return service->ExecuteCommand(reply, cmd, params);
-    }
-    std::string reply;
-};
+using namespace std::chrono_literals;
+using testing::Contains;
+using testing::ElementsAre;
+using testing::IsEmpty;
 
-TEST_F(Binder, SendsTheseBytes) {
-    Execute("[TPD]TSA_ExecuteCommand", "captest");
-    std::string golden("\0\0\0\x80\xFF\xFF\xFF\xFFRDNV\x37\0\0\0", 16);
+constexpr char kServiceMissing[] = "0F_1F; failed to get binder service";
+constexpr char kTimeout[] =
+        "corvane_daemon binder server execute command return ERROR, may caused by processing "
+        "timeout.";
+const Call kStop = Write("odm.thp.service_enable", "0");
+const Call kStart = Write("odm.thp.service_enable", "1");
+
+TEST(BinderTest, WritesTheRequestAsTheDaemonReadsIt) {
+    FakeDevice device;
+    RunCmdParms("[TPD]TSA_ExecuteCommand", "captest");
+    std::string expected("\0\0\0\x80\xFF\xFF\xFF\xFFRDNV\x37\0\0\0", 16);
     for (const char c : std::string("android.CorvaneInterfaceServer.ICorvaneInterfaceService")) {
-        golden += {c, '\0'};
+        expected += {c, '\0'};
     }
-    EXPECT_EQ(request, golden + std::string("\0\0TSA_ExecuteCommand\0\0\1\0\0\0captest\0", 34));
+    expected += std::string("\0\0TSA_ExecuteCommand\0\0\1\0\0\0captest\0", 34);
+    EXPECT_EQ(device.request, expected);
 }
 
-TEST_F(Binder, SendsCommandsTwoWayOrOneWay) {
-    const auto kCases = Table<3>(
-            "[TPD]TSA|THP_SetFoldState 1|1 two-way [TSA] [THP_SetFoldState 1]|"
-            "TSA|THP_SetFoldState 1|1 one-way [TSA] [THP_SetFoldState 1]|"
-            "THP_ResetBaseline||1 two-way [THP_ResetBaseline]|x[TPD]y[TPD]z||1 two-way [y[TPD]z]|"
-            "[TPD]||1 two-way []|[TPD|THP_SetAccData7|1 one-way [[TPD] [THP_SetAccData7]|"
-            "an aftouches|p|1 one-way [an aftouches] [p]|"
-            "Aftouch|aftouch|1 two-way [Aftouch] [aftouch]");
-    for (const auto& [cmd, params, call] : kCases) {
-        const bool oneWay = call[2] == 'o';
-        EXPECT_EQ(Execute(cmd, params), android::OK);
-        EXPECT_EQ(Trail("call"), call);
-        EXPECT_EQ(reply + Trail("log"), oneWay ? "OKE (null): Async" : "answer") << cmd;
+TEST(BinderTest, WaitsForTheAnswerToAMarkedCommand) {
+    const struct {
+        const char* command;
+        const char* parameters;
+        Call call;
+    } kRows[] = {
+            {"[TPD]c", "THP_SetFoldState 1", Transact(1, kTwoWay, "c", "THP_SetFoldState 1")},
+            {"[TPD]aftouch", "", Transact(1, kTwoWay, "aftouch")},
+            {"x[TPD]y[TPD]z", "", Transact(1, kTwoWay, "y[TPD]z")},
+            {"[TPD]", "", Transact(1, kTwoWay, "")},
+            {"THP_SetAccData", "thp_setaccdata",
+             Transact(1, kTwoWay, "THP_SetAccData", "thp_setaccdata")},
+    };
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(row.command);
+        FakeDevice device;
+        EXPECT_EQ(RunCmdParms(row.command, row.parameters), "answer");
+        EXPECT_THAT(device.calls({kTransact}), ElementsAre(row.call));
     }
-    EXPECT_EQ(g_asyncThpCmds.size(), 41U);
-    EXPECT_EQ(g_asyncCmds, std::vector<std::string>{"aftouch"});
-    EXPECT_TRUE(!IsAsync({}, "") && IsAsync({"a", ""}, "") && !IsAsync({"abcde", "B"}, "abcd"));
 }
 
-TEST_F(Binder, FindsTheServiceOnceForAllCallsAndNotesItsDeath) {
-    EXPECT_EQ(RunCmdParms("[TPD]help", "x"), "answer");
-    EXPECT_EQ(Trail("read write log pause find tie call"),
-              "log I (null): ThpGetBinder; find service.corvaneinterfaceservice; log E (null): "
-              "enter; tie 1; log E (null): ThpGetBinder ret = -38; call 1 two-way [help] [x]");
-    EXPECT_EQ(RunCmdParms("aftouch", ""), "OK");
+TEST(BinderTest, SendsNamedCommandsOneWay) {
+    const struct {
+        const char* command;
+        const char* parameters;
+        Call call;
+    } kRows[] = {
+            {"an aftouches", "", Transact(1, kOneWay, "an aftouches")},
+            {"[TPD", "THP_SetAccData7", Transact(1, kOneWay, "[TPD", "THP_SetAccData7")},
+    };
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(row.command);
+        FakeDevice device;
+        EXPECT_EQ(RunCmdParms(row.command, row.parameters), "OK");
+        EXPECT_THAT(device.calls({kTransact}), ElementsAre(row.call));
+        EXPECT_THAT(device.calls({kLog}), Contains(UntaggedLog(ERROR, "Async")));
+    }
+}
+
+TEST(BinderTest, MatchesEachEntryOfAList) {
+    EXPECT_FALSE(IsAsync({}, ""));
+    EXPECT_FALSE(IsAsync({"abcde", "B"}, "abcd"));
+    EXPECT_TRUE(IsAsync({"x", "bc"}, "abcd"));
+    EXPECT_TRUE(IsAsync({""}, ""));
+}
+
+TEST(BinderTest, LeavesTheReplyOfAFailedCallUntouched) {
+    FakeDevice device;
+    RunCmdParms("[TPD]c", "");
+    const auto service = ICorvaneInterfaceClient::asInterface(g_thpBinder);
+    std::string reply = "before";
+    device.answers = {{android::DEAD_OBJECT}};
+    EXPECT_EQ(service->ExecuteCommand(reply, "c", ""), android::DEAD_OBJECT);
+    EXPECT_EQ(reply, "before");
+    EXPECT_EQ(ICorvaneInterfaceClient::asInterface(nullptr), nullptr);
+}
+
+TEST(BinderTest, TakesAReplyWithoutATextAsEmpty) {
+    FakeDevice device;
+    device.answers = {{android::OK, nullptr}};
+    EXPECT_EQ(RunCmdParms("[TPD]c", ""), "");
+}
+
+TEST(BinderTest, LooksTheServiceUpOnce) {
+    FakeDevice device;
+    device.linkStatus = android::INVALID_OPERATION;
+    RunCmdParms("[TPD]a", "");
+    RunCmdParms("[TPD]b", "");
+    EXPECT_THAT(device.calls(), ElementsAre(UntaggedLog(INFO, "ThpGetBinder"), GetService(),
+                                            UntaggedLog(ERROR, "enter"), LinkToDeath(1),
+                                            UntaggedLog(ERROR, "ThpGetBinder ret = -38"),
+                                            Transact(1, kTwoWay, "a"), Transact(1, kTwoWay, "b")));
     EXPECT_EQ(android::ProcessState::self()->getDriverName(), "/dev/vndbinder");
-    answers = {{-32}, {0, nullptr}};
-    EXPECT_EQ(RunCmdParms("[TPD]c", ""), "");  // on a second service, tied to the same
-    ASSERT_TRUE(tied.size() == 2 && tied[0] == tied[1]);
-    tied[1].promote()->binderDied(g_thpBinder);
-    MyDeathRecipient(nullptr).binderDied(nullptr);
-    EXPECT_EQ(Trail("tie untie"), "tie 1; tie 2; untie 1");
-    EXPECT_NE(Trail("log").find("ret = -38; I (null): binder died; I (null): b"),
-              std::string::npos);
 }
 
-TEST_F(Binder, TriesAgainThenRestartsTheDaemon) {
-    const std::string none = kNoService, timeout =
-                                                 "corvane_daemon binder server execute command "
-                                                 "return ERROR, may caused by processing "
-                                                 "timeout.";
-    const auto kCases = Table<5>("[TPD]c|01||answer|ffc|[TPD]c|00||" + none +
-                                 "|ffww|"
-                                 "[TPD]c||0|answer|fcfc|[TPD]c|101|0|answer|fcffc|[TPD]c|100|0|" +
-                                 none +
-                                 "|fcffww|"
-                                 "[TPD]c||00|" +
-                                 timeout + "|fcfcww|aftouch||00|" + timeout + "|fcfcww");
-    for (const auto& [cmd, finds, failures, result, shape] : kCases) {
-        StartsAfresh();
-        holds[kEnable] = "true";
-        for (const char find : finds) {
-            lookups.push_back(find == '1');
-        }
-        answers.resize(failures.length(), {-32});
-        EXPECT_EQ(RunCmdParms(cmd, ""), result);
-        EXPECT_EQ(Shape("find call write"), shape);
-        EXPECT_EQ(g_thpBinder == nullptr, shape.back() == 'w');
-    }
-    const std::string log = Trail("log call write");
-    EXPECT_EQ(log.substr(log.find("call 2")),
-              "call 2 one-way [aftouch]; log I (null): retry = 2; log W (null): reboot; write "
-              "odm.thp.service_enable=0; log E (null): retry:1, odm.thp.service_enable, [new]0, "
-              "[old]true; write odm.thp.service_enable=1; log E (null): retry:1, "
-              "odm.thp.service_enable, [new]1, [old]0");
+TEST(BinderTest, TriesAFailedCallOnceMoreOnAFreshLookup) {
+    FakeDevice device;
+    device.lookups = {true, false, true};
+    device.answers = {{android::DEAD_OBJECT}};
+    EXPECT_EQ(RunCmdParms("[TPD]c", ""), "answer");
+    EXPECT_THAT(device.calls({kGetService, kLinkToDeath, kTransact, kWrite}),
+                ElementsAre(GetService(), LinkToDeath(1), Transact(1, kTwoWay, "c"), GetService(),
+                            GetService(), LinkToDeath(2), Transact(2, kTwoWay, "c")));
+    EXPECT_THAT(device.calls({kLog}), Contains(UntaggedLog(INFO, "retry = 1")));
+}
+
+TEST(BinderTest, RestartsTheDaemonAfterTwoFailedCalls) {
+    FakeDevice device;
+    device.properties["odm.thp.service_enable"] = "true";
+    device.answers = {{android::DEAD_OBJECT}, {android::FAILED_TRANSACTION}};
+    EXPECT_EQ(RunCmdParms("aftouch", ""), kTimeout);
+    EXPECT_EQ(g_thpBinder, nullptr);
+    EXPECT_THAT(device.calls({kGetService, kTransact, kWrite}),
+                ElementsAre(GetService(), Transact(1, kOneWay, "aftouch"), GetService(),
+                            Transact(2, kOneWay, "aftouch"), kStop, kStart));
+}
+
+TEST(BinderTest, RestartsTheDaemonWhoseServiceIsMissing) {
+    FakeDevice device;
+    device.lookups = {false, false};
+    EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
+    const Call kLookup = UntaggedLog(INFO, "ThpGetBinder");
+    const Call kNotFound = UntaggedLog(ERROR, "ThpGetBinder, failed to get binder service\n");
+    EXPECT_THAT(device.calls({kGetService, kLog, kWrite}),
+                ElementsAre(kLookup, GetService(), kNotFound, kLookup, GetService(), kNotFound,
+                            UntaggedLog(WARN, "reboot"), kStop,
+                            UntaggedLog(ERROR, "retry:1, odm.thp.service_enable, [new]0, [old]"),
+                            kStart,
+                            UntaggedLog(ERROR, "retry:1, odm.thp.service_enable, [new]1, [old]0")));
+}
+
+TEST(BinderTest, MissesTheServiceOnTheRetry) {
+    FakeDevice device;
+    device.lookups = {true, false, false};
+    device.answers = {{android::DEAD_OBJECT}};
+    EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
+}
+
+TEST(BinderTest, TakesAMissingServiceManagerForAMissingService) {
+    FakeDevice device;
     android::setDefaultServiceManager(nullptr);
-    EXPECT_EQ(RunCmdParms("[TPD]c", ""), kNoService);
+    EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
+    EXPECT_THAT(device.calls({kLog}),
+                Contains(UntaggedLog(ERROR, "ThpGetBinder, failed to get defaultServiceManager\n"))
+                        .Times(2));
 }
 
-TEST_F(Binder, StoresAScreenStateBeforeTheCall) {
-    RunCmdParms("[TPD]c", "version:3+main");
-    for (const char* state : {"a version:3+whole,1", "version:3", "version:3+Main", ""}) {
-        StoreScreenState(state);
+TEST(BinderTest, UnlinksFromTheFirstServiceWhenOneDies) {
+    FakeDevice device;
+    device.answers = {{android::DEAD_OBJECT}};
+    RunCmdParms("[TPD]c", "");
+    g_deathRecipient->binderDied(g_thpBinder);
+    EXPECT_THAT(device.calls({kUnlinkToDeath}), ElementsAre(UnlinkToDeath(1)));
+    EXPECT_THAT(device.calls({kLog}), Contains(UntaggedLog(INFO, "binder died")));
+    MyDeathRecipient(nullptr).binderDied(nullptr);
+}
+
+TEST(BinderTest, StoresAScreenStateBeforeTheLookup) {
+    for (const char* state : {"a version:3+whole,1", "version:3+main"}) {
+        FakeDevice device;
+        RunCmdParms("[TPD]c", state);
+        EXPECT_THAT(device.calls({kWrite, kGetService}),
+                    ElementsAre(Write("odm.thp.screen_status", state), GetService()));
     }
-    EXPECT_EQ(Trail("write find"),
-              "write odm.thp.screen_status=version:3+main; find service.corvaneinterfaceservice; "
-              "write odm.thp.screen_status=a version:3+whole,1");
-    StartsAfresh();
-    refuses = {"odm.thp.screen_status"};
+}
+
+TEST(BinderTest, StoresNoOtherParameters) {
+    FakeDevice device;
+    for (const char* parameters : {"version:3", "version:3+Main", ""}) {
+        StoreScreenState(parameters);
+    }
+    EXPECT_THAT(device.calls(), IsEmpty());
+}
+
+TEST(BinderTest, GivesUpAScreenStateAfterSixRejectedWrites) {
+    FakeDevice device;
+    device.readOnly = {"odm.thp.screen_status"};
     StoreScreenState("version:3+main");
-    EXPECT_EQ(Shape() + Trail("pause"), "rwlprwlprwlprwlprwlprwlp100; 100; 100; 100; 100; 100");
+    EXPECT_THAT(device.calls({kWrite}), testing::SizeIs(6));
+    EXPECT_THAT(device.calls({kPause}),
+                testing::AllOf(testing::SizeIs(6), testing::Each(Pause(100us))));
 }
 
 }  // namespace test
