@@ -2,6 +2,7 @@
 
 #include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
+#include <bounded_libc.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
 
@@ -16,12 +17,7 @@
 #include "main/TpdMain.h"
 #include "platform/device_root.h"
 
-using android::IBinder;
-using android::Parcel;
-using android::sp;
-using android::status_t;
-using android::String16;
-using android::wp;
+using namespace android;
 
 namespace test {
 
@@ -67,7 +63,7 @@ class FakeService : public IBinder {
         const bool expected = recipient.unsafe_get() == g_deathRecipient.get() &&
                               cookie == nullptr && out == nullptr;
         gDevice->Record(UnlinkToDeath(expected && flags == 0 ? mNumber : -1));
-        return android::OK;
+        return OK;
     }
 
   private:
@@ -87,7 +83,7 @@ class FakeService : public IBinder {
     const int mNumber;
 };
 
-class FakeServiceManager : public android::IServiceManager {
+class FakeServiceManager : public IServiceManager {
     sp<IBinder> getService(const String16& name) const override {
         gDevice->Record({kGetService, std::string(name.string(), name.string() + name.size())});
         const bool found = TakeFirst(gDevice->lookups, true);
@@ -95,7 +91,7 @@ class FakeServiceManager : public android::IServiceManager {
     }
     sp<IBinder> checkService(const String16&) const override { return nullptr; }
     status_t addService(const String16&, const sp<IBinder>&, bool, int) override {
-        return android::INVALID_OPERATION;
+        return INVALID_OPERATION;
     }
     IBinder* onAsBinder() override { return nullptr; }
 };
@@ -128,7 +124,7 @@ Call Transact(int service, const char* way, const std::string& command,
 FakeDevice::FakeDevice() {
     gDevice = this;
     ForgetToolState();
-    android::setDefaultServiceManager(new FakeServiceManager);
+    setDefaultServiceManager(new FakeServiceManager);
 }
 
 FakeDevice::~FakeDevice() {
@@ -224,6 +220,13 @@ int __wrap_system(const char* command) {
 int __wrap_usleep(useconds_t time) {
     gDevice->Record(test::Pause(std::chrono::microseconds(time)));
     return 0;
+}
+
+errno_t __real_memset_s(void* buffer, size_t size, int byte, size_t count);
+
+errno_t __wrap_memset_s(void* buffer, size_t size, int byte, size_t count) {
+    return gDevice->memsetError != 0 ? gDevice->memsetError
+                                     : __real_memset_s(buffer, size, byte, count);
 }
 
 int __wrap_clock_gettime(clockid_t clock, timespec* time) {

@@ -97,6 +97,7 @@ class FakeDevice {
     std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
     int getenforceStatus = 0;                               // what closing its output returns
+    int memsetError = 0;                                    // what memset_s returns
     std::optional<timespec> monotonicClock = timespec{};    // none: it cannot be read
     int failingAllocation = 0;  // of those that may fail, counted from 1
     bool hasServiceManager = true;
