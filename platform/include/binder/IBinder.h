@@ -1,4 +1,4 @@
-// Host stand-in for the platform's binder object, local or remote.
+// Host implementation of the platform's binder object, local or remote.
 #pragma once
 
 #include <cstdint>
