@@ -1,44 +1,53 @@
-# shellcheck shell=bash
-# For the other scripts: what they build with, and the build itself.
-tree=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
+# shellcheck shell=bash disable=SC2034
+# For the other scripts: their usage, the packages they need, and the build.
+tree=$(CDPATH='' cd -- "$(dirname -- "$(readlink -f -- "${BASH_SOURCE[0]}")")/.." && pwd)
 export TPD_BUILD_DIR=${TPD_BUILD_DIR:-$tree/build}
 
-# need FILE PACKAGE...: installs Debian's packages of the files that are missing.
+# What is needed: a command on the PATH or a file, and Debian's package of it when that has another
+# name.
+compiler=(g++ cmake ninja:ninja-build)
+test_tools=(/usr/include/gmock/gmock.h:libgmock-dev groff:groff-base man:man-db
+    pytest-3:python3-pytest /usr/lib/python3/dist-packages/xdist:python3-pytest-xdist zsh)
+
+# Prints the comment that the script begins with.
+usage() { sed -n '2,/^[^#]/s/^# \{0,1\}//p' "$0"; }
+
+# need WHAT...: installs what is missing, or says what an administrator has to install.
 need() {
-    local missing=()
-    while (($# > 0)); do
-        [[ -e $1 ]] || missing+=("$2")
-        shift 2
+    local missing=() each as_root=()
+    for each in "$@"; do
+        command -v "${each%:*}" >/dev/null || [[ -e ${each%:*} ]] || missing+=("${each##*:}")
     done
     ((${#missing[@]} > 0)) || return 0
-    local as_root=()
     if ((EUID != 0)); then
-        as_root=(sudo)
+        as_root=(sudo -n)
+    fi
+    if ! "${as_root[@]}" true 2>/dev/null; then
+        echo "missing; as an administrator: apt-get install ${missing[*]}" >&2
+        exit 1
     fi
     echo "installing ${missing[*]}" >&2
-    if ! command -v apt-get >/dev/null || ! { "${as_root[@]}" apt-get update -q &&
-        DEBIAN_FRONTEND=noninteractive "${as_root[@]}" apt-get install -qy --no-install-recommends \
-            "${missing[@]}"; } >&2; then
-        echo "error: cannot install ${missing[*]}; install by hand, then try again" >&2
+    "${as_root[@]}" apt-get update -q >&2 && DEBIAN_FRONTEND=noninteractive "${as_root[@]}" \
+        apt-get install -qy --no-install-recommends "${missing[@]}" >&2
+}
+
+# quietly COMMAND...: its output goes to a file in TPD_BUILD_DIR and is shown when it fails.
+quietly() {
+    mkdir -p "$TPD_BUILD_DIR"
+    if ! "$@" >"$TPD_BUILD_DIR/build.log" 2>&1; then
+        cat "$TPD_BUILD_DIR/build.log" >&2
         exit 1
     fi
 }
 
-need_compiler() {
-    need /usr/bin/g++ g++ /usr/bin/cmake cmake /usr/bin/ninja ninja-build
-}
-
-# What the tests are made of and call.
-need_test_tools() {
-    need /usr/include/gtest/gtest.h libgtest-dev /usr/bin/groff groff-base /usr/bin/zsh zsh \
-        /usr/bin/python3 python3 /usr/bin/pgrep procps
+# Configures TPD_BUILD_DIR with the preset TPD_PRESET.
+configure() {
+    echo "configuring $TPD_BUILD_DIR" >&2
+    (cd "$tree" && quietly cmake --preset "${TPD_PRESET:-release}" -B "$TPD_BUILD_DIR")
 }
 
 # build TARGET...: configures when that was not done yet, and builds.
 build() {
-    if [[ ! -f $TPD_BUILD_DIR/build.ninja ]]; then
-        echo "building in $TPD_BUILD_DIR" >&2
-        cmake -S "$tree" -B "$TPD_BUILD_DIR" -G Ninja
-    fi
-    cmake --build "$TPD_BUILD_DIR" --target "$@" -- --quiet
+    [[ -f $TPD_BUILD_DIR/build.ninja ]] || configure
+    quietly cmake --build "$TPD_BUILD_DIR" --target "$@"
 }
