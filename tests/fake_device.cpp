@@ -171,12 +171,13 @@ int __system_property_set(const char* name, const char* value) {
 }
 
 int __android_log_print(int priority, const char* tag, const char* format, ...) {
-    char text[4096];
+    char* text = nullptr;
     va_list args;
     va_start(args, format);
-    vsnprintf(text, sizeof(text), format, args);
+    vasprintf(&text, format, args);
     va_end(args);
     gDevice->Record(test::LogWithTag(tag, priority, text));
+    free(text);
     return 1;
 }
 
