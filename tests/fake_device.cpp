@@ -60,9 +60,9 @@ class FakeService : public IBinder {
 
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie, uint32_t flags,
                            wp<DeathRecipient>* out) override {
-        const bool expected = recipient.unsafe_get() == g_deathRecipient.get() &&
-                              cookie == nullptr && out == nullptr;
-        gDevice->Record(UnlinkToDeath(expected && flags == 0 ? mNumber : -1));
+        const bool expected =
+                recipient == wp<DeathRecipient>(g_deathRecipient) && cookie == nullptr;
+        gDevice->Record(UnlinkToDeath(expected && flags == 0 && out == nullptr ? mNumber : -1));
         return OK;
     }
 
