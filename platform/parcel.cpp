@@ -61,8 +61,8 @@ status_t Parcel::writeString16(const String16& text) {
 }
 
 status_t Parcel::writeInterfaceToken(const String16& interface) {
-    for (const int32_t word : {kNoStrictModePolicy, kNoWorkSource, kVendorHeader}) {
-        const status_t status = writeInt32(word);
+    for (const int32_t field : {kNoStrictModePolicy, kNoWorkSource, kVendorHeader}) {
+        const status_t status = writeInt32(field);
         if (status != OK) {
             return status;
         }
@@ -91,15 +91,14 @@ int32_t Parcel::readInt32() const {
 }
 
 const char* Parcel::readCString() const {
-    if (mPosition == mData.size()) {
+    const size_t left = mData.size() - mPosition;
+    const auto* const text = reinterpret_cast<const char*>(mData.data() + mPosition);
+    const size_t length = left > 0 ? strnlen(text, left) : 0;
+    if (length == left) {
         return nullptr;
     }
-    const uint8_t* const text = mData.data() + mPosition;
-    const void* const end = memchr(text, 0, mData.size() - mPosition);
-    if (end == nullptr) {
-        return nullptr;
-    }
-    return reinterpret_cast<const char*>(take(static_cast<const uint8_t*>(end) - text + 1));
+    take(length + 1);
+    return text;
 }
 
 }  // namespace android

@@ -21,7 +21,8 @@ namespace host {
 
 namespace {
 
-// The client's library tells the service that it accepts file descriptors in the reply.
+// Added to a caller's flags, as the platform's library does: the client accepts file descriptors in
+// the reply.
 constexpr uint32_t kAcceptFds = 0x10;
 
 // The client's end of one service. For one thread at a time, like the process that uses it.
@@ -39,7 +40,7 @@ class RemoteBinder : public IBinder {
         const int64_t start = MonotonicUs();
         Parcel discarded;
         Parcel& received = reply != nullptr ? *reply : discarded;
-        const status_t status = Call(code, data, received, flags);
+        const status_t status = Deliver(code, data, received, flags);
         const bool hasReply = status == android::OK && (flags & FLAG_ONEWAY) == 0;
         TraceEvent("reply")
                 .Add("status", status)
@@ -72,7 +73,7 @@ class RemoteBinder : public IBinder {
         uint32_t flags;
     };
 
-    status_t Call(uint32_t code, const Parcel& data, Parcel& reply, uint32_t flags) {
+    status_t Deliver(uint32_t code, const Parcel& data, Parcel& reply, uint32_t flags) {
         if (mConnection < 0) {
             return android::DEAD_OBJECT;
         }
@@ -93,7 +94,7 @@ class RemoteBinder : public IBinder {
             return OwnerDied();
         }
         if (header.size > kMaxTransactionBytes) {
-            // What follows cannot be told from the next reply: the connection is of no more use.
+            // Nobody knows where the next reply begins: the connection is of no more use.
             OwnerDied();
             return android::FAILED_TRANSACTION;
         }
@@ -133,7 +134,7 @@ class RemoteBinder : public IBinder {
         }
     }
 
-    // Tells the recipients, once, on this thread.
+    // Notifies the recipients, once, on this thread.
     status_t OwnerDied() {
         const TraceEvent event("binder_died");
         Close();

@@ -94,7 +94,7 @@ void AcceptClients(int listener, const sp<IBinder>& service) {
     for (;;) {
         const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
         if (connection < 0) {
-            // Out of descriptors, say: leave the clients time to give some back.
+            // Out of descriptors, for example: clients get time to give some back.
             std::this_thread::sleep_for(kNoDescriptorPause);
         } else {
             std::thread(ServeClient, connection, service).detach();
