@@ -45,13 +45,6 @@ TEST_F(BinderTest, SendsMarkedCommandsTwoWayAndNamedOnesOneWay) {
     }
 }
 
-TEST_F(BinderTest, MatchesEachEntryOfAList) {
-    EXPECT_FALSE(IsAsync({}, ""));
-    EXPECT_FALSE(IsAsync({"abcde", "B"}, "abcd"));
-    EXPECT_TRUE(IsAsync({"x", "bc"}, "abcd"));
-    EXPECT_TRUE(IsAsync({""}, ""));
-}
-
 TEST_F(BinderTest, LeavesTheReplyOfAFailedCallUntouched) {
     RunCmdParms("[TPD]c", "");
     device.answers = {{DEAD_OBJECT}};
@@ -108,12 +101,6 @@ TEST_F(BinderTest, RestartsTheDaemonWhoseServiceIsMissing) {
                             UntaggedLog(WARN, "reboot"), kStop,
                             UntaggedLog(ERROR, write + "[new]0, [old]"), kStart,
                             UntaggedLog(ERROR, write + "[new]1, [old]0")));
-}
-
-TEST_F(BinderTest, ReportsAServiceThatIsMissingOnTheRetry) {
-    device.lookups = {true, false, false};
-    device.answers = {{DEAD_OBJECT}};
-    EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
 }
 
 TEST_F(BinderTest, TakesAMissingServiceManagerForAMissingService) {

@@ -2,7 +2,6 @@
 
 #include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
-#include <bounded_libc.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
 
@@ -53,8 +52,8 @@ class FakeService : public IBinder {
 
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
                          uint32_t flags) override {
-        const bool expected = recipient == g_deathRecipient.get() && cookie == nullptr;
-        gDevice->Record(LinkToDeath(expected && flags == 0 ? mNumber : -1));
+        const bool expected = recipient == g_deathRecipient && cookie == nullptr && flags == 0;
+        gDevice->Record(LinkToDeath(expected ? mNumber : -1));
         return gDevice->linkStatus;
     }
 
@@ -174,11 +173,11 @@ int __android_log_print(int priority, const char* tag, const char* format, ...) 
     char* text = nullptr;
     va_list args;
     va_start(args, format);
-    vasprintf(&text, format, args);
+    const int length = vasprintf(&text, format, args);
     va_end(args);
     gDevice->Record(test::LogWithTag(tag, priority, text));
     free(text);
-    return 1;
+    return length;
 }
 
 void* operator new(size_t size, const std::nothrow_t& /* tag */) noexcept {
@@ -221,13 +220,6 @@ int __wrap_system(const char* command) {
 int __wrap_usleep(useconds_t time) {
     gDevice->Record(test::Pause(std::chrono::microseconds(time)));
     return 0;
-}
-
-errno_t __real_memset_s(void* buffer, size_t size, int byte, size_t count);
-
-errno_t __wrap_memset_s(void* buffer, size_t size, int byte, size_t count) {
-    return gDevice->memsetError != 0 ? gDevice->memsetError
-                                     : __real_memset_s(buffer, size, byte, count);
 }
 
 int __wrap_clock_gettime(clockid_t clock, timespec* time) {

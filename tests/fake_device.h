@@ -86,8 +86,6 @@ class FakeDevice {
   public:
     FakeDevice();
     ~FakeDevice();
-    FakeDevice(const FakeDevice&) = delete;
-    FakeDevice& operator=(const FakeDevice&) = delete;
 
     void StartDaemon();  // sets the properties of a daemon that is alive
 
@@ -97,11 +95,9 @@ class FakeDevice {
     std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
     int getenforceStatus = 0;                               // what closing its output returns
-    int memsetError = 0;                                    // what memset_s returns
     std::optional<timespec> monotonicClock = timespec{};    // none: it cannot be read
     int failingAllocation = 0;  // of those that may fail, counted from 1
-    bool hasServiceManager = true;
-    std::deque<bool> lookups;  // whether each finds the service; all later ones do
+    std::deque<bool> lookups;   // whether each finds the service; all later ones do
     android::status_t linkStatus = android::OK;
     std::deque<Answer> answers;  // to the calls, in order; all later ones get the default
 

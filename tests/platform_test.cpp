@@ -13,6 +13,7 @@
 #include <thread>
 
 #include "platform/device_root.h"
+#include "platform/files.h"
 #include "platform/log_entry.h"
 #include "platform/vndbinder.h"
 #include "platform/vndbinder_wire.h"
@@ -33,12 +34,6 @@ const struct TemporaryRoot {
     std::string path = testing::TempDir() + "tpd-XXXXXX";
 } kRoot;
 
-std::string GetProperty(const char* name) {
-    char value[PROP_VALUE_MAX];
-    const int length = __system_property_get(name, value);
-    return {value, value + length};
-}
-
 // Ends a child of the test with 0 when this root is refused.
 void ExpectRefusal(const std::string& root) {
     setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
@@ -57,29 +52,37 @@ TEST(DeviceRootDeathTest, RefusesFoldersThatAreNotThisUsersAlone) {
     EXPECT_EXIT(ExpectRefusal("folder"), refused, "folder: is not an absolute path");
 }
 
+bool SetProperty(const std::string& name, const std::string& value) {
+    return __system_property_set(name.c_str(), value.c_str()) == 0;
+}
+
+std::string GetProperty(const char* name) {
+    char value[PROP_VALUE_MAX];
+    __system_property_get(name, value);
+    return value;
+}
+
 TEST(PropertiesTest, HaveLegalNames) {
     for (const char* name : {"", ".a", "a.", "a..b", "a/b", "a b", "a=b"}) {
-        EXPECT_EQ(__system_property_set(name, "1"), -1) << name;
+        EXPECT_FALSE(SetProperty(name, "1")) << name;
     }
-    EXPECT_EQ(__system_property_set("a.B_9@:-", "1"), 0);
+    EXPECT_TRUE(SetProperty("a.B_9@:-", "1"));
     EXPECT_EQ(GetProperty("a.B_9@:-"), "1");
 }
 
-TEST(PropertiesTest, HoldAtMost91Bytes) {
+TEST(PropertiesTest, HoldAtMost91BytesButReadOnlyOnes) {
     const std::string longest(91, 'v');
-    EXPECT_EQ(__system_property_set("limited", longest.c_str()), 0);
-    EXPECT_EQ(__system_property_set("limited", (longest + "v").c_str()), -1);
-    EXPECT_EQ(GetProperty("limited"), longest);
+    EXPECT_TRUE(SetProperty("limited", longest));
+    EXPECT_FALSE(SetProperty("limited", longest + "v"));
+    EXPECT_TRUE(SetProperty("ro.once", longest + "v"));
+    EXPECT_FALSE(SetProperty("ro.once", "2"));
+    EXPECT_EQ(GetProperty("ro.once"), longest);
 }
 
-TEST(PropertiesTest, RejectWritesToReadOnlyAndProtectedOnes) {
-    EXPECT_EQ(__system_property_set("ro.once", std::string(92, 'w').c_str()), 0);
-    EXPECT_EQ(__system_property_set("ro.once", "2"), -1);
-    EXPECT_EQ(GetProperty("ro.once"), std::string(91, 'w'));
-    EXPECT_EQ(__system_property_set("protected", "1"), 0);
+TEST(PropertiesTest, KeepTheirValueWhenTheirFileIsProtected) {
+    EXPECT_TRUE(SetProperty("protected", "1"));
     chmod((kRoot.path + "/properties/protected").c_str(), 0400);
-    EXPECT_EQ(__system_property_set("protected", "2"), -1);
-    EXPECT_EQ(GetProperty("protected"), "1");
+    EXPECT_FALSE(SetProperty("protected", "2"));
 }
 
 // What follows the header of the next record.
@@ -103,16 +106,13 @@ TEST(LogTest, AppendsARecord) {
     EXPECT_EQ(ReadLogRecord(log), "\4platform_test" + zero + std::string(1023, 'x') + zero);
 }
 
-enum Code { kAnswer, kPositiveStatus, kDie };
-
-// Carries out one-way calls slowly, counting those that overlap. A two-way call's code says how it
-// ends; the answer is its flags.
+// Answers with the flags of the call; code 1 ends with a positive status. One-way calls take their
+// time.
 class TestService : public android::BBinder {
   public:
     std::atomic<int> running = 0;
     std::atomic<int> overlaps = 0;
     std::atomic<int> oneWayCalls = 0;
-    int connection = -1;
 
   private:
     status_t onTransact(uint32_t code, const Parcel&, Parcel* reply, uint32_t flags) override {
@@ -122,86 +122,47 @@ class TestService : public android::BBinder {
             --running;
             ++oneWayCalls;
         }
-        if (code == kDie) {
-            shutdown(connection, SHUT_RDWR);
-        }
         reply->writeInt32(static_cast<int32_t>(flags));
-        return code == kPositiveStatus ? 1 : android::OK;
+        return static_cast<status_t>(code);
     }
 };
 
-class DeathCounter : public IBinder::DeathRecipient {
-  public:
-    void binderDied(const android::wp<IBinder>& /* who */) override { ++deaths; }
-    int deaths = 0;
-};
-
-class VndBinderTest : public testing::Test {
-  protected:
-    VndBinderTest() {
-        int ends[2];
-        EXPECT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
-        proxy = host::NewProxy(ends[0]);
-        service->connection = ends[1];
-        serving = std::thread(host::ServeClient, ends[1], service);
-    }
-    ~VndBinderTest() override {
-        proxy = nullptr;
-        serving.join();
-    }
-    const sp<TestService> service = new TestService;
-    sp<IBinder> proxy;
-    std::thread serving;
-    Parcel request;
-    Parcel reply;
-};
-
-TEST_F(VndBinderTest, AnswersTwoWayCalls) {
-    EXPECT_EQ(proxy->transact(kAnswer, request, &reply), android::OK);
+TEST(VndBinderTest, AnswersTwoWayCalls) {
+    Parcel request, reply;
+    EXPECT_EQ(host::PublishService(kDriver, "answers", new TestService), android::OK);
+    const sp<IBinder> proxy = host::ConnectService(kDriver, "answers");
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::OK);
     EXPECT_EQ(reply.readInt32(), 0x10);  // the client's library accepts file descriptors
-    EXPECT_EQ(proxy->transact(kPositiveStatus, request, &reply), android::OK);
+    EXPECT_EQ(proxy->transact(1, request, &reply), android::OK);
     EXPECT_EQ(reply.dataSize(), 0U);
 }
 
-TEST_F(VndBinderTest, LimitsTheSizeOfRequests) {
+TEST(VndBinderTest, LimitsTheSizeOfRequests) {
+    EXPECT_EQ(host::PublishService(kDriver, "limits", new TestService), android::OK);
+    const sp<IBinder> proxy = host::ConnectService(kDriver, "limits");
     const struct {
         uint32_t flags;
         size_t largest;
     } kRows[] = {{0, 1040384}, {IBinder::FLAG_ONEWAY, 520192}};
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.flags);
+        Parcel request, reply;
         request.resizeForOverwrite(row.largest);
-        EXPECT_EQ(proxy->transact(kAnswer, request, &reply, row.flags), android::OK);
+        EXPECT_EQ(proxy->transact(0, request, &reply, row.flags), android::OK);
         request.resizeForOverwrite(row.largest + 4);
-        EXPECT_EQ(proxy->transact(kAnswer, request, &reply, row.flags),
-                  android::FAILED_TRANSACTION);
+        EXPECT_EQ(proxy->transact(0, request, &reply, row.flags), android::FAILED_TRANSACTION);
     }
 }
 
-TEST_F(VndBinderTest, TellsTheLinkedRecipientsThatTheOwnerDied) {
-    const sp<DeathCounter> linked = new DeathCounter;
-    const sp<DeathCounter> unlinked = new DeathCounter;
-    EXPECT_EQ(proxy->linkToDeath(linked), android::OK);
-    EXPECT_EQ(proxy->linkToDeath(unlinked), android::OK);
-    EXPECT_EQ(proxy->unlinkToDeath(unlinked), android::OK);
-    EXPECT_EQ(proxy->unlinkToDeath(unlinked), android::NAME_NOT_FOUND);
-    EXPECT_EQ(proxy->transact(kDie, request, &reply), android::DEAD_OBJECT);
-    EXPECT_EQ(proxy->transact(kAnswer, request, &reply), android::DEAD_OBJECT);
-    EXPECT_EQ(linked->deaths, 1);
-    EXPECT_EQ(unlinked->deaths, 0);
-}
-
-TEST(VndBinderServiceTest, CarriesOutOneWayCallsOfAllClientsOneAfterAnother) {
+TEST(VndBinderTest, CarriesOutOneWayCallsOfAllClientsOneAfterAnother) {
     const sp<TestService> service = new TestService;
-    EXPECT_EQ(host::PublishService(kDriver, "counter", service), android::OK);
-    const sp<IBinder> clients[] = {host::ConnectService(kDriver, "counter"),
-                                   host::ConnectService(kDriver, "counter")};
+    EXPECT_EQ(host::PublishService(kDriver, "queue", service), android::OK);
+    const sp<IBinder> first = host::ConnectService(kDriver, "queue");
+    const sp<IBinder> second = host::ConnectService(kDriver, "queue");
     Parcel request;
     for (int i = 0; i < 50; ++i) {
-        for (const sp<IBinder>& client : clients) {
-            EXPECT_EQ(client->transact(kAnswer, request, nullptr, IBinder::FLAG_ONEWAY),
-                      android::OK);
-        }
+        EXPECT_EQ(first->transact(0, request, nullptr, IBinder::FLAG_ONEWAY), android::OK);
+        EXPECT_EQ(second->transact(0, request, nullptr, IBinder::FLAG_ONEWAY), android::OK);
     }
     while (service->oneWayCalls < 100) {
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
@@ -209,16 +170,38 @@ TEST(VndBinderServiceTest, CarriesOutOneWayCallsOfAllClientsOneAfterAnother) {
     EXPECT_EQ(service->overlaps, 0);
 }
 
-TEST(VndBinderServiceTest, IsNotWaitedForWhileItAcceptsNobody) {
-    host::DeviceRoot();
-    std::filesystem::create_directories(kRoot.path + kDriver);
+TEST(VndBinderTest, DoesNotWaitForAServiceThatAcceptsNobody) {
     sockaddr_un address;
+    host::MakeFolders(host::DeviceRoot(), kDriver + 1);
     const int listener = host::NewSocket(kDriver, "busy", address);
     ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof(address)), 0);
     ASSERT_EQ(listen(listener, 0), 0);
     EXPECT_NE(host::ConnectService(kDriver, "busy"), nullptr);
     EXPECT_EQ(host::ConnectService(kDriver, "busy"), nullptr);
     close(listener);
+}
+
+class DeathCounter : public IBinder::DeathRecipient {
+  public:
+    void binderDied(const android::wp<IBinder>&) override { ++deaths; }
+    int deaths = 0;
+};
+
+TEST(VndBinderTest, TellsTheLinkedRecipientOnceThatTheOwnerDied) {
+    int ends[2];
+    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
+    const sp<IBinder> proxy = host::NewProxy(ends[0]);
+    const sp<DeathCounter> linked = new DeathCounter;
+    const sp<DeathCounter> unlinked = new DeathCounter;
+    EXPECT_EQ(proxy->linkToDeath(linked), android::OK);
+    EXPECT_EQ(proxy->linkToDeath(unlinked), android::OK);
+    EXPECT_EQ(proxy->unlinkToDeath(unlinked), android::OK);
+    close(ends[1]);
+    Parcel request, reply;
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
+    EXPECT_EQ(linked->deaths, 1);
+    EXPECT_EQ(unlinked->deaths, 0);
 }
 
 }  // namespace
