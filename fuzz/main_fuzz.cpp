@@ -12,9 +12,7 @@ int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     static const bool silent = freopen("/dev/null", "w", stdout) != nullptr;
     const int state = size > 0 ? data[0] : 0;
     test::FakeDevice device;
-    if (state % 3 != 0) {
-        device.StartDaemon();
-    }
+    device.properties["odm.thp.dae_alive"] = state % 3 != 0 ? "true" : "";
     device.properties["odm.thp.is_updating_fw"] = state % 5 == 0 ? "1" : "";
     device.properties["odm.thp.debug.selinux.permissive"] = state % 7 != 0 ? "1" : "";
     device.lookups = {state % 11 != 0};

@@ -131,11 +131,6 @@ FakeDevice::~FakeDevice() {
     gDevice = nullptr;
 }
 
-void FakeDevice::StartDaemon() {
-    properties["odm.thp.dae_alive"] = "true";
-    properties["odm.thp.binder"] = "1";
-}
-
 std::vector<Call> FakeDevice::calls(const std::set<std::string>& functions) const {
     std::vector<Call> selected;
     std::copy_if(mCalls.begin(), mCalls.end(), std::back_inserter(selected), [&](const Call& call) {

@@ -81,15 +81,14 @@ struct DelayedValue {
     std::string value;
 };
 
-// One at a time. With it the tool's process starts afresh: nothing is remembered, as before main.
+// A device whose daemon is alive, and the tool's process as it is before main. One at a time.
 class FakeDevice {
   public:
     FakeDevice();
     ~FakeDevice();
 
-    void StartDaemon();  // sets the properties of a daemon that is alive
-
-    std::map<std::string, std::string> properties;
+    std::map<std::string, std::string> properties = {{"odm.thp.dae_alive", "true"},
+                                                     {"odm.thp.binder", "1"}};
     std::map<std::string, DelayedValue> delayedValues;
     std::set<std::string> readOnly;                     // writes to these properties are rejected
     std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened

@@ -70,16 +70,17 @@ TEST(PropertiesTest, HaveLegalNames) {
     EXPECT_EQ(GetProperty("a.B_9@:-"), "1");
 }
 
-TEST(PropertiesTest, HoldAtMost91BytesButReadOnlyOnes) {
+TEST(PropertiesTest, HoldAtMost91Bytes) {
     const std::string longest(91, 'v');
     EXPECT_TRUE(SetProperty("limited", longest));
+    EXPECT_EQ(GetProperty("limited"), longest);
     EXPECT_FALSE(SetProperty("limited", longest + "v"));
-    EXPECT_TRUE(SetProperty("ro.once", longest + "v"));
-    EXPECT_FALSE(SetProperty("ro.once", "2"));
-    EXPECT_EQ(GetProperty("ro.once"), longest);
 }
 
-TEST(PropertiesTest, KeepTheirValueWhenTheirFileIsProtected) {
+TEST(PropertiesTest, AreWrittenOnceWhenReadOnlyAndNeverWhenProtected) {
+    EXPECT_TRUE(SetProperty("ro.once", std::string(92, 'w')));
+    EXPECT_FALSE(SetProperty("ro.once", "2"));
+    EXPECT_EQ(GetProperty("ro.once"), std::string(91, 'w'));
     EXPECT_TRUE(SetProperty("protected", "1"));
     chmod((kRoot.path + "/properties/protected").c_str(), 0400);
     EXPECT_FALSE(SetProperty("protected", "2"));
@@ -140,17 +141,14 @@ TEST(VndBinderTest, AnswersTwoWayCalls) {
 TEST(VndBinderTest, LimitsTheSizeOfRequests) {
     EXPECT_EQ(host::PublishService(kDriver, "limits", new TestService), android::OK);
     const sp<IBinder> proxy = host::ConnectService(kDriver, "limits");
-    const struct {
-        uint32_t flags;
-        size_t largest;
-    } kRows[] = {{0, 1040384}, {IBinder::FLAG_ONEWAY, 520192}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.flags);
+    for (const uint32_t flags : {0U, uint32_t{IBinder::FLAG_ONEWAY}}) {
+        SCOPED_TRACE(flags);
+        const size_t largest = flags == 0 ? 1040384 : 520192;
         Parcel request, reply;
-        request.resizeForOverwrite(row.largest);
-        EXPECT_EQ(proxy->transact(0, request, &reply, row.flags), android::OK);
-        request.resizeForOverwrite(row.largest + 4);
-        EXPECT_EQ(proxy->transact(0, request, &reply, row.flags), android::FAILED_TRANSACTION);
+        request.resizeForOverwrite(largest);
+        EXPECT_EQ(proxy->transact(0, request, &reply, flags), android::OK);
+        request.resizeForOverwrite(largest + 4);
+        EXPECT_EQ(proxy->transact(0, request, &reply, flags), android::FAILED_TRANSACTION);
     }
 }
 

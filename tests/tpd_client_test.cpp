@@ -12,11 +12,11 @@ constexpr char kRebootTimesKey[] = "odm.thp.dae_reboot_times";
 class TpdClientTest : public DeviceTest {
   protected:
     TpdClientTest() {
-        device.StartDaemon();
         device.properties[kUpdatingKey] = "false";
         device.properties[kRebootTimesKey] = "0";
     }
     void StopDaemon() { device.properties[kAliveKey] = "false"; }
+    void StartDaemon() { device.properties[kAliveKey] = "true"; }
     size_t ChecksWhileDaemonIsDown() {
         StopDaemon();
         const size_t before = device.calls({kLog}).size();
@@ -67,7 +67,7 @@ TEST_F(TpdClientTest, ChecksOnlyOnceAfterTwoFailedWaits) {
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 1U);
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 1U);
-    device.StartDaemon();
+    StartDaemon();
     device.answers = {{android::OK, "an ERROR"}};
     EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", ""), "an ERROR");
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
@@ -119,7 +119,7 @@ TEST_F(TpdClientTest, JudgesACapacityTestByTheDaemonAfterwards) {
             {"[TPD]captest", "running_test", "false", "1", ""}};
     for (const auto& row : kRows) {
         SCOPED_TRACE(std::string(row.command) + " " + row.parameters);
-        device.StartDaemon();
+        StartDaemon();
         device.properties[kRebootTimesKey] = "0";
         device.answers = {{android::OK, "answer", [&] {
                                device.properties[kAliveKey] = row.alive;

@@ -52,20 +52,6 @@ TEST_F(TpdCmdTest, ReadsTheMonotonicClockInMilliseconds) {
     EXPECT_EQ(TpdCmd::GetMonotonicTime(), 0U);
 }
 
-TEST_F(TpdCmdTest, AllowsCommandsWithoutAskingSelinux) {
-    const struct {
-        const char* storedFlag;
-        const char* kernelCommandLine;
-    } kRows[] = {{"1", ""}, {"null", "enter_recovery=1"}, {"null", "androidboot.swtype=factory"}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.kernelCommandLine);
-        device.properties[kPermissiveKey] = row.storedFlag;
-        device.kernelCommandLine = row.kernelCommandLine;
-        EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
-    }
-    EXPECT_THAT(device.calls({kWrite, kShell}), IsEmpty());
-}
-
 TEST_F(TpdCmdTest, StoresThatSelinuxIsPermissive) {
     device.getenforce = " \nPermissively so";
     EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
@@ -75,28 +61,40 @@ TEST_F(TpdCmdTest, StoresThatSelinuxIsPermissive) {
                             Write(kPermissiveKey, "true")));
 }
 
+TEST_F(TpdCmdTest, AllowsCommandsWithoutAskingSelinux) {
+    device.properties[kPermissiveKey] = "1";
+    EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
+    device.properties[kPermissiveKey] = "null";
+    for (const char* line : {"enter_recovery=1", "androidboot.swtype=factory"}) {
+        device.kernelCommandLine = line;
+        EXPECT_TRUE(TpdCmd().IsSelinuxPermissive()) << line;
+    }
+    EXPECT_THAT(device.calls({kWrite, kShell}), IsEmpty());
+}
+
 TEST_F(TpdCmdTest, AllowsCommandsOnlyWhenGetenforceSaysPermissive) {
     const std::string longest = "Permissive" + std::string(189, 'x');  // 200 bytes with its zero
     const struct {
         const char* name;
         std::optional<std::string> output;
-        int status;
         bool allowed;
-    } kRows[] = {{"enforcing", "Enforcing\n", 0, false},
-                 {"within a word", "xPermissive\n", 0, false},
-                 {"no output", " \n", 0, false},
-                 {"cannot be run", std::nullopt, 0, false},
-                 {"cannot be closed", "Permissive\n", -1, false},
-                 {"fails", "Permissive\n", 256, true},
-                 {"longest word", longest, 0, true},
-                 {"word too long", longest + "x", 0, false}};
+    } kRows[] = {{"enforcing", "Enforcing\n", false}, {"within a word", "xPermissive\n", false},
+                 {"no output", " \n", false},         {"cannot be run", std::nullopt, false},
+                 {"longest word", longest, true},     {"word too long", longest + "x", false}};
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.name);
         device.properties.clear();
         device.getenforce = row.output;
-        device.getenforceStatus = row.status;
         EXPECT_EQ(TpdCmd().IsSelinuxPermissive(), row.allowed);
     }
+}
+
+TEST_F(TpdCmdTest, MindsOnlyAnOutputThatCannotBeClosed) {
+    device.getenforce = "Permissive\n";
+    device.getenforceStatus = -1;
+    EXPECT_FALSE(TpdCmd().IsSelinuxPermissive());
+    device.getenforceStatus = 256;
+    EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
 }
 
 }  // namespace test

@@ -40,7 +40,6 @@ TEST(TpdMainTest, ForwardsCommands) {
     for (const auto& row : kRows) {
         SCOPED_TRACE(testing::PrintToString(row.arguments));
         FakeDevice device;
-        device.StartDaemon();
         device.getenforce = "Permissive\n";
         EXPECT_EQ(RunTool(row.arguments), std::string("answer") + row.help + "\n");
         EXPECT_THAT(device.calls({kTransact}), ElementsAre(row.call));
@@ -95,7 +94,7 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
     }
 }
 
-TEST(TpdMainTest, DisablesAThplogThatIsOn) {
+TEST(TpdMainTest, DisablesDebuggingBeforeTheThplog) {
     FakeDevice device;
     device.properties[kThplogKey] = "true";
     RunTool({"tpd", "log_disable"});
@@ -105,7 +104,6 @@ TEST(TpdMainTest, DisablesAThplogThatIsOn) {
 
 TEST(TpdMainTest, LogsAForwardedCommand) {
     FakeDevice device;
-    device.StartDaemon();
     device.properties[kPermissiveKey] = "1";
     RunTool({"tpd", "help"});
     EXPECT_THAT(device.calls({kLog}),
