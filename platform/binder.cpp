@@ -6,6 +6,7 @@
 #include <binder/Parcel.h>
 #include <binder/ProcessState.h>
 #include <malloc.h>
+#include <unistd.h>
 
 #include <chrono>
 #include <cstdio>
@@ -13,6 +14,7 @@
 #include <thread>
 
 #include "device_root.h"
+#include "trace.h"
 #include "vndbinder.h"
 
 namespace android {
@@ -20,45 +22,31 @@ namespace android {
 namespace {
 
 constexpr char kDefaultDriver[] = "/dev/binder";
-constexpr std::chrono::milliseconds kGetServiceLimit(5000);
-constexpr std::chrono::milliseconds kGetServicePause(100);
+constexpr int64_t kGetServiceLimitUs = 5000000;
+constexpr int64_t kGetServicePauseUs = 100000;
 
 sp<ProcessState> gProcess;
 sp<IServiceManager> gServiceManager;
 
-std::chrono::milliseconds GetServiceLimit() {
-    const char* const text = getenv("TPD_GET_SERVICE_MS");
-    return text != nullptr ? std::chrono::milliseconds(strtoul(text, nullptr, 10))
-                           : kGetServiceLimit;
+int64_t GetServiceLimitUs() {
+    const char* const ms = getenv("TPD_GET_SERVICE_MS");
+    return ms != nullptr ? strtol(ms, nullptr, 10) * 1000 : kGetServiceLimitUs;
 }
 
-// Service names are plain ASCII; any other code unit makes a name that nobody publishes.
+// Service names are ASCII.
 std::string ServiceName(const String16& name) {
-    std::string text;
-    for (size_t i = 0; i < name.size(); ++i) {
-        const char16_t unit = name.string()[i];
-        text += unit > 0x20 && unit < 0x7F ? static_cast<char>(unit) : '/';
-    }
-    return text;
+    return {name.string(), name.string() + name.size()};
 }
 
 // The sockets in the driver's folder are the list of services.
 class DriverServiceManager : public IServiceManager {
   public:
     sp<IBinder> getService(const String16& name) const override {
-        const auto deadline = std::chrono::steady_clock::now() + GetServiceLimit();
-        for (;;) {
-            sp<IBinder> binder = checkService(name);
-            if (binder != nullptr ||
-                std::chrono::steady_clock::now() + kGetServicePause > deadline) {
-                return binder;
-            }
-            std::this_thread::sleep_for(kGetServicePause);
-        }
+        return LookUp(ServiceName(name), GetServiceLimitUs());
     }
 
     sp<IBinder> checkService(const String16& name) const override {
-        return host::ConnectService(ProcessState::self()->getDriverName(), ServiceName(name));
+        return LookUp(ServiceName(name), 0);
     }
 
     status_t addService(const String16& name, const sp<IBinder>& service, bool /* allowIsolated */,
@@ -69,28 +57,27 @@ class DriverServiceManager : public IServiceManager {
 
   protected:
     IBinder* onAsBinder() override { return nullptr; }
+
+  private:
+    static sp<IBinder> LookUp(const std::string& name, int64_t limitUs) {
+        host::TraceEvent event("lookup");
+        const std::string driver = ProcessState::self()->getDriverName();
+        const int64_t start = host::MonotonicUs();
+        sp<IBinder> binder = host::ConnectService(driver, name);
+        while (binder == nullptr && host::MonotonicUs() + kGetServicePauseUs <= start + limitUs) {
+            std::this_thread::sleep_for(std::chrono::microseconds(kGetServicePauseUs));
+            binder = host::ConnectService(driver, name);
+        }
+        event.Add("service", name)
+                .Add("found", binder != nullptr ? 1 : 0)
+                .Add("us", host::MonotonicUs() - start);
+        return binder;
+    }
 };
 
 }  // namespace
 
-IInterface::IInterface() = default;
-
-IInterface::~IInterface() = default;
-
-sp<IBinder> IInterface::asBinder(const IInterface* interface) {
-    return interface != nullptr ? const_cast<IInterface*>(interface)->onAsBinder() : nullptr;
-}
-
-sp<IBinder> IInterface::asBinder(const sp<IInterface>& interface) {
-    return asBinder(interface.get());
-}
-
 sp<IInterface> IBinder::queryLocalInterface(const String16& /* descriptor */) { return nullptr; }
-
-const String16& BBinder::getInterfaceDescriptor() const {
-    static const String16 none;
-    return none;
-}
 
 status_t BBinder::transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) {
     data.setDataPosition(0);
@@ -116,10 +103,6 @@ status_t BBinder::onTransact(uint32_t /* code */, const Parcel& /* data */, Parc
     return UNKNOWN_TRANSACTION;
 }
 
-BpRefBase::BpRefBase(const sp<IBinder>& remote) : mRemote(remote) {}
-
-BpRefBase::~BpRefBase() = default;
-
 // On the device the driver's receive buffer is mapped once for the life of the process. Here
 // parcels take it from the heap, which therefore keeps the memory of one call for the next.
 ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {
@@ -127,13 +110,8 @@ ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {
     mallopt(M_TRIM_THRESHOLD, 8 * host::kMaxTransactionBytes);
 }
 
-ProcessState::~ProcessState() = default;
-
 sp<ProcessState> ProcessState::self() {
-    if (gProcess == nullptr) {
-        gProcess = new ProcessState(kDefaultDriver);
-    }
-    return gProcess;
+    return gProcess != nullptr ? gProcess : initWithDriver(kDefaultDriver);
 }
 
 sp<ProcessState> ProcessState::initWithDriver(const char* driver) {
@@ -152,7 +130,11 @@ IPCThreadState* IPCThreadState::self() {
     return &state;
 }
 
-void IPCThreadState::joinThreadPool(bool /* isMain */) { host::ServeServices(); }
+void IPCThreadState::joinThreadPool(bool /* isMain */) {
+    for (;;) {
+        pause();
+    }
+}
 
 sp<IServiceManager> defaultServiceManager() {
     if (gServiceManager == nullptr && host::DeviceRoot() >= 0) {

@@ -1,0 +1,96 @@
+#include "trace.h"
+
+#include <unistd.h>
+
+#include <atomic>
+#include <cerrno>
+#include <chrono>
+
+#include "device_root.h"
+#include "files.h"
+
+namespace host {
+
+namespace {
+
+std::atomic<int> gTraced{-1};  // negative until this process has looked
+
+constexpr char kHexDigits[] = "0123456789abcdef";
+
+}  // namespace
+
+bool IsTraced() {
+    if (gTraced < 0) {
+        LookForTrace();
+    }
+    return gTraced == 1;
+}
+
+void LookForTrace() {
+    const int root = DeviceRoot();
+    gTraced = root >= 0 && faccessat(root, kTraceFile, F_OK, 0) == 0 ? 1 : 0;
+}
+
+int64_t MonotonicUs() {
+    return std::chrono::steady_clock::now().time_since_epoch() / std::chrono::microseconds(1);
+}
+
+TraceEvent::TraceEvent(const char* what) {
+    const int error = errno;
+    if (IsTraced()) {
+        mLine = "{\"time\":" + std::to_string(static_cast<double>(MonotonicUs()) / 1e6);
+        Add("pid", getpid()).Add("who", program_invocation_short_name).Add("what", what);
+    }
+    errno = error;
+}
+
+TraceEvent::~TraceEvent() {
+    if (mLine.empty()) {
+        return;
+    }
+    const int error = errno;
+    mLine += "}\n";
+    // Opened for each event: the watcher may have gone, and threads share no descriptor.
+    const int file = OpenForAppending(kTraceFile, 0);
+    if (file < 0 || write(file, mLine.data(), mLine.size()) < 0) {
+        gTraced = 0;
+    }
+    close(file);
+    errno = error;
+}
+
+TraceEvent& TraceEvent::Add(const char* name, std::string_view value) {
+    if (mLine.empty()) {
+        return *this;
+    }
+    mLine.append(",\"").append(name).append("\":\"");
+    for (const char c : value) {
+        const auto byte = static_cast<unsigned char>(c);
+        if (c == '"' || c == '\\') {
+            mLine.append({'\\', c});
+        } else if (c >= ' ' && c <= '~') {
+            mLine += c;
+        } else {
+            mLine.append("\\u00").append({kHexDigits[byte >> 4], kHexDigits[byte & 0xF]});
+        }
+    }
+    mLine += '"';
+    return *this;
+}
+
+TraceEvent& TraceEvent::Add(const char* name, int64_t value) {
+    if (!mLine.empty()) {
+        mLine.append(",\"").append(name).append("\":").append(std::to_string(value));
+    }
+    return *this;
+}
+
+TraceEvent& TraceEvent::AddHex(const char* name, const uint8_t* bytes, size_t size) {
+    std::string digits;
+    for (size_t i = 0; i < size && !mLine.empty(); ++i) {
+        digits.append({kHexDigits[bytes[i] >> 4], kHexDigits[bytes[i] & 0xF]});
+    }
+    return Add(name, digits);
+}
+
+}  // namespace host
