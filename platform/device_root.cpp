@@ -9,20 +9,13 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "files.h"
+
 namespace host {
 
 namespace {
 
-constexpr mode_t kOwnerOnly = 0700;
-
 bool IsSet(const char* text) { return text != nullptr && *text != '\0'; }
-
-void MakeFolders(const std::string& path) {
-    for (size_t end = path.find('/', 1); end != std::string::npos; end = path.find('/', end + 1)) {
-        mkdir(path.substr(0, end).c_str(), kOwnerOnly);
-    }
-    mkdir(path.c_str(), kOwnerOnly);
-}
 
 int Refuse(const std::string& path, const char* why) {
     fprintf(stderr, "device root %s: %s\n", path.c_str(), why);
@@ -45,10 +38,13 @@ int OpenRoot() {
     if (path.empty()) {
         return Refuse("", "neither TPD_DEVICE_ROOT, XDG_STATE_HOME nor HOME names a place for it");
     }
+    if (path.front() != '/') {
+        return Refuse(path, "is not an absolute path");
+    }
     constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
     int root = open(path.c_str(), kFlags);
     if (root < 0 && errno == ENOENT) {
-        MakeFolders(path);
+        MakeFolders(AT_FDCWD, path);
         root = open(path.c_str(), kFlags);
     }
     if (root < 0) {

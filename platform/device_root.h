@@ -6,12 +6,12 @@
 namespace host {
 
 // Its path: the environment variable TPD_DEVICE_ROOT, else a folder of the user's own state
-// directory.
+// directory. Empty when the environment names neither.
 std::string DeviceRootPath();
 
 // A descriptor of it for the *at() calls, which the process keeps. The folder is made when it is
 // missing. -1, after one message on standard error, when it cannot be made or is not a folder of
-// this user's own that is closed to everybody else.
+// this user's own, closed to everybody else and named by an absolute path.
 int DeviceRoot();
 
 }  // namespace host

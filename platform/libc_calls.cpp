@@ -1,0 +1,69 @@
+// C library calls that the linker leads here (--wrap): what the device answers itself, and what
+// shows in its trace.
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <optional>
+
+#include "device_root.h"
+#include "trace.h"
+
+extern "C" {
+
+FILE* __real_fopen(const char* path, const char* mode);
+int __real_usleep(useconds_t us);
+int __real_system(const char* command);
+FILE* __real_popen(const char* command, const char* mode);
+int __real_pclose(FILE* stream);
+
+// The device's own kernel command line when the device root has one, else the machine's.
+FILE* __wrap_fopen(const char* path, const char* mode) {
+    const int root = strcmp(path, "/proc/cmdline") == 0 ? host::DeviceRoot() : -1;
+    if (root < 0) {
+        return __real_fopen(path, mode);
+    }
+    const int file = openat(root, "proc/cmdline", O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (file < 0) {
+        return errno == ENOENT ? __real_fopen(path, mode) : nullptr;
+    }
+    FILE* const stream = fdopen(file, mode);
+    if (stream == nullptr) {
+        close(file);
+    }
+    return stream;
+}
+
+int __wrap_usleep(useconds_t us) {
+    host::TraceEvent("pause").Add("us", us);
+    return __real_usleep(us);
+}
+
+int __wrap_system(const char* command) {
+    host::TraceEvent event("shell");
+    const int status = __real_system(command);
+    event.Add("command", command).Add("status", status);
+    return status;
+}
+
+// From popen() to pclose(), which must be of the same thread. One at a time is enough.
+static thread_local std::optional<host::TraceEvent> gPipe;
+
+FILE* __wrap_popen(const char* command, const char* mode) {
+    gPipe.emplace("shell").Add("command", command);
+    return __real_popen(command, mode);
+}
+
+int __wrap_pclose(FILE* stream) {
+    const int status = __real_pclose(stream);
+    if (gPipe.has_value()) {
+        gPipe->Add("status", status);
+        gPipe.reset();
+    }
+    return status;
+}
+
+}  // extern "C"

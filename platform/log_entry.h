@@ -1,0 +1,32 @@
+// An entry of the device's log, as the file `log` in the device root holds it: this header, then
+// `size` bytes with the priority (one byte), the tag and the text, both with a terminating zero.
+// Writers append each entry in one call.
+#pragma once
+
+#include <android/log.h>
+
+#include <cstddef>
+#include <cstdint>
+
+namespace host {
+
+constexpr char kLogFile[] = "log";
+constexpr size_t kMaxLogText = 1023;  // bytes of a text before its terminator, as on a device
+
+// In the machine's byte order.
+struct LogEntryHeader {
+    uint32_t size;
+    int32_t pid;
+    int32_t tid;
+    uint32_t seconds;  // since 1970-01-01 UTC
+    uint32_t nanoseconds;
+};
+
+// How readers show a priority; '?' for a number that is none.
+constexpr char LogPriorityLetter(int priority) {
+    return priority >= ANDROID_LOG_VERBOSE && priority <= ANDROID_LOG_SILENT
+                   ? "VDIWEFS"[priority - ANDROID_LOG_VERBOSE]
+                   : '?';
+}
+
+}  // namespace host
