@@ -1,0 +1,180 @@
+// The tool's parts inside one process, each beside a baseline that does the same work directly.
+// Wants an empty device root, and one processor for itself and the service that it starts: where
+// the scheduler puts the two is not what is measured.
+#include <benchmark/benchmark.h>
+
+#include <android/log.h>
+#include <binder/Binder.h>
+#include <binder/IPCThreadState.h>
+#include <binder/IServiceManager.h>
+#include <binder/Parcel.h>
+#include <binder/ProcessState.h>
+#include <fcntl.h>
+#include <sys/prctl.h>
+#include <sys/socket.h>
+#include <sys/system_properties.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "binder/ICorvaneInterfaceClient.h"
+#include "binder/corvane_sys_binder_client.h"
+#include "log/Log.h"
+#include "platform/device_root.h"
+#include "property/Property.h"
+
+namespace {
+
+using benchmark::DoNotOptimize;
+using benchmark::State;
+
+constexpr char kServiceName[] = "service.corvaneinterfaceservice";
+constexpr char kKey[] = "odm.thp.dae_alive";
+constexpr char kPath[] = "properties/odm.thp.dae_alive";
+constexpr int kLargestReply = (1 << 20) - 2 * 4096 - 4;  // without terminator and padding
+
+// The daemon: its answer has as many bytes as the command says.
+class Service : public android::BBinder {
+    android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
+                                 android::Parcel* reply, uint32_t /* flags */) override {
+        data.enforceInterface(ICorvaneInterfaceClient::descriptor);
+        mText.resize(strtoul(data.readCString(), nullptr, 10), '#');
+        return reply->writeCString(mText.c_str());
+    }
+
+    std::string mText;
+};
+
+void ReadValue(char* value) {
+    const int file =
+            openat(host::DeviceRoot(), kPath, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+    const ssize_t size = read(file, value, PROP_VALUE_MAX - 1);
+    close(file);
+    value[size > 0 ? size : 0] = '\0';
+}
+
+void GetTpd(State& state) {
+    Property property;
+    std::string value;
+    for (auto _ : state) {
+        DoNotOptimize(property.Get(kKey, value, "false"));
+    }
+}
+BENCHMARK(GetTpd)->Name("Get/tpd");
+
+void GetBaseline(State& state) {
+    char value[PROP_VALUE_MAX];
+    for (auto _ : state) {
+        ReadValue(value);
+        DoNotOptimize(value);
+    }
+}
+BENCHMARK(GetBaseline)->Name("Get/baseline");
+
+void SetSameTpd(State& state) {
+    Property property;
+    for (auto _ : state) {
+        property.Set(kKey, "true");
+    }
+}
+BENCHMARK(SetSameTpd)->Name("Set, no change/tpd");
+
+void SetSameBaseline(State& state) {
+    char value[PROP_VALUE_MAX];
+    for (auto _ : state) {
+        ReadValue(value);
+        DoNotOptimize(strcmp(value, "true"));
+    }
+}
+BENCHMARK(SetSameBaseline)->Name("Set, no change/baseline");
+
+void RunTpd(State& state) {
+    const std::string command = kTwoWayMarker + std::to_string(state.range(0));
+    for (auto _ : state) {
+        DoNotOptimize(RunCmdParms(command, ""));
+    }
+}
+BENCHMARK(RunTpd)->Name("RunCmdParms/tpd")->Arg(16)->Arg(4096)->Arg(kLargestReply);
+
+int Connect() {
+    sockaddr_un address = {AF_UNIX, ""};
+    snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d/dev/vndbinder/%s",
+             host::DeviceRoot(), kServiceName);
+    const int connection = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    const bool connected =
+            connect(connection, reinterpret_cast<sockaddr*>(&address), sizeof(address)) == 0;
+    return connected ? connection : -1;
+}
+
+// The socket's own cost: the same bytes there and back, into one buffer.
+void RunBaseline(State& state) {
+    android::Parcel body;
+    body.writeInterfaceToken(ICorvaneInterfaceClient::descriptor);
+    body.writeCString(std::to_string(state.range(0)).c_str());
+    body.writeInt32(0);
+    const uint32_t header[] = {0, 0x10, static_cast<uint32_t>(body.dataSize())};
+    std::string request(reinterpret_cast<const char*>(header), sizeof(header));
+    request.append(reinterpret_cast<const char*>(body.data()), body.dataSize());
+    std::vector<char> reply(kLargestReply + 4);
+    const int connection = Connect();
+    for (auto _ : state) {
+        uint32_t answer[2] = {};
+        send(connection, request.data(), request.size(), MSG_NOSIGNAL);
+        recv(connection, answer, sizeof(answer), MSG_WAITALL);
+        if (recv(connection, reply.data(), answer[1], MSG_WAITALL) <= state.range(0)) {
+            state.SkipWithError("no reply");
+            break;
+        }
+        DoNotOptimize(reply.data());
+    }
+    close(connection);
+}
+BENCHMARK(RunBaseline)->Name("RunCmdParms/baseline")->Arg(16)->Arg(4096)->Arg(kLargestReply);
+
+void PrintfTpd(State& state) {
+    for (auto _ : state) {
+        gSysLog.Printf(LOG_INFO, "std::string TpdClient::RunCmd(const char*, const char*)", 120,
+                       "%s %d", "failed", 7);
+    }
+}
+BENCHMARK(PrintfTpd)->Name("Printf, written/tpd");
+
+void PrintfBaseline(State& state) {
+    for (auto _ : state) {
+        __android_log_print(ANDROID_LOG_INFO, "corvane_daemon", "%s[%d] %s %d", "TpdClient::RunCmd",
+                            120, "failed", 7);
+    }
+}
+BENCHMARK(PrintfBaseline)->Name("Printf, written/baseline");
+
+void PrintfFiltered(State& state) {
+    for (auto _ : state) {
+        gSysLog.Printf(LOG_DEBUG, "RunCmd", 120, "failed");
+    }
+}
+BENCHMARK(PrintfFiltered)->Name("Printf, filtered/tpd");
+
+// The service's process goes with this one.
+void StartService() {
+    android::ProcessState::initWithDriver("/dev/vndbinder");
+    android::defaultServiceManager()->addService(android::String16(kServiceName), new Service);
+    if (fork() == 0) {
+        prctl(PR_SET_PDEATHSIG, SIGKILL);
+        android::IPCThreadState::self()->joinThreadPool();
+    }
+    __system_property_set(kKey, "true");
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    StartService();
+    benchmark::Initialize(&argc, argv);
+    return benchmark::RunSpecifiedBenchmarks() > 0 ? 0 : 1;
+}
