@@ -3,7 +3,7 @@
 
 #include <string>
 
-// In front of a command, whatever precedes it: the call is two-way. Removed before it is sent.
+// Makes the call of a command that carries it two-way; sent without it and all that precedes it.
 constexpr char kTwoWayMarker[] = "[TPD]";
 
 // How an answer begins when the service could not be obtained.
