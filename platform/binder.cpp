@@ -13,6 +13,7 @@
 #include <thread>
 
 #include "device_root.h"
+#include "trace.h"
 #include "vndbinder.h"
 
 namespace android {
@@ -20,16 +21,15 @@ namespace android {
 namespace {
 
 constexpr char kDefaultDriver[] = "/dev/binder";
-constexpr std::chrono::milliseconds kGetServiceLimit(5000);
-constexpr std::chrono::milliseconds kGetServicePause(100);
+constexpr int64_t kGetServiceLimitUs = 5000000;
+constexpr int64_t kGetServicePauseUs = 100000;
 
 sp<ProcessState> gProcess;
 sp<IServiceManager> gServiceManager;
 
-std::chrono::milliseconds GetServiceLimit() {
-    const char* const text = getenv("TPD_GET_SERVICE_MS");
-    return text != nullptr ? std::chrono::milliseconds(strtoul(text, nullptr, 10))
-                           : kGetServiceLimit;
+int64_t GetServiceLimitUs() {
+    const char* const ms = getenv("TPD_GET_SERVICE_MS");
+    return ms != nullptr ? strtol(ms, nullptr, 10) * 1000 : kGetServiceLimitUs;
 }
 
 // Service names are plain ASCII; any other code unit makes a name that nobody publishes.
@@ -46,19 +46,11 @@ std::string ServiceName(const String16& name) {
 class DriverServiceManager : public IServiceManager {
   public:
     sp<IBinder> getService(const String16& name) const override {
-        const auto deadline = std::chrono::steady_clock::now() + GetServiceLimit();
-        for (;;) {
-            sp<IBinder> binder = checkService(name);
-            if (binder != nullptr ||
-                std::chrono::steady_clock::now() + kGetServicePause > deadline) {
-                return binder;
-            }
-            std::this_thread::sleep_for(kGetServicePause);
-        }
+        return LookUp(ServiceName(name), GetServiceLimitUs());
     }
 
     sp<IBinder> checkService(const String16& name) const override {
-        return host::ConnectService(ProcessState::self()->getDriverName(), ServiceName(name));
+        return LookUp(ServiceName(name), 0);
     }
 
     status_t addService(const String16& name, const sp<IBinder>& service, bool /* allowIsolated */,
@@ -69,6 +61,22 @@ class DriverServiceManager : public IServiceManager {
 
   protected:
     IBinder* onAsBinder() override { return nullptr; }
+
+  private:
+    static sp<IBinder> LookUp(const std::string& name, int64_t limitUs) {
+        host::TraceEvent event("lookup");
+        const std::string driver = ProcessState::self()->getDriverName();
+        const int64_t start = host::MonotonicUs();
+        sp<IBinder> binder = host::ConnectService(driver, name);
+        while (binder == nullptr && host::MonotonicUs() + kGetServicePauseUs <= start + limitUs) {
+            std::this_thread::sleep_for(std::chrono::microseconds(kGetServicePauseUs));
+            binder = host::ConnectService(driver, name);
+        }
+        event.Add("service", name)
+                .Add("found", binder != nullptr ? 1 : 0)
+                .Add("us", host::MonotonicUs() - start);
+        return binder;
+    }
 };
 
 }  // namespace

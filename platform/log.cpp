@@ -27,14 +27,18 @@ int __android_log_print(int priority, const char* tag, const char* format, ...) 
     if (tag == nullptr) {
         tag = program_invocation_short_name;
     }
-    char text[host::kMaxLogText + 1];
+    char text[host::kMaxLogText + 1] = "";
+    // A stream ends when the buffer is full, where vsnprintf() walks through all that does not fit:
+    // 8 us instead of 1.7 ms for a reply of 1 MiB.
+    FILE* const stream = fmemopen(text, sizeof(text), "w");
+    if (stream == nullptr) {
+        return -errno;
+    }
     va_list args;
     va_start(args, format);
-    const int length = vsnprintf(text, sizeof(text), format, args);
+    vfprintf(stream, format, args);
     va_end(args);
-    if (length < 0) {
-        return -EINVAL;
-    }
+    fclose(stream);
     const char letter = host::LogPriorityLetter(priority);
     host::TraceEvent("log").Add("priority", {&letter, 1}).Add("tag", tag).Add("text", text);
 

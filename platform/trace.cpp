@@ -5,6 +5,7 @@
 
 #include <atomic>
 #include <cerrno>
+#include <cinttypes>
 #include <cstdio>
 
 #include "device_root.h"
@@ -34,14 +35,19 @@ void LookForTrace() {
     gTraced = exists ? Traced::kYes : Traced::kNo;
 }
 
+int64_t MonotonicUs() {
+    timespec now = {};
+    clock_gettime(CLOCK_MONOTONIC, &now);
+    return int64_t{now.tv_sec} * 1000000 + now.tv_nsec / 1000;
+}
+
 TraceEvent::TraceEvent(const char* what) {
     const int error = errno;
     if (IsTraced()) {
-        timespec now = {};
-        clock_gettime(CLOCK_MONOTONIC, &now);
+        const int64_t now = MonotonicUs();
         char start[64];
-        snprintf(start, sizeof(start), "{\"time\":%lld.%06ld", static_cast<long long>(now.tv_sec),
-                 now.tv_nsec / 1000);
+        snprintf(start, sizeof(start), "{\"time\":%" PRId64 ".%06" PRId64, now / 1000000,
+                 now % 1000000);
         mLine = start;
         Add("pid", getpid()).Add("who", program_invocation_short_name).Add("what", what);
     }

@@ -22,6 +22,9 @@ bool IsTraced();
 // Looks again. For processes that live longer than one command.
 void LookForTrace();
 
+// CLOCK_MONOTONIC in microseconds.
+int64_t MonotonicUs();
+
 // One event, appended when the object goes. Does nothing while nobody watches; keeps errno.
 class TraceEvent {
   public:

@@ -1,8 +1,5 @@
 // A binder driver in the device root: every published service is a socket in the driver's folder,
 // every proxy a connection to one.
-//
-// A request is its code, flags and size, a reply its status and size, each followed by that many
-// parcel bytes; a one-way request has no reply. All numbers have 32 bits in the machine's order.
 #pragma once
 
 #include <string>
@@ -11,10 +8,13 @@
 
 namespace host {
 
-// The driver's receive buffer: 1 MiB less two pages. Neither a request nor a reply is larger.
+// The driver's receive buffer: 1 MiB less two pages. Neither a request nor a reply is larger, and a
+// one-way request gets half of it.
 constexpr size_t kMaxTransactionBytes = (1 << 20) - 2 * 4096;
+constexpr size_t kMaxOneWayBytes = kMaxTransactionBytes / 2;
 
-// A proxy of the service, or null when nobody serves it. `driver` is its path on the device.
+// A proxy of the service, or null when nobody serves it or can take a client just now. `driver` is
+// its path on the device.
 android::sp<android::IBinder> ConnectService(const std::string& driver, const std::string& name);
 
 // A proxy over a connected socket, which it owns.
@@ -27,7 +27,7 @@ android::status_t PublishService(const std::string& driver, const std::string& n
 // Accepts clients for ever and serves each on a thread of its own.
 [[noreturn]] void ServeServices();
 
-// Serves one client until it goes or says something that is not a request. Owns the socket.
+// Serves one client until it goes or sends something that is not a request. Owns the socket.
 void ServeClient(int connection, const android::sp<android::IBinder>& service);
 
 }  // namespace host

@@ -1,0 +1,187 @@
+#include <fcntl.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <vector>
+
+#include <binder/Parcel.h>
+
+#include "trace.h"
+#include "vndbinder.h"
+#include "vndbinder_wire.h"
+
+using android::IBinder;
+using android::Parcel;
+using android::sp;
+using android::status_t;
+using android::wp;
+
+namespace host {
+
+namespace {
+
+// The client's library tells the service that it accepts file descriptors in the reply.
+constexpr uint32_t kAcceptFds = 0x10;
+
+// The client's end of one service. For one thread at a time, like the process that uses it.
+class RemoteBinder : public IBinder {
+  public:
+    explicit RemoteBinder(int connection) : mConnection(connection) {}
+    ~RemoteBinder() override { Close(); }
+
+    status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
+        flags |= kAcceptFds;
+        TraceEvent("call")
+                .Add("code", code)
+                .Add("flags", flags)
+                .AddHex("request", data.data(), data.dataSize());
+        const int64_t start = MonotonicUs();
+        Parcel discarded;
+        Parcel& received = reply != nullptr ? *reply : discarded;
+        const status_t status = Call(code, data, received, flags);
+        const bool hasReply = status == android::OK && (flags & FLAG_ONEWAY) == 0;
+        TraceEvent("reply")
+                .Add("status", status)
+                .Add("bytes", static_cast<int64_t>(hasReply ? received.dataSize() : 0))
+                .Add("us", MonotonicUs() - start);
+        return status;
+    }
+
+    status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
+                         uint32_t flags) override {
+        const status_t status = mConnection < 0 ? android::DEAD_OBJECT : android::OK;
+        if (status == android::OK) {
+            mLinks.push_back({recipient, cookie, flags});
+        }
+        TraceEvent("link_to_death").Add("status", status);
+        return status;
+    }
+
+    status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie, uint32_t flags,
+                           wp<DeathRecipient>* outRecipient) override {
+        const status_t status = Unlink({recipient, cookie, flags}, outRecipient);
+        TraceEvent("unlink_to_death").Add("status", status);
+        return status;
+    }
+
+  private:
+    struct Link {
+        wp<DeathRecipient> recipient;
+        void* cookie;
+        uint32_t flags;
+    };
+
+    status_t Call(uint32_t code, const Parcel& data, Parcel& reply, uint32_t flags) {
+        if (mConnection < 0) {
+            return android::DEAD_OBJECT;
+        }
+        const bool oneWay = (flags & FLAG_ONEWAY) != 0;
+        if (data.dataSize() > (oneWay ? kMaxOneWayBytes : kMaxTransactionBytes)) {
+            return android::FAILED_TRANSACTION;
+        }
+        const RequestHeader header = {code, flags, static_cast<uint32_t>(data.dataSize())};
+        if (!SendMessage(mConnection, &header, sizeof(header), data)) {
+            return OwnerDied();
+        }
+        return oneWay ? android::OK : ReceiveReply(reply);
+    }
+
+    status_t ReceiveReply(Parcel& reply) {
+        ReplyHeader header = {};
+        if (!Receive(mConnection, &header, sizeof(header))) {
+            return OwnerDied();
+        }
+        if (header.size > kMaxTransactionBytes) {
+            // What follows cannot be told from the next reply: the connection is of no more use.
+            OwnerDied();
+            return android::FAILED_TRANSACTION;
+        }
+        uint8_t* const buffer = reply.resizeForOverwrite(header.size);
+        if (buffer == nullptr || !Receive(mConnection, buffer, header.size)) {
+            reply.resizeForOverwrite(0);
+            return OwnerDied();
+        }
+        if (header.status != android::OK) {
+            reply.resizeForOverwrite(0);
+        }
+        // A positive status is no failure, as on a device.
+        return std::min<status_t>(header.status, android::OK);
+    }
+
+    status_t Unlink(const Link& old, wp<DeathRecipient>* outRecipient) {
+        if (mConnection < 0) {
+            return android::DEAD_OBJECT;
+        }
+        const auto link = std::find_if(mLinks.begin(), mLinks.end(), [&old](const Link& each) {
+            return each.recipient == old.recipient && each.cookie == old.cookie &&
+                   each.flags == old.flags;
+        });
+        if (link == mLinks.end()) {
+            return android::NAME_NOT_FOUND;
+        }
+        if (outRecipient != nullptr) {
+            *outRecipient = link->recipient;
+        }
+        mLinks.erase(link);
+        return android::OK;
+    }
+
+    void Close() {
+        if (mConnection >= 0) {
+            close(mConnection);
+            mConnection = -1;
+        }
+    }
+
+    // Tells the recipients, once, on this thread.
+    status_t OwnerDied() {
+        const TraceEvent event("binder_died");
+        Close();
+        const sp<IBinder> keep(this);
+        const std::vector<Link> links = std::move(mLinks);
+        mLinks.clear();
+        for (const Link& link : links) {
+            const sp<DeathRecipient> recipient = link.recipient.promote();
+            if (recipient != nullptr) {
+                recipient->binderDied(wp<IBinder>(this));
+            }
+        }
+        return android::DEAD_OBJECT;
+    }
+
+    int mConnection;  // -1 once the owner is known to be dead
+    std::vector<Link> mLinks;
+};
+
+// Connects without waiting for a service that is too busy to accept: the next lookup may find it.
+bool Connect(int socket, const sockaddr_un& address) {
+    return fcntl(socket, F_SETFL, O_NONBLOCK) == 0 &&
+           connect(socket, reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0 &&
+           fcntl(socket, F_SETFL, 0) == 0;
+}
+
+}  // namespace
+
+sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
+    sockaddr_un address;
+    const int connection = SocketAddress(driver, name, address) ? NewSocket() : -1;
+    if (connection < 0) {
+        return nullptr;
+    }
+    if (!Connect(connection, address)) {
+        close(connection);
+        return nullptr;
+    }
+    if (!IsOwnPeer(connection)) {
+        fprintf(stderr, "%s: served by another user\n", name.c_str());
+        close(connection);
+        return nullptr;
+    }
+    return NewProxy(connection);
+}
+
+sp<IBinder> NewProxy(int connection) { return new RemoteBinder(connection); }
+
+}  // namespace host

@@ -1,0 +1,86 @@
+#include "vndbinder_wire.h"
+
+#include <sys/socket.h>
+#include <sys/uio.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+
+#include "device_root.h"
+
+namespace host {
+
+namespace {
+
+constexpr int kMaxNameBytes = 80;
+
+}  // namespace
+
+bool SendMessage(int connection, const void* header, size_t headerSize,
+                 const android::Parcel& parcel) {
+    iovec parts[] = {{const_cast<void*>(header), headerSize},
+                     {const_cast<uint8_t*>(parcel.data()), parcel.dataSize()}};
+    msghdr message = {};
+    message.msg_iov = parts;
+    message.msg_iovlen = 2;
+    size_t left = headerSize + parcel.dataSize();
+    while (left > 0) {
+        const ssize_t sent = sendmsg(connection, &message, MSG_NOSIGNAL);
+        if (sent < 0) {
+            if (errno == EINTR) {
+                continue;
+            }
+            return false;
+        }
+        left -= static_cast<size_t>(sent);
+        auto done = static_cast<size_t>(sent);
+        for (iovec& part : parts) {
+            const size_t step = std::min(done, part.iov_len);
+            part.iov_base = static_cast<char*>(part.iov_base) + step;
+            part.iov_len -= step;
+            done -= step;
+        }
+    }
+    return true;
+}
+
+bool Receive(int connection, void* buffer, size_t size) {
+    auto* next = static_cast<char*>(buffer);
+    while (size > 0) {
+        const ssize_t received = recv(connection, next, size, MSG_WAITALL);
+        if (received < 0 && errno == EINTR) {
+            continue;
+        }
+        if (received <= 0) {
+            return false;
+        }
+        next += received;
+        size -= static_cast<size_t>(received);
+    }
+    return true;
+}
+
+bool IsOwnPeer(int connection) {
+    ucred peer = {};
+    socklen_t size = sizeof(peer);
+    return getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &size) == 0 &&
+           peer.uid == geteuid();
+}
+
+int NewSocket() { return socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0); }
+
+bool SocketAddress(const std::string& driver, const std::string& name, sockaddr_un& address) {
+    if (DeviceRoot() < 0 || name.empty() || name.front() == '.' ||
+        name.find('/') != std::string::npos || name.length() > kMaxNameBytes) {
+        return false;
+    }
+    address = {};
+    address.sun_family = AF_UNIX;
+    const int length = snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d%s/%s",
+                                DeviceRoot(), driver.c_str(), name.c_str());
+    return length > 0 && static_cast<size_t>(length) < sizeof(address.sun_path);
+}
+
+}  // namespace host
