@@ -116,9 +116,11 @@ static int Connect(void) {
     snprintf(address.sun_path, sizeof(address.sun_path),
              "/proc/self/fd/%d/dev/vndbinder/service.corvaneinterfaceservice", root);
     const int connection = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    fcntl(connection, F_SETFL, O_NONBLOCK);
     if (connect(connection, (struct sockaddr*)&address, sizeof(address)) != 0) {
         Fail("connect");
     }
+    fcntl(connection, F_SETFL, 0);
     getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &size);
     geteuid();
     return connection;

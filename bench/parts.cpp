@@ -13,11 +13,9 @@
 #include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/system_properties.h>
-#include <sys/un.h>
 #include <unistd.h>
 
 #include <csignal>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <string>
@@ -27,6 +25,8 @@
 #include "binder/corvane_sys_binder_client.h"
 #include "log/Log.h"
 #include "platform/device_root.h"
+#include "platform/vndbinder.h"
+#include "platform/vndbinder_wire.h"
 #include "property/Property.h"
 
 namespace {
@@ -34,10 +34,11 @@ namespace {
 using benchmark::DoNotOptimize;
 using benchmark::State;
 
+constexpr char kDriver[] = "/dev/vndbinder";
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr char kKey[] = "odm.thp.dae_alive";
 constexpr char kPath[] = "properties/odm.thp.dae_alive";
-constexpr int kLargestReply = (1 << 20) - 2 * 4096 - 4;  // without terminator and padding
+constexpr int kLargestReply = host::kMaxTransactionBytes - 4;  // and terminator, and padding
 
 // The daemon: its answer has as many bytes as the command says.
 class Service : public android::BBinder {
@@ -102,36 +103,28 @@ void RunTpd(State& state) {
 }
 BENCHMARK(RunTpd)->Name("RunCmdParms/tpd")->Arg(16)->Arg(4096)->Arg(kLargestReply);
 
-int Connect() {
-    sockaddr_un address = {AF_UNIX, ""};
-    snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d/dev/vndbinder/%s",
-             host::DeviceRoot(), kServiceName);
-    const int connection = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    const bool connected =
-            connect(connection, reinterpret_cast<sockaddr*>(&address), sizeof(address)) == 0;
-    return connected ? connection : -1;
-}
-
 // The socket's own cost: the same bytes there and back, into one buffer.
 void RunBaseline(State& state) {
     android::Parcel body;
     body.writeInterfaceToken(ICorvaneInterfaceClient::descriptor);
     body.writeCString(std::to_string(state.range(0)).c_str());
     body.writeInt32(0);
-    const uint32_t header[] = {0, 0x10, static_cast<uint32_t>(body.dataSize())};
-    std::string request(reinterpret_cast<const char*>(header), sizeof(header));
+    const host::RequestHeader header = {0, 0x10, static_cast<uint32_t>(body.dataSize())};
+    std::string request(reinterpret_cast<const char*>(&header), sizeof(header));
     request.append(reinterpret_cast<const char*>(body.data()), body.dataSize());
-    std::vector<char> reply(kLargestReply + 4);
-    const int connection = Connect();
+    std::vector<char> buffer(host::kMaxTransactionBytes);
+    sockaddr_un address;
+    host::SocketAddress(kDriver, kServiceName, address);
+    const int connection = host::NewSocket();
+    connect(connection, reinterpret_cast<sockaddr*>(&address), sizeof(address));
     for (auto _ : state) {
-        uint32_t answer[2] = {};
+        host::ReplyHeader reply = {};
         send(connection, request.data(), request.size(), MSG_NOSIGNAL);
-        recv(connection, answer, sizeof(answer), MSG_WAITALL);
-        if (recv(connection, reply.data(), answer[1], MSG_WAITALL) <= state.range(0)) {
+        recv(connection, &reply, sizeof(reply), MSG_WAITALL);
+        if (recv(connection, buffer.data(), reply.size, MSG_WAITALL) <= state.range(0)) {
             state.SkipWithError("no reply");
             break;
         }
-        DoNotOptimize(reply.data());
     }
     close(connection);
 }
@@ -162,7 +155,7 @@ BENCHMARK(PrintfFiltered)->Name("Printf, filtered/tpd");
 
 // The service's process goes with this one.
 void StartService() {
-    android::ProcessState::initWithDriver("/dev/vndbinder");
+    android::ProcessState::initWithDriver(kDriver);
     android::defaultServiceManager()->addService(android::String16(kServiceName), new Service);
     if (fork() == 0) {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
