@@ -24,9 +24,6 @@
 enum { kMaxValue = 91, kMaxLogText = 1023, kBlock = 4096, kInfo = 4, kError = 6 };
 enum { kFile = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC };
 
-static const char kDaemonTag[] = "corvane_daemon";
-static const char kToolTag[] = "tpd";
-
 static int root;
 static int logFile;
 static char value[kMaxValue + 1];
@@ -84,12 +81,8 @@ static void WriteProperty(const char* path, const char* text) {
 
 static void ReadKernelCommandLine(void) {
     char line[kBlock];
-    // The device has none of its own: the machine's is read.
-    int file = openat(root, "proc/cmdline", O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    if (file >= 0) {
-        Fail("proc/cmdline");
-    }
-    file = open("/proc/cmdline", O_RDONLY);
+    openat(root, "proc/cmdline", O_RDONLY | O_NONBLOCK | O_CLOEXEC);  // the device has none
+    const int file = open("/proc/cmdline", O_RDONLY);
     fstat(file, &status);
     if (read(file, line, (size_t)status.st_blksize) < 0) {
         Fail("/proc/cmdline");
@@ -105,8 +98,8 @@ static void Start(void) {
     logFile = openat(root, "log", O_WRONLY | O_APPEND | O_CREAT | kFile, 0600);
     fstat(logFile, &status);
     faccessat(root, "trace", F_OK, 0);
-    Log(kInfo, kDaemonTag, "InitTpdCmds[120] +\n");
-    Log(kInfo, kDaemonTag, "ExcuteTpdCmd[142] +\n");
+    Log(kInfo, "corvane_daemon", "InitTpdCmds[120] +\n");
+    Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[142] +\n");
 }
 
 static int Connect(void) {
@@ -186,9 +179,9 @@ static void Refuse(void) {
 
 static void Forward(const char* command) {
     char line[kMaxLogText + 1];
-    Log(kInfo, kDaemonTag, "ExcuteTpdCmd[150] -\n");
+    Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[150] -\n");
     snprintf(line, sizeof(line), "corvane_daemon ThpDebugExecuteCmd[156] cmd %s\n", command);
-    Log(kInfo, kDaemonTag, line);
+    Log(kInfo, "corvane_daemon", line);
     ReadKernelCommandLine();
     ReadProperty(PERMISSIVE);
     if (strcmp(value, "true") != 0) {
@@ -198,23 +191,23 @@ static void Forward(const char* command) {
     ReadProperty("properties/odm.thp.dae_alive");
     ReadProperty("properties/odm.thp.binder");
     ReadProperty(REBOOT_TIMES);
-    Log(kInfo, kToolTag, "ThpGetBinder");
+    Log(kInfo, "tpd", "ThpGetBinder");
     const int connection = Connect();
-    Log(kError, kToolTag, "enter");
-    Log(kError, kToolTag, "ThpGetBinder ret = 0");
+    Log(kError, "tpd", "enter");
+    Log(kError, "tpd", "ThpGetBinder ret = 0");
     char* const text = Call(connection, command);
     ReadProperty(REBOOT_TIMES);
     strcpy(line, "ret = ");
     strncat(line, text, sizeof(line) - sizeof("ret = "));
-    Log(kInfo, kDaemonTag, line);
+    Log(kInfo, "corvane_daemon", line);
     Print(connection, text);
 }
 
 static void Stop(void) {
-    Log(kInfo, kDaemonTag, "ExcuteTpdCmd[145] Get cmd. stop\n");
+    Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[145] Get cmd. stop\n");
     ReadProperty(SERVICE_ENABLE);
     WriteProperty(SERVICE_ENABLE, "0");
-    Log(kError, kDaemonTag, "retry:1, i = 0, odm.thp.service_enable, [new]0, [old]1");
+    Log(kError, "corvane_daemon", "retry:1, i = 0, odm.thp.service_enable, [new]0, [old]1");
     usleep(100);
     ReadProperty(SERVICE_ENABLE);
     BeginOutput();

@@ -1,10 +1,10 @@
 #!/usr/bin/env python3
-"""Measures tpd beside its baseline: compare.py BUILD PICTURE
+"""Measures tpd beside its baseline, prints the tables of docs/performance.md, draws its picture.
 
-Writes BUILD/results.json and the picture, and prints the tables of docs/performance.md. Every ratio
-is of two programs that took turns in the same minute.
+compare.py BUILD PICTURE: on a device whose daemon runs without init, so that it outlives `stop`.
+BUILD/parts.json has what bench/parts measured. BUILD/results.json gets everything, by table, row,
+program and measure.
 """
-import contextlib
 import json
 import os
 import platform
@@ -12,132 +12,184 @@ import re
 import shlex
 import subprocess
 import sys
-import tempfile
 import time
 from pathlib import Path
 from statistics import median, quantiles
 
 BUILD, PICTURE = Path(sys.argv[1]), sys.argv[2]
-TPD, BASELINE, SHARED = f"{BUILD}/tpd", f"{BUILD}/bench/baseline", f"{BUILD}/bench/baseline_shared"
-FORWARDED = "THP_GetVersion"
-PERMISSIVE, ENABLE = "odm.thp.debug.selinux.permissive", "odm.thp.service_enable"
-LARGEST_REPLY = (1 << 20) - 2 * 4096 - 4  # bytes, without terminator and padding
-BATCH = 256  # processes that the clients share
-# The arguments of tpd, those of the baseline, and the property that is set before each run.
-SCENARIOS = {
-    "forwarded": ([FORWARDED], [FORWARDED], (PERMISSIVE, "true")),
-    "stop": (["stop"], [], (ENABLE, "1")),
-    "refused": ([FORWARDED], [FORWARDED], (PERMISSIVE, "null")),
+ROOT = Path(os.environ["TPD_DEVICE_ROOT"])
+OUTPUT, CALLS, TIMES = ROOT / "output", ROOT / "calls", ROOT / "times.json"
+TPD, BASELINE, COMMAND = f"{BUILD}/tpd", f"{BUILD}/bench/baseline", "THP_GetVersion"
+FORWARDED = {"baseline": [BASELINE, COMMAND], "tpd": [TPD, COMMAND]}
+PERMISSIVE = "odm.thp.debug.selinux.permissive"
+# What runs, and the property that is set before each run.
+COMMANDS = {
+    "forwarded": (FORWARDED, (PERMISSIVE, "true")),
+    "refused": (FORWARDED, (PERMISSIVE, "null")),
+    "stop": ({"baseline": [BASELINE], "tpd": [TPD, "stop"]}, ("odm.thp.service_enable", "1")),
 }
+LARGEST_REPLY = (1 << 20) - 2 * 4096 - 4  # bytes; four more are terminator and padding
+BATCH = 128  # processes that all clients together start
 
 
 def run(*command):
-    return subprocess.run(command, check=True, text=True, stdout=subprocess.PIPE).stdout
+    return subprocess.run(command, check=True, text=True, capture_output=True).stdout
 
 
 def setprop(key, value):
     run("setprop", key, str(value))
 
 
-@contextlib.contextmanager
-def device_root():
-    """A device root of its own, in memory where the machine has such a folder."""
-    memory = "/dev/shm" if os.access("/dev/shm", os.W_OK) else None
-    with tempfile.TemporaryDirectory(prefix="tpd-bench-", dir=memory) as root:
-        os.environ["TPD_DEVICE_ROOT"] = root
-        yield Path(root)
-
-
-@contextlib.contextmanager
-def daemon():
-    """The simulated daemon, without an init that would end it at each `stop`."""
-    setprop("odm.thp.dae_reboot_times", "0")
-    process = subprocess.Popen([BUILD / "device/corvane_daemon"])
-    try:
-        while process.poll() is None and run("getprop", "odm.thp.binder") != "1\n":
-            time.sleep(0.01)
-        yield
-    finally:
-        process.kill()
-        process.wait()
-
-
-def alternate(root, commands, rounds, runs, *options):
-    """Times the commands in short rounds; ratios are to the baseline's in the same round."""
-    times = root / "times.json"
-    wall, cpu = {name: [] for name in commands}, {name: [] for name in commands}
+def alternate(commands, rounds, runs, *options):
+    """Times the commands in short rounds. A ratio is of two medians of one round."""
+    samples = {name: {"wall us": [], "CPU us": []} for name in commands}
     for _ in range(rounds):
         run("hyperfine", "-N", "--style=none", "--warmup=2", f"--runs={runs}", *options,
-            f"--output={root}/output", f"--export-json={times}",
-            *map(shlex.join, commands.values()))
-        for name, result in zip(commands, json.loads(times.read_text())["results"]):
-            wall[name].append(1e6 * result["median"])
-            cpu[name].append(1e6 * (result["user"] + result["system"]))
-    def ratios(values, name):
-        return [own / base for own, base in zip(values[name], values["baseline"])]
-    return {name: {"wall_us": median(wall[name]), "cpu_us": median(cpu[name]),
-                   "wall_ratio": median(ratios(wall, name)),
-                   "wall_ratio_quartiles": quantiles(ratios(wall, name))[::2],
-                   "cpu_ratio": median(ratios(cpu, name))} for name in commands}
+            f"--output={OUTPUT}", f"--export-json={TIMES}", *map(shlex.join, commands.values()))
+        for sample, result in zip(samples.values(), json.loads(TIMES.read_text())["results"]):
+            sample["wall us"].append(1e6 * result["median"])
+            sample["CPU us"].append(1e6 * (result["user"] + result["system"]))
+    row = {name: {measure: round(median(values)) for measure, values in sample.items()}
+           for name, sample in samples.items()}
+    row["ratio"] = {}
+    for measure, values in samples["tpd"].items():
+        ratios = [own / base for own, base in zip(values, samples["baseline"][measure])]
+        row["ratio"][measure] = [round(ratio, 2) for ratio in quantiles(ratios, method="inclusive")]
+    return row
 
 
-def traced(root, command, *options):
-    """What strace writes of one run."""
-    with open(root / "output", "w") as output:
-        subprocess.run(["strace", f"--output={root}/calls", *options, *command], check=True,
+def strace(command, *options):
+    with open(OUTPUT, "w") as output:
+        subprocess.run(["strace", f"--output={CALLS}", *options, *command], check=True,
                        stdout=output)
-    return (root / "calls").read_text()
+    return CALLS.read_text()
 
 
-def call_count(root, command):
-    return int(traced(root, command, "-c", "-f", "-U", "calls").split()[-1])
-
-
-def own_calls(root, command):
-    """System calls and results from the device root's on, memory and process numbers aside."""
-    text = traced(root, command, "-e", "trace=!%memory,getpid,gettid,clone3,vfork,wait4")
+def own_calls(command):
+    """Calls and results from the first look at the device on, memory and process ids aside."""
+    text = strace(command, "-e", "trace=!%memory,getpid,gettid,clone3,vfork,wait4")
     return re.findall(r"^(\w+)\(.*\) += (-?\d+)", text[text.index('"/dev/null"'):], re.M)
 
 
+def all_calls(command):
+    return int(strace(command, "-c", "-f", "-U", "calls").split()[-2])
+
+
 def instructions(command):
-    """User instructions of the program itself."""
-    result = subprocess.run(["valgrind", "--tool=callgrind", "--callgrind-out-file=/dev/null",
-                             *command], check=True, text=True, capture_output=True)
-    return int(re.search(r"Collected : (\d+)", result.stderr)[1])
+    """Those of the program itself, in user mode."""
+    counted = subprocess.run(["valgrind", "--tool=callgrind", "--callgrind-out-file=/dev/null",
+                              *command], check=True, text=True, capture_output=True)
+    return int(re.search(r"Collected : (\d+)", counted.stderr)[1])
 
 
-def peak_kib(command):
-    """Resident memory when it writes its result, where a full pipe holds it."""
-    reader, writer = os.pipe()
-    os.set_blocking(writer, False)
-    with contextlib.suppress(BlockingIOError):
-        while True:
-            os.write(writer, bytes(4096))
-    os.set_blocking(writer, True)
-    with subprocess.Popen(command, stdout=writer) as process:
-        time.sleep(0.3)
-        status = Path(f"/proc/{process.pid}/status").read_text()
-        process.kill()
-    os.close(reader)
-    os.close(writer)
-    return int(re.search(r"VmHWM:\s+(\d+)", status)[1])
+def page_faults(command):
+    quiet = [(os.POSIX_SPAWN_OPEN, 1, OUTPUT, os.O_WRONLY, 0)]
+    process = os.posix_spawn(command[0], command, os.environ, file_actions=quiet)
+    return os.wait4(process, 0)[2].ru_minflt
 
 
-def measure_scenario(root, arguments, baseline_arguments, prepare):
-    commands = {"tpd": [TPD, *arguments], "baseline": [BASELINE, *baseline_arguments],
-                "shared": [SHARED, *baseline_arguments], "true": ["/bin/true"]}
-    def each(measure, names):
-        for name in names:
+def measure_command(commands, prepare):
+    def each(measure):
+        values = {}
+        for name, command in commands.items():
             setprop(*prepare)
-            yield name, measure(commands[name])
-    own = ("tpd", "baseline")
-    for question in (lambda command: run(*command), lambda command: own_calls(root, command)):
-        answers = dict(each(question, own))
-        if answers["tpd"] != answers["baseline"]:
-            sys.exit(f"{arguments}: the baseline differs from tpd: {answers}")
-    results = alternate(root, commands, 20, 25, "--prepare", shlex.join(["setprop", *prepare]))
-    for title, measure in (("instructions", instructions), ("peak_kib", peak_kib),
-                           ("calls", lambda command: call_count(root, command))):
-        for name, value in each(measure, own):
-            results[name][title] = value
-    return results
+            values[name] = measure(command)
+        return values
+
+    for same in (lambda command: run(*command)), own_calls:
+        values = each(same)
+        if values["tpd"] != values["baseline"]:
+            sys.exit(f"the baseline does something else than tpd: {values}")
+    shared = [f"{BASELINE}_shared", *commands["baseline"][1:]]
+    row = alternate({"true": ["/bin/true"], "shared": shared, **commands}, 20, 25,
+                    "--prepare", shlex.join(["setprop", *prepare]))
+    for title, measure in (("instructions", instructions), ("system calls", all_calls),
+                           ("page faults", page_faults)):
+        values = each(measure)
+        for name, value in values.items():
+            row[name][title] = value
+        row["ratio"][title] = round(values["tpd"] / values["baseline"], 2)
+    return row
+
+
+def parts():
+    rows = {}
+    for result in json.loads((BUILD / "parts.json").read_text())["benchmarks"]:
+        if result["aggregate_name"] == "median":
+            part, program, *size = result["run_name"].split("/")
+            row = rows.setdefault(" ".join([part, *size]), {"baseline": {}, "tpd": {}})
+            row[program]["wall us"] = round(result["real_time"] / 1000, 4)
+    for row in rows.values():
+        row["ratio"] = {"wall us": round(row["tpd"]["wall us"] / row["baseline"]["wall us"], 2)}
+    return rows
+
+
+def grow(sizes, change, commands=lambda size: FORWARDED, runs=40):
+    rows = {}
+    for size in sizes:
+        change(size)
+        rows[str(size)] = alternate(commands(size), 5, runs)
+    return rows
+
+
+def with_clients(count):
+    (ROOT / "batch").write_text("run\n" * BATCH)
+    xargs = ["xargs", "-a", f"{ROOT}/batch", "-P", str(count), "-I{}"]
+    return {name: [*xargs, *command] for name, command in FORWARDED.items()}
+
+
+def fill_properties(count):
+    for number in range(count):
+        (ROOT / f"properties/bench.{number}").touch()
+
+
+def measure():
+    tables = {"commands": {name: measure_command(*each) for name, each in COMMANDS.items()}}
+    tables["parts"] = parts()
+    setprop(PERMISSIVE, "true")
+    setprop("sim.fault", "huge")
+    tables["reply_bytes"] = grow([16, 256, 4096, 65536, LARGEST_REPLY],
+                                 lambda size: setprop("sim.fault_arg", size))
+    setprop("sim.fault", "")
+    tables["clients"] = grow([1, 2, 4, 8, 16, 32, 64], lambda count: None, with_clients, 5)
+    tables["log_bytes"] = grow([1, 1 << 20, 1 << 25, 1 << 30],
+                               lambda size: os.truncate(ROOT / "log", size))
+    tables["properties"] = grow([10, 1000, 10000, 100000], fill_properties)
+    return tables
+
+
+def print_tables(tables):
+    for title, rows in tables.items():
+        columns = [title, "measure", *next(iter(rows.values()))]
+        print(f"\n| {' | '.join(columns)} |\n|{'---|' * len(columns)}")
+        for name, row in rows.items():
+            for measure in row["tpd"]:
+                cells = [str(column.get(measure, "")) for column in row.values()]
+                print(f"| {name} | {measure} | {' | '.join(cells)} |")
+
+
+def draw(title, tables):
+    """Hands gnuplot each table's wall times as a block with its name."""
+    lines = [f"title = '{title}'", f"batch = {BATCH}"]
+    for table, rows in tables.items():
+        lines.append(f"${table} << EOD")
+        for name, row in rows.items():
+            times = [row[each]["wall us"] for each in ("baseline", "tpd", "true") if each in row]
+            lines.append(" ".join([f'"{name}"', *map(str, times)]))
+        lines.append("EOD")
+    (BUILD / "results.gp").write_text("\n".join(lines) + "\n")
+    run("gnuplot", "-e", f"set output '{PICTURE}'", BUILD / "results.gp",
+        Path(__file__).with_name("picture.gp"))
+
+
+def main():
+    kind = "virtual machine" if " hypervisor" in Path("/proc/cpuinfo").read_text() else "machine"
+    title = f"{time.strftime('%Y-%m-%d')}, {kind} with {os.cpu_count()} {platform.machine()} cores"
+    tables = measure()
+    (BUILD / "results.json").write_text(json.dumps({"title": title, "tables": tables}, indent=1))
+    print(title)
+    print_tables(tables)
+    draw(title, tables)
+
+
+main()
