@@ -6,6 +6,7 @@
 #include <binder/Parcel.h>
 #include <binder/ProcessState.h>
 #include <malloc.h>
+#include <unistd.h>
 
 #include <chrono>
 #include <cstdio>
@@ -32,14 +33,9 @@ int64_t GetServiceLimitUs() {
     return ms != nullptr ? strtol(ms, nullptr, 10) * 1000 : kGetServiceLimitUs;
 }
 
-// Service names are plain ASCII; any other code unit makes a name that nobody publishes.
+// Service names are ASCII.
 std::string ServiceName(const String16& name) {
-    std::string text;
-    for (size_t i = 0; i < name.size(); ++i) {
-        const char16_t unit = name.string()[i];
-        text += unit > 0x20 && unit < 0x7F ? static_cast<char>(unit) : '/';
-    }
-    return text;
+    return {name.string(), name.string() + name.size()};
 }
 
 // The sockets in the driver's folder are the list of services.
@@ -81,24 +77,7 @@ class DriverServiceManager : public IServiceManager {
 
 }  // namespace
 
-IInterface::IInterface() = default;
-
-IInterface::~IInterface() = default;
-
-sp<IBinder> IInterface::asBinder(const IInterface* interface) {
-    return interface != nullptr ? const_cast<IInterface*>(interface)->onAsBinder() : nullptr;
-}
-
-sp<IBinder> IInterface::asBinder(const sp<IInterface>& interface) {
-    return asBinder(interface.get());
-}
-
 sp<IInterface> IBinder::queryLocalInterface(const String16& /* descriptor */) { return nullptr; }
-
-const String16& BBinder::getInterfaceDescriptor() const {
-    static const String16 none;
-    return none;
-}
 
 status_t BBinder::transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) {
     data.setDataPosition(0);
@@ -124,10 +103,6 @@ status_t BBinder::onTransact(uint32_t /* code */, const Parcel& /* data */, Parc
     return UNKNOWN_TRANSACTION;
 }
 
-BpRefBase::BpRefBase(const sp<IBinder>& remote) : mRemote(remote) {}
-
-BpRefBase::~BpRefBase() = default;
-
 // On the device the driver's receive buffer is mapped once for the life of the process. Here
 // parcels take it from the heap, which therefore keeps the memory of one call for the next.
 ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {
@@ -135,13 +110,8 @@ ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {
     mallopt(M_TRIM_THRESHOLD, 8 * host::kMaxTransactionBytes);
 }
 
-ProcessState::~ProcessState() = default;
-
 sp<ProcessState> ProcessState::self() {
-    if (gProcess == nullptr) {
-        gProcess = new ProcessState(kDefaultDriver);
-    }
-    return gProcess;
+    return gProcess != nullptr ? gProcess : initWithDriver(kDefaultDriver);
 }
 
 sp<ProcessState> ProcessState::initWithDriver(const char* driver) {
@@ -160,7 +130,11 @@ IPCThreadState* IPCThreadState::self() {
     return &state;
 }
 
-void IPCThreadState::joinThreadPool(bool /* isMain */) { host::ServeServices(); }
+void IPCThreadState::joinThreadPool(bool /* isMain */) {
+    for (;;) {
+        pause();
+    }
+}
 
 sp<IServiceManager> defaultServiceManager() {
     if (gServiceManager == nullptr && host::DeviceRoot() >= 0) {

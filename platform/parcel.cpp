@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <cstring>
 #include <limits>
-#include <new>
 
 namespace android {
 
@@ -12,113 +11,58 @@ namespace {
 constexpr int32_t kNoStrictModePolicy = std::numeric_limits<int32_t>::min();  // 0x80000000
 constexpr int32_t kNoWorkSource = -1;
 constexpr int32_t kVendorHeader = 'V' << 24 | 'N' << 16 | 'D' << 8 | 'R';
-constexpr size_t kMinCapacity = 256;
 
 constexpr size_t Padded(size_t size) { return (size + 3) & ~size_t{3}; }
 
 }  // namespace
 
-Parcel::Parcel() = default;
-
-void Parcel::setDataPosition(size_t position) const { mPosition = std::min(position, mSize); }
+void Parcel::setDataPosition(size_t position) const {
+    mPosition = std::min(position, mData.size());
+}
 
 status_t Parcel::setData(const uint8_t* buffer, size_t size) {
-    uint8_t* const room = resizeForOverwrite(size);
-    if (room == nullptr) {
-        return NO_MEMORY;
-    }
-    std::copy_n(buffer, size, room);
+    mData.assign(buffer, buffer + size);
+    mPosition = 0;
     return OK;
 }
 
 uint8_t* Parcel::resizeForOverwrite(size_t size) {
-    mSize = 0;
+    mData.resize(size);
     mPosition = 0;
-    if (size > mCapacity || mData == nullptr) {
-        mCapacity = std::max(size, kMinCapacity);
-        mData.reset(new (std::nothrow) uint8_t[mCapacity]);
-        if (mData == nullptr) {
-            mCapacity = 0;
-            return nullptr;
-        }
-    }
-    mSize = size;
-    return mData.get();
-}
-
-// Room for `size` bytes at the end, padded with zeros; null when there is no memory.
-uint8_t* Parcel::append(size_t size) {
-    const size_t padded = Padded(size);
-    if (padded < size || padded > std::numeric_limits<size_t>::max() / 2 - mSize) {
-        return nullptr;
-    }
-    const size_t needed = mSize + padded;
-    if (needed > mCapacity) {
-        const size_t capacity = std::max({needed, mCapacity * 2, kMinCapacity});
-        std::unique_ptr<uint8_t[]> grown(new (std::nothrow) uint8_t[capacity]);
-        if (grown == nullptr) {
-            return nullptr;
-        }
-        std::copy_n(mData.get(), mSize, grown.get());
-        mData = std::move(grown);
-        mCapacity = capacity;
-    }
-    uint8_t* const room = mData.get() + mSize;
-    memset(room + size, 0, padded - size);
-    mSize = needed;
-    return room;
+    return mData.data();
 }
 
 // The next `size` bytes and their padding, as far as the content has it; null when it is too short.
 const uint8_t* Parcel::take(size_t size) const {
-    if (size > mSize - mPosition) {
+    if (size > mData.size() - mPosition) {
         return nullptr;
     }
-    const uint8_t* const bytes = mData.get() + mPosition;
-    mPosition += std::min(Padded(size), mSize - mPosition);
+    const uint8_t* const bytes = mData.data() + mPosition;
+    mPosition += std::min(Padded(size), mData.size() - mPosition);
     return bytes;
 }
 
-status_t Parcel::writeInt32(int32_t value) {
-    uint8_t* const room = append(sizeof(value));
-    if (room == nullptr) {
-        return NO_MEMORY;
-    }
-    memcpy(room, &value, sizeof(value));
+status_t Parcel::write(const void* bytes, size_t size) {
+    const size_t end = mData.size();
+    mData.resize(end + Padded(size));
+    memcpy(mData.data() + end, bytes, size);
     return OK;
 }
 
+status_t Parcel::writeInt32(int32_t value) { return write(&value, sizeof(value)); }
+
 status_t Parcel::writeCString(const char* text) {
-    if (text == nullptr) {
-        return BAD_VALUE;
-    }
-    const size_t size = strlen(text) + 1;
-    uint8_t* const room = append(size);
-    if (room == nullptr) {
-        return NO_MEMORY;
-    }
-    memcpy(room, text, size);
-    return OK;
+    return text != nullptr ? write(text, strlen(text) + 1) : BAD_VALUE;
 }
 
 status_t Parcel::writeString16(const String16& text) {
-    const size_t bytes = text.size() * sizeof(char16_t);
     const status_t status = writeInt32(static_cast<int32_t>(text.size()));
-    if (status != OK) {
-        return status;
-    }
-    uint8_t* const room = append(bytes + sizeof(char16_t));
-    if (room == nullptr) {
-        return NO_MEMORY;
-    }
-    memcpy(room, text.string(), bytes);
-    memset(room + bytes, 0, sizeof(char16_t));
-    return OK;
+    return status == OK ? write(text.string(), (text.size() + 1) * sizeof(char16_t)) : status;
 }
 
 status_t Parcel::writeInterfaceToken(const String16& interface) {
-    for (const int32_t word : {kNoStrictModePolicy, kNoWorkSource, kVendorHeader}) {
-        const status_t status = writeInt32(word);
+    for (const int32_t field : {kNoStrictModePolicy, kNoWorkSource, kVendorHeader}) {
+        const status_t status = writeInt32(field);
         if (status != OK) {
             return status;
         }
@@ -147,15 +91,14 @@ int32_t Parcel::readInt32() const {
 }
 
 const char* Parcel::readCString() const {
-    if (mPosition == mSize) {
+    const size_t left = mData.size() - mPosition;
+    const auto* const text = reinterpret_cast<const char*>(mData.data() + mPosition);
+    const size_t length = left > 0 ? strnlen(text, left) : 0;
+    if (length == left) {
         return nullptr;
     }
-    const uint8_t* const text = mData.get() + mPosition;
-    const void* const end = memchr(text, 0, mSize - mPosition);
-    if (end == nullptr) {
-        return nullptr;
-    }
-    return reinterpret_cast<const char*>(take(static_cast<const uint8_t*>(end) - text + 1));
+    take(length + 1);
+    return text;
 }
 
 }  // namespace android

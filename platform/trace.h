@@ -39,8 +39,6 @@ class TraceEvent {
     TraceEvent& AddHex(const char* name, const uint8_t* bytes, size_t size);
 
   private:
-    void AddName(const char* name);
-
     std::string mLine;  // empty while nobody watches
 };
 

@@ -20,12 +20,9 @@ android::sp<android::IBinder> ConnectService(const std::string& driver, const st
 // A proxy over a connected socket, which it owns.
 android::sp<android::IBinder> NewProxy(int connection);
 
-// Publishes a binder of this process. Calls wait until ServeServices().
+// Publishes a binder of this process and serves each client on a thread of its own from now on.
 android::status_t PublishService(const std::string& driver, const std::string& name,
-                                 const android::sp<android::IBinder>& service);
-
-// Accepts clients for ever and serves each on a thread of its own.
-[[noreturn]] void ServeServices();
+                                 const android::sp<android::IBinder>& binder);
 
 // Serves one client until it goes or sends something that is not a request. Owns the socket.
 void ServeClient(int connection, const android::sp<android::IBinder>& service);

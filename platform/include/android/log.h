@@ -1,4 +1,4 @@
-// Host stand-in for the platform's log interface: lines go to the device root's log.
+// Host implementation of the platform's log interface: lines go to the device root's log.
 #pragma once
 
 typedef enum android_LogPriority {

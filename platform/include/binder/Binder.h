@@ -1,4 +1,4 @@
-// Host stand-in for the platform's binder objects on either side of a call.
+// Host implementation of the platform's binder objects on either side of a call.
 #pragma once
 
 #include <binder/IBinder.h>
@@ -8,7 +8,6 @@ namespace android {
 // Service side: a binder of this process. Calls from several threads arrive at once.
 class BBinder : public IBinder {
   public:
-    virtual const String16& getInterfaceDescriptor() const;
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags = 0) final;
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
                          uint32_t flags = 0) override;
@@ -24,8 +23,7 @@ class BBinder : public IBinder {
 // Client side: what a proxy holds its binder with.
 class BpRefBase : public virtual RefBase {
   protected:
-    explicit BpRefBase(const sp<IBinder>& remote);
-    ~BpRefBase() override;
+    explicit BpRefBase(const sp<IBinder>& remote) : mRemote(remote) {}
     IBinder* remote() const { return mRemote.get(); }
 
   private:

@@ -1,4 +1,4 @@
-// Host stand-in for the platform's binder object, local or remote.
+// Host implementation of the platform's binder object, local or remote.
 #pragma once
 
 #include <cstdint>
@@ -29,7 +29,8 @@ class IBinder : public virtual RefBase {
     virtual sp<IInterface> queryLocalInterface(const String16& descriptor);
 
     // Delivers the request and waits for the reply; with FLAG_ONEWAY it does not wait and leaves
-    // the reply empty. Returns 0 or a status, as its owner or the driver gives it.
+    // the reply empty. Returns 0 or a negative status, as its owner or the driver gives it; a
+    // positive one of the owner counts as 0.
     virtual status_t transact(uint32_t code, const Parcel& data, Parcel* reply,
                               uint32_t flags = 0) = 0;
 
@@ -39,7 +40,7 @@ class IBinder : public virtual RefBase {
                                  uint32_t flags = 0) = 0;
 
     // Ends one registration with the same arguments. NAME_NOT_FOUND when there is none, DEAD_OBJECT
-    // when the recipients have been told.
+    // when the recipients have been notified.
     virtual status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
                                    uint32_t flags = 0,
                                    wp<DeathRecipient>* outRecipient = nullptr) = 0;

@@ -1,4 +1,4 @@
-// Host stand-in for the platform's serving threads.
+// Host implementation of the platform's serving threads.
 #pragma once
 
 namespace android {
@@ -7,8 +7,7 @@ class IPCThreadState {
   public:
     static IPCThreadState* self();
 
-    // Serves the services that this process has added, each client on a thread of its own, and
-    // never returns.
+    // Never returns. Every service of this process has threads of its own from addService() on.
     [[noreturn]] void joinThreadPool(bool isMain = true);
 };
 

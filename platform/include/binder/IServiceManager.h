@@ -1,4 +1,4 @@
-// Host stand-in for the platform's service manager.
+// Host implementation of the platform's service manager.
 #pragma once
 
 #include <binder/IInterface.h>

@@ -1,9 +1,9 @@
-// Host stand-in for the platform's message buffer, byte for byte as it is on the wire.
+// Host implementation of the platform's message buffer, byte for byte as it is on the wire.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
-#include <memory>
+#include <vector>
 
 #include <utils/Errors.h>
 #include <utils/String16.h>
@@ -13,23 +13,23 @@ namespace android {
 // Every value starts at a multiple of 4 bytes; what is between is zero.
 class Parcel {
   public:
-    Parcel();
+    Parcel() = default;
     Parcel(const Parcel&) = delete;
     Parcel& operator=(const Parcel&) = delete;
 
-    const uint8_t* data() const { return mData.get(); }
-    size_t dataSize() const { return mSize; }
+    const uint8_t* data() const { return mData.data(); }
+    size_t dataSize() const { return mData.size(); }
     size_t dataPosition() const { return mPosition; }
     void setDataPosition(size_t position) const;
 
     // Replaces the content and starts reading at its beginning.
     status_t setData(const uint8_t* buffer, size_t size);
 
-    // Replaces the content with `size` bytes for the caller to fill; null when there is no memory.
-    // Of this stand-in only: a transport reads into it without another copy.
+    // Gives the content this size, for the caller to fill.
+    // Of this implementation only: a transport reads into it without another copy.
     uint8_t* resizeForOverwrite(size_t size);
 
-    // Writers return 0, BAD_VALUE or NO_MEMORY.
+    // Writers return 0 or BAD_VALUE.
     status_t writeInterfaceToken(const String16& interface);
     status_t writeInt32(int32_t value);
     status_t writeCString(const char* text);
@@ -39,17 +39,15 @@ class Parcel {
     bool enforceInterface(const String16& interface) const;
     // The next number; 0 when there is none.
     int32_t readInt32() const;
-    // The next text, which the parcel keeps; null when no terminator is left.
+    // The next string, which the parcel owns; null when no terminator is left.
     const char* readCString() const;
 
   private:
-    uint8_t* append(size_t size);
+    status_t write(const void* bytes, size_t size);
     const uint8_t* take(size_t size) const;
 
-    std::unique_ptr<uint8_t[]> mData;
-    size_t mSize = 0;
-    size_t mCapacity = 0;
-    mutable size_t mPosition = 0;  // always at most mSize
+    std::vector<uint8_t> mData;
+    mutable size_t mPosition = 0;  // always at most the size
 };
 
 }  // namespace android

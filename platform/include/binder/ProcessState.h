@@ -1,4 +1,4 @@
-// Host stand-in for the platform's per-process binder state: which driver the process uses.
+// Host implementation of the platform's per-process binder state: which driver the process uses.
 #pragma once
 
 #include <string>
@@ -20,7 +20,6 @@ class ProcessState : public virtual RefBase {
 
   private:
     explicit ProcessState(std::string driver);
-    ~ProcessState() override;
 
     const std::string mDriver;
 };

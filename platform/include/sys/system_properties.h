@@ -1,4 +1,4 @@
-// Host stand-in for the platform's system properties: one file each in the device root.
+// Host implementation of the platform's system properties: one file each in the device root.
 #pragma once
 
 #define PROP_VALUE_MAX 92
@@ -7,8 +7,8 @@
 extern "C" {
 #endif
 
-// Copies the value, at most 91 bytes and a terminator, and returns its length; the empty text and 0
-// when the property is unset or cannot be read.
+// Copies the value, at most 91 bytes and a terminator, and returns its length; the empty string and
+// 0 when the property is unset or cannot be read.
 int __system_property_get(const char* name, char* value);
 
 // Returns 0 when the new value stands, otherwise -1: a name or value the platform does not take, a

@@ -1,4 +1,4 @@
-// Host stand-in for the platform's status codes.
+// Host implementation of the platform's status codes.
 #pragma once
 
 #include <errno.h>

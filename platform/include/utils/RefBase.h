@@ -1,48 +1,37 @@
-// Host stand-in for the platform's reference-counted base and weak references to it.
+// Host implementation of the platform's reference-counted base and weak references to it.
 #pragma once
 
 #include <atomic>
 #include <cstdint>
+#include <memory>
 
 #include <utils/StrongPointer.h>
 
 namespace android {
 
-// Destroyed with its last strong reference. The counts outlive it until the last weak one is gone.
+// Destroyed with its last strong reference.
 class RefBase {
   public:
-    class weakref_type {
-      public:
-        explicit weakref_type(RefBase* object) : mObject(object) {}
-        void incWeak(const void* id);
-        void decWeak(const void* id);
-        // Takes a strong reference if somebody else holds one. Returns whether it did.
-        bool attemptIncStrong(const void* id);
-        RefBase* refBase() const { return mObject; }
-
-      private:
-        friend class RefBase;
-        std::atomic<int32_t> mStrong{0};
-        std::atomic<int32_t> mWeak{1};  // the object itself holds one
-        RefBase* const mObject;
-    };
-
     RefBase(const RefBase&) = delete;
     RefBase& operator=(const RefBase&) = delete;
 
-    void incStrong(const void* id) const;
-    void decStrong(const void* id) const;
-    int32_t getStrongCount() const;
-
-    // A weak reference, which the caller gives back with decWeak().
-    weakref_type* createWeak(const void* id) const;
+    void incStrong(const void* /* id */) const { ++*mStrong; }
+    void decStrong(const void* /* id */) const {
+        if (--*mStrong == 0) {
+            delete this;
+        }
+    }
 
   protected:
-    RefBase();
-    virtual ~RefBase();
+    RefBase() = default;
+    virtual ~RefBase() = default;
 
   private:
-    weakref_type* const mRefs;
+    template <typename T>
+    friend class wp;
+
+    // The number of strong references. Weak ones share it, so that it outlives the object.
+    const std::shared_ptr<std::atomic<int32_t>> mStrong = std::make_shared<std::atomic<int32_t>>(0);
 };
 
 template <typename T>
@@ -50,44 +39,30 @@ class wp {
   public:
     wp() = default;
     wp(T* object)  // NOLINT(google-explicit-constructor)
-        : mObject(object), mRefs(object != nullptr ? object->createWeak(this) : nullptr) {}
+        : mObject(object), mStrong(object != nullptr ? object->mStrong : nullptr) {}
     wp(const sp<T>& object) : wp(object.get()) {}  // NOLINT(google-explicit-constructor)
     template <typename U>
     wp(const sp<U>& object) : wp(object.get()) {}  // NOLINT(google-explicit-constructor)
-    wp(const wp& other) : mObject(other.mObject), mRefs(other.mRefs) {
-        if (mRefs != nullptr) {
-            mRefs->incWeak(this);
-        }
-    }
-    ~wp() {
-        if (mRefs != nullptr) {
-            mRefs->decWeak(this);
-        }
-    }
-
-    wp& operator=(wp other) noexcept {
-        std::swap(mObject, other.mObject);
-        std::swap(mRefs, other.mRefs);
-        return *this;
-    }
 
     // A strong reference, null when nobody holds the object any more.
     sp<T> promote() const {
-        if (mRefs == nullptr || !mRefs->attemptIncStrong(this)) {
-            return nullptr;
+        int32_t strong = mStrong != nullptr ? mStrong->load() : 0;
+        while (strong > 0) {
+            if (mStrong->compare_exchange_weak(strong, strong + 1)) {
+                sp<T> object(mObject);
+                mObject->decStrong(this);
+                return object;
+            }
         }
-        sp<T> object(mObject);
-        mObject->decStrong(this);
-        return object;
+        return nullptr;
     }
 
-    T* unsafe_get() const { return mObject; }
-    bool operator==(const wp& other) const { return mRefs == other.mRefs; }
-    bool operator!=(const wp& other) const { return mRefs != other.mRefs; }
+    bool operator==(const wp& other) const { return mStrong == other.mStrong; }
+    bool operator!=(const wp& other) const { return mStrong != other.mStrong; }
 
   private:
     T* mObject = nullptr;
-    RefBase::weakref_type* mRefs = nullptr;
+    std::shared_ptr<std::atomic<int32_t>> mStrong;
 };
 
 }  // namespace android

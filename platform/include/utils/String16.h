@@ -1,4 +1,4 @@
-// Host stand-in for the platform's UTF-16 text.
+// Host implementation of the platform's UTF-16 string.
 #pragma once
 
 #include <cstddef>
@@ -7,11 +7,11 @@
 
 namespace android {
 
-// An unchanging text; copies share it.
+// A constant string, with a terminating zero unit; copies share it.
 class String16 {
   public:
     String16();
-    // From UTF-8; what is not valid becomes U+FFFD.
+    // From ASCII; any other byte becomes U+FFFD.
     explicit String16(const char* text);
 
     const char16_t* string() const { return mText; }
@@ -26,10 +26,10 @@ class String16 {
   private:
     const char16_t* mText;
     size_t mSize;
-    std::shared_ptr<const std::u16string> mOwned;  // null for a constant text
+    std::shared_ptr<const std::u16string> mOwned;  // null for a StaticString16
 };
 
-// A constant text without heap storage, to construct String16 objects from.
+// A constant without heap storage, to construct String16 objects from.
 template <size_t N>
 class StaticString16 : public String16 {
   public:

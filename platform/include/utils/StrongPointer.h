@@ -1,4 +1,4 @@
-// Host stand-in for the platform's strong reference to a RefBase object.
+// Host implementation of the platform's strong reference to a RefBase object.
 #pragma once
 
 #include <utility>
@@ -9,11 +9,13 @@ template <typename T>
 class sp {
   public:
     sp() = default;
-    sp(T* object) : mObject(object) { Acquire(); }  // NOLINT(google-explicit-constructor)
+    sp(T* object) : mObject(object) {  // NOLINT(google-explicit-constructor)
+        if (mObject != nullptr) {
+            mObject->incStrong(this);
+        }
+    }
     sp(const sp& other) : sp(other.mObject) {}
     sp(sp&& other) noexcept : mObject(std::exchange(other.mObject, nullptr)) {}
-    template <typename U>
-    sp(U* object) : sp(static_cast<T*>(object)) {}  // NOLINT(google-explicit-constructor)
     template <typename U>
     sp(const sp<U>& other) : sp(other.get()) {}  // NOLINT(google-explicit-constructor)
     ~sp() { clear(); }
@@ -32,19 +34,10 @@ class sp {
     T* get() const { return mObject; }
     T* operator->() const { return mObject; }
     T& operator*() const { return *mObject; }
-    explicit operator bool() const { return mObject != nullptr; }
     bool operator==(const sp& other) const { return mObject == other.mObject; }
     bool operator!=(const sp& other) const { return mObject != other.mObject; }
-    bool operator==(const T* other) const { return mObject == other; }
-    bool operator!=(const T* other) const { return mObject != other; }
 
   private:
-    void Acquire() const {
-        if (mObject != nullptr) {
-            mObject->incStrong(this);
-        }
-    }
-
     T* mObject = nullptr;
 };
 
