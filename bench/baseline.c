@@ -1,6 +1,6 @@
 // The tool's baseline: its system calls in its order with its bytes, and nothing else.
-//   baseline COMMAND   what `tpd COMMAND` does: forwarded, or refused while SELinux is enforcing
-//   baseline           what `tpd stop` does
+//   baseline THP_GetVersion   as tpd forwards it, or refuses it while SELinux is enforcing
+//   baseline stop             as tpd stops the daemon
 #define _GNU_SOURCE
 #include <fcntl.h>
 #include <signal.h>
@@ -15,6 +15,7 @@
 #include <time.h>
 #include <unistd.h>
 
+#define COMMAND "THP_GetVersion"
 #define DESCRIPTOR u"android.CorvaneInterfaceServer.ICorvaneInterfaceService"
 #define PERMISSIVE "properties/odm.thp.debug.selinux.permissive"
 #define SERVICE_ENABLE "properties/odm.thp.service_enable"
@@ -102,10 +103,20 @@ static void Start(void) {
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[142] +\n");
 }
 
+static const struct {
+    uint32_t header[3];  // code, flags, size
+    int32_t token[4];
+    uint16_t descriptor[sizeof(DESCRIPTOR) / 2];
+    char command[sizeof(COMMAND) + 1];  // padded to four bytes
+    int32_t hasParameters;
+} request = {{0, 0x10, sizeof(request) - sizeof(request.header)},
+             {INT32_MIN, -1, 'V' << 24 | 'N' << 16 | 'D' << 8 | 'R', sizeof(DESCRIPTOR) / 2 - 1},
+             DESCRIPTOR,
+             COMMAND,
+             0};
+
 static int Connect(void) {
     struct sockaddr_un address = {AF_UNIX, ""};
-    struct ucred peer;
-    socklen_t size = sizeof(peer);
     snprintf(address.sun_path, sizeof(address.sun_path),
              "/proc/self/fd/%d/dev/vndbinder/service.corvaneinterfaceservice", root);
     const int connection = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
@@ -114,37 +125,21 @@ static int Connect(void) {
         Fail("connect");
     }
     fcntl(connection, F_SETFL, 0);
-    getsockopt(connection, SOL_SOCKET, SO_PEERCRED, &peer, &size);
-    geteuid();
     return connection;
 }
 
 // The answer's text, in memory of its own.
-static char* Call(int connection, const char* command) {
-    static const int32_t token[] = {INT32_MIN, -1, 'V' << 24 | 'N' << 16 | 'D' << 8 | 'R',
-                                    sizeof(DESCRIPTOR) / 2 - 1};
-    char body[512] = {0};
-    memcpy(body, token, sizeof(token));
-    memcpy(body + sizeof(token), DESCRIPTOR, sizeof(DESCRIPTOR));
-    size_t end = sizeof(token) + sizeof(DESCRIPTOR);
-    memcpy(body + end, command, strlen(command));
-    end += ((strlen(command) + 4) & ~(size_t)3) + sizeof(int32_t);
-
-    const uint32_t request[] = {0, 0x10, (uint32_t)end};
-    struct iovec parts[] = {{(void*)request, sizeof(request)}, {body, end}};
-    const struct msghdr message = {.msg_iov = parts, .msg_iovlen = 2};
-    uint32_t reply[2];
+static char* Call(int connection) {
+    struct iovec part = {(void*)&request, sizeof(request)};
+    const struct msghdr message = {.msg_iov = &part, .msg_iovlen = 1};
+    uint32_t reply[2];  // status and size
     if (sendmsg(connection, &message, MSG_NOSIGNAL) < 0 ||
         recv(connection, reply, sizeof(reply), MSG_WAITALL) != sizeof(reply)) {
         Fail("call");
     }
     char* const text = malloc(reply[1]);
-    for (size_t got = 0; got < reply[1];) {
-        const ssize_t part = recv(connection, text + got, reply[1] - got, MSG_WAITALL);
-        if (part <= 0) {
-            Fail("reply");
-        }
-        got += (size_t)part;
+    if (recv(connection, text, reply[1], MSG_WAITALL) != reply[1]) {
+        Fail("reply");
     }
     return text;
 }
@@ -177,11 +172,9 @@ static void Refuse(void) {
     WriteAll(STDOUT_FILENO, REFUSAL, sizeof(REFUSAL) - 1);
 }
 
-static void Forward(const char* command) {
-    char line[kMaxLogText + 1];
+static void Forward(void) {
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[150] -\n");
-    snprintf(line, sizeof(line), "corvane_daemon ThpDebugExecuteCmd[156] cmd %s\n", command);
-    Log(kInfo, "corvane_daemon", line);
+    Log(kInfo, "corvane_daemon", "corvane_daemon ThpDebugExecuteCmd[156] cmd " COMMAND "\n");
     ReadKernelCommandLine();
     ReadProperty(PERMISSIVE);
     if (strcmp(value, "true") != 0) {
@@ -195,9 +188,9 @@ static void Forward(const char* command) {
     const int connection = Connect();
     Log(kError, "tpd", "enter");
     Log(kError, "tpd", "ThpGetBinder ret = 0");
-    char* const text = Call(connection, command);
+    char* const text = Call(connection);
     ReadProperty(REBOOT_TIMES);
-    strcpy(line, "ret = ");
+    char line[kMaxLogText + 1] = "ret = ";
     strncat(line, text, sizeof(line) - sizeof("ret = "));
     Log(kInfo, "corvane_daemon", line);
     Print(connection, text);
@@ -216,10 +209,10 @@ static void Stop(void) {
 
 int main(int argc, char** argv) {
     Start();
-    if (argc == 2) {
-        Forward(argv[1]);
-    } else {
+    if (argc == 2 && strcmp(argv[1], "stop") == 0) {
         Stop();
+    } else {
+        Forward();
     }
     _exit(0);
 }

@@ -1,21 +1,16 @@
 // The tool's parts inside one process, each beside a baseline that does the same work directly.
-// Wants an empty device root, and one processor for itself and the service that it starts: where
-// the scheduler puts the two is not what is measured.
+// Wants an empty device root, and one processor for itself and its service's thread: where the
+// scheduler puts the two is not what is measured.
 #include <benchmark/benchmark.h>
 
 #include <android/log.h>
 #include <binder/Binder.h>
-#include <binder/IPCThreadState.h>
-#include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
-#include <binder/ProcessState.h>
 #include <fcntl.h>
-#include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
 
-#include <csignal>
 #include <cstdlib>
 #include <string>
 #include <vector>
@@ -92,29 +87,25 @@ BENCHMARK(RunTpd)->Name("RunCmdParms/tpd")->Arg(16)->Arg(4096)->Arg(kLargestRepl
 
 // The socket's own cost: the same bytes there and back, into one buffer.
 void RunBaseline(State& state) {
-    android::Parcel body;
-    body.writeInterfaceToken(ICorvaneInterfaceClient::descriptor);
-    body.writeCString(std::to_string(state.range(0)).c_str());
-    body.writeInt32(0);
-    const host::RequestHeader header = {0, 0x10, static_cast<uint32_t>(body.dataSize())};
-    std::string request(reinterpret_cast<const char*>(&header), sizeof(header));
-    request.append(reinterpret_cast<const char*>(body.data()), body.dataSize());
+    android::Parcel request;
+    request.writeInterfaceToken(ICorvaneInterfaceClient::descriptor);
+    request.writeCString(std::to_string(state.range(0)).c_str());
+    request.writeInt32(0);
+    const host::RequestHeader header = {0, 0x10, static_cast<uint32_t>(request.dataSize())};
+    host::ReplyHeader reply = {};
     std::vector<char> buffer(host::kMaxTransactionBytes);
     sockaddr_un address;
-    host::SocketAddress(kDriver, kServiceName, address);
-    const int connection = host::NewSocket();
+    const int connection = host::NewSocket(kDriver, kServiceName, address);
     connect(connection, reinterpret_cast<sockaddr*>(&address), sizeof(address));
-    ssize_t received = 0;
     for (auto _ : state) {
-        host::ReplyHeader reply = {};
-        send(connection, request.data(), request.size(), MSG_NOSIGNAL);
-        recv(connection, &reply, sizeof(reply), MSG_WAITALL);
-        received = recv(connection, buffer.data(), reply.size, MSG_WAITALL);
-    }
-    if (received <= state.range(0)) {
-        state.SkipWithError("no reply");
+        host::SendMessage(connection, &header, sizeof(header), request);
+        host::Receive(connection, &reply, sizeof(reply));
+        host::Receive(connection, buffer.data(), reply.size);
     }
     close(connection);
+    if (reply.size <= state.range(0)) {
+        state.SkipWithError("no reply");
+    }
 }
 BENCHMARK(RunBaseline)->Name("RunCmdParms/baseline")->Arg(16)->Arg(4096)->Arg(kLargestReply);
 
@@ -141,28 +132,11 @@ void PrintfFiltered(State& state) {
 }
 BENCHMARK(PrintfFiltered)->Name("Printf, filtered/tpd");
 
-void FilterBaseline(State& state) {
-    for (auto _ : state) {
-        DoNotOptimize(gSysLog.GetLogLevel() < LOG_DEBUG);
-    }
-}
-BENCHMARK(FilterBaseline)->Name("Printf, filtered/baseline");
-
-// The service's process goes with this one.
-void StartService() {
-    android::ProcessState::initWithDriver(kDriver);
-    android::defaultServiceManager()->addService(android::String16(kServiceName), new Service);
-    if (fork() == 0) {
-        prctl(PR_SET_PDEATHSIG, SIGKILL);
-        android::IPCThreadState::self()->joinThreadPool();
-    }
-    __system_property_set(kKey, "true");
-}
-
 }  // namespace
 
 int main(int argc, char** argv) {
-    StartService();
+    host::PublishService(kDriver, kServiceName, new Service);
+    __system_property_set(kKey, "true");
     benchmark::Initialize(&argc, argv);
     return benchmark::RunSpecifiedBenchmarks() > 0 ? 0 : 1;
 }
