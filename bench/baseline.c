@@ -17,7 +17,6 @@
 
 #define COMMAND "THP_GetVersion"
 #define DESCRIPTOR u"android.CorvaneInterfaceServer.ICorvaneInterfaceService"
-#define PERMISSIVE "properties/odm.thp.debug.selinux.permissive"
 #define SERVICE_ENABLE "properties/odm.thp.service_enable"
 #define REBOOT_TIMES "properties/odm.thp.dae_reboot_times"
 #define REFUSAL "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
@@ -128,7 +127,6 @@ static int Connect(void) {
     return connection;
 }
 
-// The answer's text, in memory of its own.
 static char* Call(int connection) {
     struct iovec part = {(void*)&request, sizeof(request)};
     const struct msghdr message = {.msg_iov = &part, .msg_iovlen = 1};
@@ -176,7 +174,7 @@ static void Forward(void) {
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[150] -\n");
     Log(kInfo, "corvane_daemon", "corvane_daemon ThpDebugExecuteCmd[156] cmd " COMMAND "\n");
     ReadKernelCommandLine();
-    ReadProperty(PERMISSIVE);
+    ReadProperty("properties/odm.thp.debug.selinux.permissive");
     if (strcmp(value, "true") != 0) {
         Refuse();
         return;

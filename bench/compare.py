@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Measures tpd beside its baseline, prints the tables of docs/performance.md, draws its picture.
+"""Measures tpd beside its baseline, prints the results as tables and draws them.
 
 compare.py BUILD PICTURE: on a device whose daemon runs without init, so that it outlives `stop`.
 Reads BUILD/parts.json, from bench/parts; writes BUILD/results.json: table, row, program, measure.
@@ -110,12 +110,12 @@ def parts():
     rows = {}
     for result in json.loads((BUILD / "parts.json").read_text())["benchmarks"]:
         if result["aggregate_name"] == "median":
-            part, program, *size = result["run_name"].split("/")
+            part, program, *size = result["run_name"].removesuffix("/process_time").split("/")
             row = rows.setdefault(" ".join([part, *size]), {"baseline": {}, "tpd": {}, "ratio": {}})
-            row[program]["ns"] = round(result["real_time"], 1)
+            row[program]["cpu_ns"] = round(result["cpu_time"], 1)
     for row in rows.values():
         if row["baseline"]:
-            row["ratio"]["ns"] = round(row["tpd"]["ns"] / row["baseline"]["ns"], 2)
+            row["ratio"]["cpu_ns"] = round(row["tpd"]["cpu_ns"] / row["baseline"]["cpu_ns"], 2)
     return dict(sorted(rows.items()))
 
 

@@ -6,7 +6,6 @@ set style fill solid
 set style data histograms
 set grid ytics
 set yrange [0:*]
-set key top left reverse Left
 set linetype 1 lc rgb "#b0b0b0"
 set linetype 2 lc rgb "#4878a8" pt 7
 set linetype 3 lc rgb "#e08030" pt 7
@@ -18,11 +17,11 @@ plot $commands using 3:xtic(1) lt 1 notitle, "" using 7 lt 2 notitle, "" using 9
 unset key
 set style data linespoints
 set logscale x
-set title "Elapsed µs, forwarded, by bytes of the reply"
-plot $reply_bytes using 1:2 lt 2, "" using 1:4 lt 3
+set title "Processor's µs, forwarded, by bytes of the reply"
+plot $reply_bytes using 1:3 lt 2, "" using 1:5 lt 3
 set title "Elapsed ms, 128 forwarded, by clients at once"
 plot $clients using 1:($2 / 1000) lt 2, "" using 1:($4 / 1000) lt 3
-set title "Elapsed µs, forwarded, by bytes in the log"
-plot $log_bytes using 1:2 lt 2, "" using 1:4 lt 3
-set title "Elapsed µs, forwarded, by number of properties"
-plot $properties using 1:2 lt 2, "" using 1:4 lt 3
+set title "Processor's µs, forwarded, by bytes in the log"
+plot $log_bytes using 1:3 lt 2, "" using 1:5 lt 3
+set title "Processor's µs, forwarded, by number of properties"
+plot $properties using 1:3 lt 2, "" using 1:5 lt 3
