@@ -1,136 +1,102 @@
 #include "answers.h"
 
-#include <sys/system_properties.h>
+#include <algorithm>
+#include <cstring>
+
+#include "common.h"
 
 namespace device {
 
 namespace {
 
-// The daemon's commands that act and have nothing to tell, with what each has done.
-struct Action {
-    const char* name;
-    const char* done;
-};
+// The daemon's commands that act and have nothing to tell, each between spaces.
+constexpr char kActions[] =
+        " THP_ASA_EnableFreqShift THP_ASA_ForceSetToNewFreq THP_ASA_SetTpPenMatchCode"
+        " THP_DisableBaselineUpdate THP_DisableFeature THP_DisableScenario"
+        " THP_EnableBaselineUpdate THP_EnableFeature THP_EnableScenario THP_InformTypingStatus"
+        " THP_InformUserAppCrash THP_Log_Commander THP_Log_GhostTouch THP_ResetBaseline"
+        " THP_Ring_AddSideGesture THP_Ring_EnterBetaTask THP_Ring_EnterSpecialBeta"
+        " THP_Ring_ExitBetaTask THP_Ring_ExitSpecialBeta THP_Ring_ExposeSideArea"
+        " THP_Ring_MapSideArea THP_Ring_MapSideGestureToKeyCode THP_Ring_MapSideGestureToTPEvent"
+        " THP_Ring_RemoveSideArea THP_Ring_ResetSideGesture THP_Ring_SetGestureTag"
+        " THP_Ring_SetVolumeGUIInfo THP_SetAccData THP_SetEnvironmentTemperature THP_SetFoldState"
+        " THP_SetPressureGesture THP_SetRunTimePrmt THP_SetSensorData THP_SetSensorGesture"
+        " THP_SetSensorGestureWithTimeStamp THP_SetSupportedSensorGesture THP_SetTuneTimePrmt"
+        " THP_SetVirtualKey THP_SetVolumeGUIInfo THP_SetXCoreArea THP_UpdateViewsLocation aftouch ";
 
-constexpr Action kActions[] = {
-        {"THP_ASA_EnableFreqShift", "frequency shift enabled"},
-        {"THP_ASA_ForceSetToNewFreq", "scan frequency changed"},
-        {"THP_ASA_SetTpPenMatchCode", "pen match code set"},
-        {"THP_DisableBaselineUpdate", "baseline update disabled"},
-        {"THP_DisableFeature", "feature disabled"},
-        {"THP_DisableScenario", "scenario disabled"},
-        {"THP_EnableBaselineUpdate", "baseline update enabled"},
-        {"THP_EnableFeature", "feature enabled"},
-        {"THP_EnableScenario", "scenario enabled"},
-        {"THP_InformTypingStatus", "typing status noted"},
-        {"THP_InformUserAppCrash", "application crash noted"},
-        {"THP_Log_Commander", "log command carried out"},
-        {"THP_Log_GhostTouch", "ghost touch logged"},
-        {"THP_ResetBaseline", "baseline reset"},
-        {"THP_Ring_AddSideGesture", "side gesture added"},
-        {"THP_Ring_EnterBetaTask", "beta task entered"},
-        {"THP_Ring_EnterSpecialBeta", "special beta entered"},
-        {"THP_Ring_ExitBetaTask", "beta task left"},
-        {"THP_Ring_ExitSpecialBeta", "special beta left"},
-        {"THP_Ring_ExposeSideArea", "side area exposed"},
-        {"THP_Ring_MapSideArea", "side area mapped"},
-        {"THP_Ring_MapSideGestureToKeyCode", "side gesture mapped to key code"},
-        {"THP_Ring_MapSideGestureToTPEvent", "side gesture mapped to touch event"},
-        {"THP_Ring_RemoveSideArea", "side area removed"},
-        {"THP_Ring_ResetSideGesture", "side gestures reset"},
-        {"THP_Ring_SetGestureTag", "gesture tag set"},
-        {"THP_Ring_SetVolumeGUIInfo", "side volume display noted"},
-        {"THP_SetAccData", "acceleration taken over"},
-        {"THP_SetEnvironmentTemperature", "temperature taken over"},
-        {"THP_SetFoldState", "fold state set"},
-        {"THP_SetPressureGesture", "pressure gesture set"},
-        {"THP_SetRunTimePrmt", "run-time parameter set"},
-        {"THP_SetSensorData", "sensor data taken over"},
-        {"THP_SetSensorGesture", "sensor gesture set"},
-        {"THP_SetSensorGestureWithTimeStamp", "timed sensor gesture set"},
-        {"THP_SetSupportedSensorGesture", "supported sensor gestures set"},
-        {"THP_SetTuneTimePrmt", "tuning parameter set"},
-        {"THP_SetVirtualKey", "virtual key set"},
-        {"THP_SetVolumeGUIInfo", "volume display noted"},
-        {"THP_SetXCoreArea", "core area set"},
-        {"THP_UpdateViewsLocation", "view locations updated"},
-        {"aftouch", "touch filter command taken over"},
-};
-
-std::string PropertyText(const char* key) {
-    char value[PROP_VALUE_MAX];
-    return __system_property_get(key, value) > 0 ? value : "unset";
+std::string GetOrUnset(const char* key) {
+    const std::string value = GetProperty(key);
+    return value.empty() ? "unset" : value;
 }
 
-std::string Help(const std::string& params);
-
 std::string Status(const std::string& /* params */) {
-    return "thplog: " + PropertyText("persist.odm.thp.thplog_enabled") +
-           "\nafelog: " + PropertyText("odm.thp.debug.afelog") +
-           "\nraw data: " + PropertyText("thp.debug.raw") +
-           "\nrestarts: " + PropertyText("odm.thp.dae_reboot_times");
+    return "thplog: " + GetOrUnset("persist.odm.thp.thplog_enabled") +
+           "\nafelog: " + GetOrUnset("odm.thp.debug.afelog") +
+           "\nraw data: " + GetOrUnset("thp.debug.raw") +
+           "\nrestarts: " + GetOrUnset("odm.thp.dae_reboot_times");
 }
 
 std::string ScreenState(const std::string& /* params */) {
-    return "screen state: " + PropertyText("odm.thp.screen_status");
+    return "screen state: " + GetOrUnset("odm.thp.screen_status");
 }
 
 std::string Version(const std::string& /* params */) {
-    return "corvane_daemon of " + PropertyText("ro.build.display.id") + ", firmware " +
-           PropertyText("odm.thp.ver_firmware");
+    return "corvane_daemon of " + GetOrUnset("ro.build.display.id") + ", firmware " +
+           GetOrUnset("odm.thp.ver_firmware");
 }
 
 std::string Captest(const std::string& params) {
     return "captest " + (params.empty() ? "idle_test" : params) + ": PASS";
 }
 
-// The parameter text is a command of its own: its name, then a blank and its parameters.
+// The parameters are a command of their own: its name, then a space and its parameters.
 std::string ExecuteSubCommand(const std::string& params) {
-    const size_t blank = params.find(' ');
-    const std::string name = params.substr(0, blank);
+    const size_t space = params.find(' ');
+    const std::string name = params.substr(0, space);
     if (name.empty() || name == "TSA_ExecuteCommand") {
         return "TSA_ExecuteCommand: which command?";
     }
-    return Answer(name, blank == std::string::npos ? "" : params.substr(blank + 1));
+    return Answer(name, space == std::string::npos ? "" : params.substr(space + 1));
 }
 
-struct Query {
-    const char* name;
-    std::string (*answer)(const std::string& params);
-};
+std::string Help(const std::string& params);
 
-constexpr Query kQueries[] = {
-        {"THP_GetScreenState", ScreenState},
-        {"THP_GetStatus", Status},
-        {"THP_GetVersion", Version},
-        {"TSA_ExecuteCommand", ExecuteSubCommand},
-        {"captest", Captest},
-        {"help", Help},
+constexpr struct {
+    const char* name;
+    bool isSimulated;  // unknown to a phone's daemon
+    std::string (*answer)(const std::string& params);
+} kQueries[] = {
+        {"THP_GetScreenState", true, ScreenState},
+        {"THP_GetStatus", true, Status},
+        {"THP_GetVersion", true, Version},
+        {"TSA_ExecuteCommand", false, ExecuteSubCommand},
+        {"captest", false, Captest},
+        {"help", false, Help},
 };
 
 std::string Help(const std::string& /* params */) {
     std::string text = "corvane_daemon commands:";
-    for (const Query& query : kQueries) {
-        text += std::string("\n") + query.name;
+    for (const auto& query : kQueries) {
+        text += std::string("\n") + query.name +
+                (query.isSimulated ? " (virtual device only)" : "");
     }
-    for (const Action& action : kActions) {
-        text += std::string("\n") + action.name;
-    }
+    std::string actions = kActions;
+    std::replace(actions.begin(), actions.end(), ' ', '\n');
+    text.append(actions, 0, actions.length() - 1);
     return text;
 }
 
 }  // namespace
 
 std::string Answer(const std::string& command, const std::string& params) {
-    for (const Query& query : kQueries) {
+    for (const auto& query : kQueries) {
         if (command == query.name) {
             return query.answer(params);
         }
     }
-    for (const Action& action : kActions) {
-        if (command == action.name) {
-            return command + ": " + action.done + (params.empty() ? "" : " (" + params + ")");
-        }
+    const bool isName = !command.empty() && command.find(' ') == std::string::npos;
+    if (isName && strstr(kActions, (" " + command + " ").c_str()) != nullptr) {
+        return command + ": done" + (params.empty() ? "" : " (" + params + ")");
     }
     return "unknown command: " + command;
 }

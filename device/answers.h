@@ -5,7 +5,7 @@
 
 namespace device {
 
-// The answer to one command with its parameter text; says so when it knows no such command.
+// The answer to one command with its parameters; says so when it knows no such command.
 std::string Answer(const std::string& command, const std::string& params);
 
 }  // namespace device

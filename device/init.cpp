@@ -1,185 +1,217 @@
 // The part of the device's init that boots it and minds the touch daemon: starts and stops it as
-// "odm.thp.service_enable" says, and starts it again, counting, when it dies on its own.
-#include <dirent.h>
+// "odm.thp.service_enable" says, and starts it again, counting, when it ends on its own.
+//
+// init [Permissive]: boots the device root, with SELinux Enforcing unless told otherwise. One byte
+// on standard output says that the device is booted; what fails before is said on standard error.
+// Ends on SIGTERM or SIGINT, or when the device root goes away.
+#include <android/log.h>
 #include <fcntl.h>
 #include <poll.h>
-#include <sys/file.h>
 #include <sys/inotify.h>
+#include <sys/prctl.h>
 #include <sys/signalfd.h>
 #include <sys/stat.h>
 #include <sys/system_properties.h>
+#include <sys/time.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
+#include <set>
 #include <string>
+#include <tuple>
 
+#include "common.h"
 #include "platform/device_root.h"
+#include "platform/files.h"
+#include "platform/log_entry.h"
+#include "platform/trace.h"
 
 namespace {
 
-constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 constexpr char kRestartsKey[] = "odm.thp.dae_reboot_times";
-// A daemon that cannot live is not started at a rate that would eat the machine.
-constexpr useconds_t kRestartPauseUs = 50000;
-constexpr int kLockTries = 20;
-constexpr useconds_t kLockPauseUs = 10000;
+// A daemon that was alive is back soon; the pause doubles for one that ends before it is.
+constexpr long kMinRestartPauseMs = 50;
+constexpr long kMaxRestartPauseMs = 5000;
 
-struct BootProperty {
+constexpr struct {
     const char* key;
     const char* value;
+} kBootProperties[] = {
+        {"ro.build.display.id", "VIRTUAL-11.0"}, {"ro.logsystem.usertype", "1"},
+        {"odm.thp.ver_firmware", "virtual-1"},   {device::kDaemonAliveKey, "false"},
+        {device::kDaemonBinderKey, "0"},         {kRestartsKey, "0"},
+        {"odm.thp.is_updating_fw", "false"},     {"odm.thp.dae_bootflag", "true"},
+        {device::kServiceEnableKey, "1"},
 };
-
-constexpr BootProperty kBootProperties[] = {
-        {"ro.build.display.id", "VIRTUAL-11.0"},
-        {"ro.logsystem.usertype", "1"},
-        {"odm.thp.ver_firmware", "virtual-1"},
-        {"odm.thp.dae_alive", "false"},
-        {"odm.thp.binder", "0"},
-        {"odm.thp.dae_reboot_times", "0"},
-        {"odm.thp.is_updating_fw", "false"},
-        {"odm.thp.dae_bootflag", "true"},
-        {"odm.thp.service_enable", "1"},
-};
-
-std::string PropertyText(const char* key) {
-    char value[PROP_VALUE_MAX];
-    __system_property_get(key, value);
-    return value;
-}
 
 // Empties a folder of the device root, but for the files whose names begin with `kept`.
-void ClearFolder(const char* folder, const char* kept) {
-    mkdirat(host::DeviceRoot(), folder, 0700);
-    const int descriptor =
-            openat(host::DeviceRoot(), folder, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
-    DIR* const files = descriptor >= 0 ? fdopendir(descriptor) : nullptr;
-    if (files == nullptr) {
-        return;
-    }
-    while (const dirent* const file = readdir(files)) {
-        if (file->d_name[0] != '.' &&
-            (kept == nullptr || strncmp(file->d_name, kept, strlen(kept)) != 0)) {
-            unlinkat(dirfd(files), file->d_name, 0);
+void ClearFolder(const std::string& folder, const char* kept = nullptr) {
+    host::MakeFolders(host::DeviceRoot(), folder);
+    for (const std::string& name : device::FilesIn(folder)) {
+        if (kept == nullptr || name.rfind(kept, 0) != 0) {
+            unlinkat(host::DeviceRoot(), std::string(folder).append("/").append(name).c_str(), 0);
         }
     }
-    closedir(files);
-}
-
-bool WriteFile(const char* name, const std::string& text) {
-    const int file = openat(host::DeviceRoot(), name,
-                            O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0600);
-    if (file < 0) {
-        return false;
-    }
-    const bool written = write(file, text.data(), text.size()) == static_cast<ssize_t>(text.size());
-    close(file);
-    return written;
 }
 
 void ClearLeftovers() {
-    ClearFolder("tmp", nullptr);
-    mkdirat(host::DeviceRoot(), "dev", 0700);
-    ClearFolder("dev/vndbinder", nullptr);
+    ClearFolder("tmp");
+    ClearFolder("dev/vndbinder");
+}
+
+// Whether a boot, which empties folders, destroys nothing of anybody else's: the folder was booted
+// before, is empty, or has only what earlier versions, the tool and the device's commands make in a
+// root. Some of these names say little: alone, they do not make a device.
+bool IsDeviceRoot() {
+    const std::set<std::string> files = device::FilesIn(".");
+    const std::set<std::string> common = {"dev", "log", "tmp"};
+    std::set<std::string> own = {"init.pid", "proc", "properties", "selinux", "settings", "trace"};
+    own.insert(common.begin(), common.end());
+    const auto areAmong = [&files](const std::set<std::string>& names) {
+        return std::includes(names.begin(), names.end(), files.begin(), files.end());
+    };
+    return files.empty() || files.count(device::kInitLock) > 0 ||
+           (areAmong(own) && !areAmong(common));
 }
 
 // The state of a device that has just been switched on: what persists, and the boot properties.
-bool Boot() {
+bool Boot(const std::string& selinuxMode) {
+    const host::TraceEvent event("boot");
     ClearLeftovers();
     ClearFolder("properties", "persist.");
-    for (const BootProperty& property : kBootProperties) {
+    for (const auto& property : kBootProperties) {
         if (__system_property_set(property.key, property.value) != 0) {
             return false;
         }
     }
-    return WriteFile("log", "") && WriteFile("selinux", "Enforcing\n");
+    return host::WriteFile(host::kLogFile, "") && host::ReplaceFile("selinux", selinuxMode + "\n");
 }
 
 class DaemonMinder {
   public:
-    explicit DaemonMinder(std::string program) : mProgram(std::move(program)) {}
-
     void Start() {
-        if (mDaemon > 0) {
+        if (mDaemon > 0 || !device::IsDaemonEnabled()) {
             return;
         }
+        const pid_t init = getpid();
         mDaemon = fork();
         if (mDaemon == 0) {
-            sigset_t none;
-            sigemptyset(&none);
-            sigprocmask(SIG_SETMASK, &none, nullptr);
-            execl(mProgram.c_str(), mProgram.c_str(), nullptr);
-            fprintf(stderr, "init: %s: %s\n", mProgram.c_str(), strerror(errno));
-            _exit(127);
+            RunDaemon(init);
+        } else if (mDaemon < 0) {
+            PlanStart();
+        } else {
+            host::TraceEvent("daemon_start").Add("daemon", mDaemon);
         }
     }
 
     void Stop() {
         if (mDaemon > 0) {
+            host::TraceEvent("daemon_stop").Add("daemon", mDaemon);
             kill(mDaemon, SIGKILL);
             waitpid(mDaemon, nullptr, 0);
-            Gone();
+            DaemonGone();
         }
     }
 
-    // After any change of the enabling property. Each change but the last may have been overtaken
-    // by the next before it was read: "1" for a running daemon means that a "0" was.
-    void FollowServiceEnable() {
-        struct stat status = {};
-        const std::string path = std::string("properties/") + kServiceEnableKey;
-        if (fstatat(host::DeviceRoot(), path.c_str(), &status, 0) != 0 ||
-            (status.st_ino == mSeenInode && status.st_ctim.tv_sec == mSeenTime.tv_sec &&
-             status.st_ctim.tv_nsec == mSeenTime.tv_nsec)) {
-            return;
-        }
-        mSeenInode = status.st_ino;
-        mSeenTime = status.st_ctim;
-        Restart();
-    }
-
+    // What changed until the daemon has ended is followed with this.
     void Restart() {
         Stop();
-        if (IsEnabled()) {
-            Start();
+        mPauseMs = kMinRestartPauseMs;
+        mFollowed = EnablingWrite();
+        Start();
+    }
+
+    // After each write of the enabling property that was not followed yet. Each but the last may
+    // have been overtaken by the next: "1" for a running daemon means that a "0" was.
+    void FollowServiceEnable() {
+        if (EnablingWrite() != mFollowed) {
+            Restart();
         }
     }
 
     void ReapDaemon() {
-        if (mDaemon > 0 && waitpid(mDaemon, nullptr, WNOHANG) == mDaemon) {
-            Gone();
-            const long restarts = strtol(PropertyText(kRestartsKey).c_str(), nullptr, 10);
-            __system_property_set(kRestartsKey, std::to_string(restarts + 1).c_str());
-            if (IsEnabled()) {
-                usleep(kRestartPauseUs);
-                Start();
-            }
+        int status = 0;
+        if (mDaemon <= 0 || waitpid(mDaemon, &status, WNOHANG) != mDaemon) {
+            return;
         }
+        host::TraceEvent("daemon_exit")
+                .Add("daemon", mDaemon)
+                .Add(WIFSIGNALED(status) ? "signal" : "status",
+                     WIFSIGNALED(status) ? WTERMSIG(status) : WEXITSTATUS(status));
+        if (device::IsDaemonAlive()) {
+            mPauseMs = kMinRestartPauseMs;
+        }
+        DaemonGone();
+        const int64_t restarts = device::GetPropertyNumber(kRestartsKey) + 1;
+        __system_property_set(kRestartsKey, std::to_string(restarts).c_str());
+        PlanStart();
     }
 
   private:
-    static bool IsEnabled() {
-        const std::string enable = PropertyText(kServiceEnableKey);
-        return enable == "1" || enable == "true";
+    // The file and its time: of no two writes the same.
+    using Write = std::tuple<ino_t, time_t, int64_t>;
+
+    static Write EnablingWrite() {
+        struct stat status = {};
+        const std::string path = std::string("properties/") + device::kServiceEnableKey;
+        fstatat(host::DeviceRoot(), path.c_str(), &status, AT_SYMLINK_NOFOLLOW);
+        return {status.st_ino, status.st_ctim.tv_sec, status.st_ctim.tv_nsec};
     }
 
-    void Gone() {
+    // Whatever becomes of init, its daemon goes with it: also when init is gone before this begins.
+    [[noreturn]] static void RunDaemon(pid_t init) {
+        prctl(PR_SET_PDEATHSIG, SIGKILL);
+        if (getppid() == init) {
+            sigset_t none;
+            sigemptyset(&none);
+            sigprocmask(SIG_SETMASK, &none, nullptr);
+            const std::string program = device::PathBesideProgram("corvane_daemon");
+            execl(program.c_str(), program.c_str(), nullptr);
+        }
+        _exit(127);
+    }
+
+    // SIGALRM comes after the pause.
+    void PlanStart() {
+        if (mPauseMs == kMinRestartPauseMs * 2) {
+            __android_log_print(ANDROID_LOG_ERROR, nullptr,
+                                "corvane_daemon does not come up; trying again at growing pauses");
+        }
+        host::TraceEvent("restart_pause").Add("ms", mPauseMs);
+        const itimerval pause = {{0, 0}, {mPauseMs / 1000, mPauseMs % 1000 * 1000}};
+        setitimer(ITIMER_REAL, &pause, nullptr);
+        mPauseMs = std::min(mPauseMs * 2, kMaxRestartPauseMs);
+    }
+
+    void DaemonGone() {
         mDaemon = -1;
-        ClearFolder("dev/vndbinder", nullptr);
-        __system_property_set("odm.thp.dae_alive", "false");
-        __system_property_set("odm.thp.binder", "0");
+        ClearFolder("dev/vndbinder");
+        __system_property_set(device::kDaemonAliveKey, "false");
+        __system_property_set(device::kDaemonBinderKey, "0");
         __system_property_set("odm.thp.is_updating_fw", "false");
     }
 
-    const std::string mProgram;
     pid_t mDaemon = -1;
-    ino_t mSeenInode = 0;
-    timespec mSeenTime = {};
+    long mPauseMs = kMinRestartPauseMs;  // before the next start
+    Write mFollowed;
 };
+
+// Whether init goes on.
+bool HandleSignal(int signals, DaemonMinder& minder) {
+    signalfd_siginfo signal = {};
+    const bool isRead = read(signals, &signal, sizeof(signal)) == sizeof(signal);
+    if (isRead && signal.ssi_signo == SIGALRM) {
+        minder.Start();
+    }
+    minder.ReapDaemon();
+    return isRead && (signal.ssi_signo == SIGALRM || signal.ssi_signo == SIGCHLD);
+}
 
 // Whether the folder of properties is still there after these events.
 bool HandlePropertyEvents(int watch, DaemonMinder& minder) {
@@ -192,85 +224,98 @@ bool HandlePropertyEvents(int watch, DaemonMinder& minder) {
             return false;
         }
         const bool overflow = (event->mask & IN_Q_OVERFLOW) != 0;
-        if (overflow || strcmp(event->name, kServiceEnableKey) == 0) {
+        if (overflow || strcmp(event->name, device::kServiceEnableKey) == 0) {
             minder.FollowServiceEnable();
         } else if (strcmp(event->name, kUpdatingFirmwareKey) == 0 &&
-                   PropertyText(kUpdatingFirmwareKey) == "true") {
+                   device::GetProperty(kUpdatingFirmwareKey) == "true") {
             minder.Restart();
         }
     }
     return true;
 }
 
-int Fail(const char* what) {
-    fprintf(stderr, "init: %s: %s\n", what, strerror(errno));
-    return 1;
-}
-
-// Whether this process is the device's one init; its number is then in the locked file. Somebody
-// who only asks whether the device runs holds the lock for a moment.
-bool LockDevice() {
-    const int file =
-            openat(host::DeviceRoot(), "init.pid", O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600);
-    for (int tries = 0; tries < kLockTries; ++tries) {
-        if (flock(file, LOCK_EX | LOCK_NB) == 0) {
-            return ftruncate(file, 0) == 0 && dprintf(file, "%d\n", getpid()) > 0;
-        }
-        usleep(kLockPauseUs);
+// Signal handling, descriptors, session and folder as they are for no caller in particular.
+bool LeaveCaller() {
+    for (int each = 1; each < NSIG; ++each) {
+        signal(each, SIG_DFL);
     }
-    return false;
+    close_range(STDERR_FILENO + 1, ~0U, 0);
+    setsid();
+    umask(077);
+    return chdir("/") == 0;
 }
 
-std::string ProgramBesideThisOne(const char* name) {
-    char path[4096];
-    const ssize_t length = readlink("/proc/self/exe", path, sizeof(path) - 1);
-    const std::string self(path, length > 0 ? static_cast<size_t>(length) : 0);
-    return self.substr(0, self.rfind('/') + 1) + name;
+// Makes this process the device's one init. The kernel ends a record lock when the process closes
+// any descriptor of the file: nothing else may open it here.
+bool LockDevice() {
+    const int file = openat(host::DeviceRoot(), device::kInitLock,
+                            O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0600);
+    struct flock whole = {};
+    whole.l_type = F_WRLCK;
+    return file >= 0 && fcntl(file, F_SETLK, &whole) == 0;
+}
+
+// Signals that end this process or tell of its daemon become readable.
+int OpenSignals() {
+    sigset_t signals;
+    sigemptyset(&signals);
+    for (const int each : {SIGALRM, SIGCHLD, SIGINT, SIGTERM}) {
+        sigaddset(&signals, each);
+    }
+    sigprocmask(SIG_SETMASK, &signals, nullptr);
+    return signalfd(-1, &signals, SFD_CLOEXEC);
+}
+
+int OpenPropertyWatch() {
+    const int watch = inotify_init1(IN_CLOEXEC);
+    const std::string folder = host::DeviceRootPath() + "/properties";
+    constexpr uint32_t kEvents = IN_MOVED_TO | IN_DELETE_SELF | IN_MOVE_SELF;
+    return inotify_add_watch(watch, folder.c_str(), kEvents) >= 0 ? watch : -1;
+}
+
+// Tells that the device is booted and lets go of whoever waits for that.
+void ReportBoot() {
+    [[maybe_unused]] const ssize_t written = write(STDOUT_FILENO, "\n", 1);
+    const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
+    for (const int descriptor : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
+        dup2(null, descriptor);
+    }
+}
+
+int Fail(const char* what, const char* why) {
+    fprintf(stderr, "init: %s: %s\n", what, why);
+    return 1;
 }
 
 }  // namespace
 
-// Runs until it is told to end (SIGTERM, SIGINT) or its device root goes away.
-int main() {
-    if (host::DeviceRoot() < 0) {
+int main(int argc, char** argv) {
+    if (!LeaveCaller() || host::DeviceRoot() < 0) {
         return 1;
     }
+    if (!IsDeviceRoot()) {
+        return Fail(host::DeviceRootPath().c_str(), "has files that are no device's; nothing done");
+    }
     if (!LockDevice()) {
-        return Fail("this device runs already");
+        return Fail("this device runs already", strerror(errno));
     }
-
-    sigset_t signals;
-    sigemptyset(&signals);
-    for (const int each : {SIGCHLD, SIGTERM, SIGINT}) {
-        sigaddset(&signals, each);
+    const int signals = OpenSignals();
+    if (!Boot(argc > 1 ? argv[1] : "Enforcing")) {
+        return Fail("cannot write to the device root", strerror(errno));
     }
-    sigprocmask(SIG_BLOCK, &signals, nullptr);
-    const int signalled = signalfd(-1, &signals, SFD_CLOEXEC);
-    if (!Boot()) {
-        return Fail("cannot write to the device root");
+    const int watch = OpenPropertyWatch();
+    if (signals < 0 || watch < 0) {
+        return Fail("cannot watch the properties", strerror(errno));
     }
-    const int watch = inotify_init1(IN_CLOEXEC);
-    const std::string folder = host::DeviceRootPath() + "/properties";
-    if (signalled < 0 || watch < 0 ||
-        inotify_add_watch(watch, folder.c_str(), IN_MOVED_TO | IN_DELETE_SELF | IN_MOVE_SELF) < 0) {
-        return Fail("cannot watch the properties");
-    }
-
-    DaemonMinder minder(ProgramBesideThisOne("corvane_daemon"));
-    minder.FollowServiceEnable();
-    pollfd waits[] = {{signalled, POLLIN, 0}, {watch, POLLIN, 0}};
+    ReportBoot();
+    DaemonMinder minder;
+    minder.Restart();
+    pollfd waits[] = {{signals, POLLIN, 0}, {watch, POLLIN, 0}};
     for (bool running = true; running;) {
-        if (poll(waits, 2, -1) < 0) {
-            continue;
-        }
-        if (waits[0].revents != 0) {
-            signalfd_siginfo signal = {};
-            running = read(signalled, &signal, sizeof(signal)) == sizeof(signal) &&
-                      signal.ssi_signo == SIGCHLD;
-            minder.ReapDaemon();
-        }
-        if (running && waits[1].revents != 0) {
-            running = HandlePropertyEvents(watch, minder);
+        if (poll(waits, std::size(waits), -1) > 0) {
+            host::LookForTrace();
+            running = (waits[0].revents == 0 || HandleSignal(signals, minder)) &&
+                      (waits[1].revents == 0 || HandlePropertyEvents(watch, minder));
         }
     }
     minder.Stop();

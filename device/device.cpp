@@ -1,0 +1,269 @@
+// The virtual device for people and scripts: its life, and the ways into it. The kernel says who
+// runs it: init holds a record lock, and asking for that lock's holder takes nothing.
+#include <fcntl.h>
+#include <limits.h>
+#include <poll.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <fstream>
+#include <functional>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "common.h"
+#include "faults.h"
+#include "platform/device_root.h"
+
+// The C library's header declares them without the C linkage that they have.
+extern "C" {
+#include <sys/pidfd.h>
+}
+
+namespace {
+
+constexpr int kStopped = 3;
+constexpr int kWrongUse = 2;
+constexpr int kStartLimitMs = 10000;
+constexpr int kStopLimitMs = 5000;
+constexpr std::chrono::milliseconds kPollPause(5);
+
+constexpr char kUsage[] =
+        "usage: device start [--permissive]  boots it, SELinux Enforcing unless told otherwise;\n"
+        "                                    status 0 once its daemon is alive\n"
+        "       device stop | status | root  status 3 when it is stopped\n"
+        "       device shell [COMMAND...]    as `adb shell`\n"
+        "       device run [ARGUMENT...]     runs the tool; starts a stopped device, Permissive\n"
+        "       device trace [--bytes] [--json | --mermaid] ARGUMENT...\n"
+        "                                    runs the tool and shows what everybody did\n"
+        "       device fault [NAME [ARGUMENT] [COUNT] | none]\n"
+        "                                    gives the daemon a fault; alone: lists them\n";
+
+int Usage() {
+    fputs(kUsage, stderr);
+    return kWrongUse;
+}
+
+int Fail(const std::string& why) {
+    fprintf(stderr, "device: %s\n", why.c_str());
+    return 1;
+}
+
+bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(limitMs);
+    while (!isDone()) {
+        if (std::chrono::steady_clock::now() >= deadline) {
+            return false;
+        }
+        std::this_thread::sleep_for(kPollPause);
+    }
+    return true;
+}
+
+// The process that runs the device, or 0.
+pid_t FindInit() {
+    const int file = openat(host::DeviceRoot(), device::kInitLock,
+                            O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+    struct flock holder = {};
+    holder.l_type = F_WRLCK;
+    const bool isHeld = file >= 0 && fcntl(file, F_GETLK, &holder) == 0 &&
+                        holder.l_type != F_UNLCK && holder.l_pid > 0;
+    close(file);
+    return isHeld ? holder.l_pid : 0;
+}
+
+// Whether the process runs another file than the one of that name beside this program. Not so for
+// a process that has just ended.
+bool RunsOtherFile(pid_t process, const char* name) {
+    struct stat running = {};
+    struct stat built = {};
+    return stat(("/proc/" + std::to_string(process) + "/exe").c_str(), &running) == 0 &&
+           stat(device::PathBesideProgram(name).c_str(), &built) == 0 &&
+           (running.st_dev != built.st_dev || running.st_ino != built.st_ino);
+}
+
+// Whether init and its daemon, which is init itself for a moment, run what was built last.
+bool IsCurrentBuild(pid_t init) {
+    const std::string number = std::to_string(init);
+    std::ifstream children("/proc/" + number + "/task/" + number + "/children");
+    pid_t daemon = init;
+    children >> daemon;
+    return !RunsOtherFile(init, "init") &&
+           (!RunsOtherFile(daemon, "corvane_daemon") || !RunsOtherFile(daemon, "init"));
+}
+
+// Asks init to end, and ends it when it does not. The descriptor stands for this one process even
+// when its number passes to another.
+int Stop(int, char**) {
+    const pid_t init = FindInit();
+    const int process = init != 0 ? pidfd_open(init, 0) : -1;
+    // Init may have ended before the descriptor was there, which is then somebody else's.
+    if (process < 0 || FindInit() != init) {
+        close(process);
+        return 0;
+    }
+    pollfd ended = {process, POLLIN, 0};
+    pidfd_send_signal(process, SIGTERM, nullptr, 0);
+    if (poll(&ended, 1, kStopLimitMs) == 0) {
+        pidfd_send_signal(process, SIGKILL, nullptr, 0);
+        poll(&ended, 1, kStopLimitMs);
+    }
+    close(process);
+    if (ended.revents == 0) {
+        return Fail("process " + std::to_string(init) + " does not end");
+    }
+    fputs("device: stopped\n", stderr);
+    return 0;
+}
+
+int AwaitDaemon() {
+    WaitUntil(kStartLimitMs, [] {
+        return device::IsDaemonAlive() || !device::IsDaemonEnabled() || FindInit() == 0;
+    });
+    if (FindInit() == 0) {
+        return Fail("init has ended");
+    }
+    if (!device::IsDaemonEnabled()) {
+        return Fail("the daemon is stopped; `device shell tpd start` starts it");
+    }
+    return device::IsDaemonAlive()
+                   ? 0
+                   : Fail("the daemon is not alive; `device shell logcat -d` may say why");
+}
+
+// Starts init and waits until it has booted the device. What fails there is said by init.
+int Boot(const char* selinuxMode) {
+    int report[2];
+    if (pipe2(report, O_CLOEXEC) != 0) {
+        return Fail(strerror(errno));
+    }
+    const std::string program = device::PathBesideProgram("init");
+    const pid_t init = fork();
+    if (init == 0) {
+        dup2(report[1], STDOUT_FILENO);
+        execl(program.c_str(), program.c_str(), selinuxMode, nullptr);
+        _exit(Fail(program + ": " + strerror(errno)));
+    }
+    close(report[1]);
+    pollfd booted = {report[0], POLLIN, 0};
+    char byte = 0;
+    const bool isBooted =
+            init > 0 && poll(&booted, 1, kStartLimitMs) > 0 && read(report[0], &byte, 1) == 1;
+    close(report[0]);
+    if (!isBooted) {
+        return Fail("did not start");
+    }
+    fprintf(stderr, "device: started in %s, SELinux is %s\n", host::DeviceRootPath().c_str(),
+            selinuxMode);
+    return AwaitDaemon();
+}
+
+// Boots the device unless it runs already, from this build: then it stays as it is. Waits for a
+// start in progress, which holds a lock on the root.
+int StartIfStopped(const char* selinuxMode) {
+    const int root = openat(host::DeviceRoot(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (!WaitUntil(2 * kStartLimitMs, [root] { return flock(root, LOCK_EX | LOCK_NB) == 0; })) {
+        return Fail("another start does not end");
+    }
+    const pid_t init = FindInit();
+    if (init != 0 && !IsCurrentBuild(init)) {
+        fputs("device: runs another build\n", stderr);
+        Stop(0, nullptr);
+    }
+    const int status = FindInit() != 0 ? 0 : Boot(selinuxMode);
+    close(root);
+    return status;
+}
+
+int Start(int argc, char** argv) {
+    if (argc > 1 || (argc == 1 && argv[0] != std::string("--permissive"))) {
+        return Usage();
+    }
+    const int status = StartIfStopped(argc == 1 ? "Permissive" : "Enforcing");
+    return status != 0 ? status : AwaitDaemon();
+}
+
+int Status(int, char**) {
+    const pid_t init = FindInit();
+    if (init == 0) {
+        puts("stopped");
+        return kStopped;
+    }
+    printf("running in %s, process %d%s\n", host::DeviceRootPath().c_str(), init,
+           IsCurrentBuild(init) ? "" : ", another build");
+    printf("daemon alive: %s, binder: %s, SELinux: %s\n",
+           device::GetProperty(device::kDaemonAliveKey).c_str(),
+           device::GetProperty(device::kDaemonBinderKey).c_str(), device::SelinuxMode().c_str());
+    return 0;
+}
+
+int Root(int, char**) {
+    puts(host::DeviceRootPath().c_str());
+    return 0;
+}
+
+// Becomes a program that finds the device's commands and the tool before those of the machine.
+int Become(const std::string& program, std::vector<const char*> arguments) {
+    const char* const path = getenv("PATH");
+    const std::string bin = device::PathBesideProgram("bin");
+    setenv("PATH", (bin + ":" + (path != nullptr ? path : "/usr/bin:/bin")).c_str(), 1);
+    setenv("TPD_DEVICE_ROOT", host::DeviceRootPath().c_str(), 1);
+    arguments.push_back(nullptr);
+    execv(program.c_str(), const_cast<char* const*>(arguments.data()));
+    return Fail(program + ": " + strerror(errno));
+}
+
+// The arguments, joined by spaces, are one shell command, as for `adb shell`.
+int Shell(int argc, char** argv) {
+    std::string command = argc > 0 ? argv[0] : "exec sh";
+    for (int i = 1; i < argc; ++i) {
+        command.append(" ").append(argv[i]);
+    }
+    return Become("/bin/sh", {"sh", "-c", command.c_str()});
+}
+
+int BecomeBeside(const char* name, int argc, char** argv) {
+    std::vector<const char*> arguments = {name};
+    arguments.insert(arguments.end(), argv, argv + argc);
+    return Become(device::PathBesideProgram(name), arguments);
+}
+
+int Run(int argc, char** argv) {
+    const int status = StartIfStopped("Permissive");
+    return status != 0 ? status : BecomeBeside("bin/tpd", argc, argv);
+}
+
+int Trace(int argc, char** argv) {
+    return FindInit() != 0 ? BecomeBeside("trace.py", argc, argv) : Fail("is stopped");
+}
+
+int Fault(int argc, char** argv) {
+    return argc == 0 || FindInit() != 0 ? device::FaultCommand(argc, argv) : Fail("is stopped");
+}
+
+constexpr struct {
+    const char* name;
+    int maxArguments;
+    int (*run)(int argc, char** argv);
+} kVerbs[] = {{"start", 1, Start},       {"stop", 0, Stop},         {"status", 0, Status},
+              {"root", 0, Root},         {"shell", INT_MAX, Shell}, {"run", INT_MAX, Run},
+              {"trace", INT_MAX, Trace}, {"fault", 3, Fault}};
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    for (const auto& verb : kVerbs) {
+        if (argc > 1 && argv[1] == std::string(verb.name) && argc - 2 <= verb.maxArguments) {
+            return host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
+        }
+    }
+    return Usage();
+}

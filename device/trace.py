@@ -1,0 +1,144 @@
+#!/usr/bin/env python3
+"""Runs the tool on the device and shows what it, the daemon and init did meanwhile."""
+import argparse
+import json
+import os
+import pathlib
+import signal
+import subprocess
+import sys
+import time
+
+TRACE = pathlib.Path(os.environ["TPD_DEVICE_ROOT"], "trace")
+QUIET_S = 0.15  # without an event: whatever the command set off has happened
+REST_LIMIT_S = 5
+NAMES = {"tpd": "tool", "corvane_daemon": "daemon"}
+
+
+def shown(text):
+    """The bytes, which the trace holds as one code point each, as readable text"""
+    text = text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace")
+    return "".join(c if c.isprintable() else repr(c)[1:-1] for c in text)
+
+
+# `way`, `size` and `end` are made from other fields.
+DESCRIPTIONS = {
+    "property_read": 'reads {name}: "{value}"',
+    "property_write": 'writes {name}: "{old}" -> "{new}", status {status}',
+    "log": "logs {priority} {tag}: {text}",
+    "pause": "pauses {us} us",
+    "shell": "runs {command}: {end}",
+    "lookup": "looks {service} up: found {found}, after {us} us",
+    "link_to_death": "links its death recipient: status {status}",
+    "unlink_to_death": "unlinks its death recipient: status {status}",
+    "binder_died": "learns that the binder died",
+    "call": "calls code {code}, {way}, flags {flags}, {size} bytes",
+    "reply": "has its reply: status {status}, {bytes} bytes, after {us} us",
+    "publish": "publishes {service}",
+    "command": 'receives {command}, parameters "{params}"',
+    "fault": "has the fault {name} {argument}",
+    "answer": "answers: status {status}, {bytes} bytes",
+    "daemon_start": "starts the daemon, process {daemon}",
+    "daemon_stop": "stops the daemon, process {daemon}",
+    "daemon_exit": "sees the daemon end, process {daemon}: {end}",
+    "restart_pause": "waits {ms} ms before it starts the daemon",
+}
+ARROWS = {"call": "tool->>daemon", "reply": "daemon-->>tool", "daemon_start": "init->>daemon",
+          "daemon_stop": "init-xdaemon", "daemon_exit": "daemon--xinit"}
+
+
+def describe(event):
+    fields = {name: shown(value) if isinstance(value, str) else value
+              for name, value in event.items()}
+    ended_by, status = event.get("signal"), event.get("status", 0)
+    if event["what"] == "shell":  # as wait() tells it
+        ended_by, status = status & 0x7F, status >> 8
+    fields["end"] = f"signal {ended_by}" if ended_by else f"status {status}"
+    fields["way"] = "one-way" if event.get("flags", 0) & 1 else "two-way"
+    fields["size"] = len(event.get("request", "")) // 2
+    return DESCRIPTIONS.get(event["what"], event["what"]).format_map(fields)
+
+
+def hexdump(request):
+    for at in range(0, len(request), 32):
+        line = request[at:at + 32]
+        text = "".join(chr(c) if 32 <= c < 127 else "." for c in bytes.fromhex(line))
+        groups = " ".join(line[i:i + 4] for i in range(0, len(line), 4))
+        print(f"{'':19}{at // 2:08x}: {groups:39}  {text}")
+
+
+def read_trace():
+    # The last line may still be on its way.
+    lines = TRACE.read_text("ascii").splitlines(keepends=True)
+    return sorted((json.loads(line) for line in lines if line.endswith("\n")),
+                  key=lambda event: event["time"])
+
+
+def is_at_rest(events):
+    """Whether nothing happens any more and no daemon is on its way up"""
+    life = [event["what"] for event in events
+            if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")]
+    return (not (life and life[-1] in ("restart_pause", "daemon_start"))
+            and time.monotonic() - max(event["time"] for event in events) > QUIET_S)
+
+
+def record(arguments):
+    """What happened while the tool ran and until the device is at rest, and the result text"""
+    try:
+        tool = subprocess.run(["tpd", *arguments], stdout=subprocess.PIPE, check=False)
+        result = tool.stdout.decode(errors="backslashreplace")
+    except KeyboardInterrupt:
+        result = "(interrupted)\n"
+    limit = time.monotonic() + REST_LIMIT_S
+    while not is_at_rest(events := read_trace()) and time.monotonic() < limit:
+        time.sleep(0.02)
+    return events, result
+
+
+def print_timeline(events, start, with_bytes):
+    for event in events:
+        who = NAMES.get(event["who"], event["who"])
+        print(f"{(event['time'] - start) * 1000:10.3f} {who:>7} {describe(event)}")
+        if with_bytes and event["what"] == "call":
+            hexdump(event["request"])
+
+
+def print_diagram(events):
+    print("sequenceDiagram\n    participant tool\n    participant daemon\n    participant init")
+    for event in events:
+        who = NAMES.get(event["who"], event["who"])
+        arrow = ARROWS.get(event["what"], f"Note over {who}")
+        print(f"    {arrow}: " + describe(event).replace("#", "#35;").replace(";", "#59;"))
+
+
+def main():
+    parser = argparse.ArgumentParser(prog="device trace", description=__doc__)
+    parser.add_argument("--bytes", action="store_true", help="show the bytes of each request")
+    form = parser.add_mutually_exclusive_group()
+    form.add_argument("--json", action="store_true", help="print the events as recorded")
+    form.add_argument("--mermaid", action="store_true", help="print a sequence diagram")
+    parser.add_argument("arguments", nargs=argparse.REMAINDER, metavar="ARGUMENT")
+    options = parser.parse_args()
+    try:
+        os.close(os.open(TRACE, os.O_CREAT | os.O_EXCL, 0o600))
+    except FileExistsError:
+        sys.exit(f"device: somebody traces this device; if nobody does, remove {TRACE}")
+    try:
+        start = time.monotonic()
+        events, result = record(options.arguments)
+    finally:
+        TRACE.unlink(missing_ok=True)
+    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
+    if options.json:
+        for event in events:
+            print(json.dumps(event))
+        return
+    if options.mermaid:
+        print_diagram(events)
+        return
+    print_timeline(events, start, options.bytes)
+    print("result:", result, end="")
+
+
+if __name__ == "__main__":
+    main()
