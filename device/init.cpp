@@ -36,8 +36,8 @@ namespace {
 constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 constexpr char kRestartsKey[] = "odm.thp.dae_reboot_times";
 // A daemon that was alive is back soon; the pause doubles for one that ends before it is.
-constexpr int kMinRestartPauseMs = 50;
-constexpr int kMaxRestartPauseMs = 5000;
+constexpr long kMinRestartPauseMs = 50;
+constexpr long kMaxRestartPauseMs = 5000;
 
 constexpr struct {
     const char* key;
@@ -55,7 +55,7 @@ void ClearFolder(const std::string& folder, const char* kept = nullptr) {
     host::MakeFolders(host::DeviceRoot(), folder);
     for (const std::string& name : device::FilesIn(folder)) {
         if (kept == nullptr || name.rfind(kept, 0) != 0) {
-            unlinkat(host::DeviceRoot(), (folder + "/" + name).c_str(), 0);
+            unlinkat(host::DeviceRoot(), std::string(folder).append("/").append(name).c_str(), 0);
         }
     }
 }
@@ -82,7 +82,7 @@ bool IsDeviceRoot() {
 
 // The state of a device that has just been switched on: what persists, and the boot properties.
 bool Boot(const std::string& selinuxMode) {
-    host::TraceEvent("boot");
+    const host::TraceEvent event("boot");
     ClearLeftovers();
     ClearFolder("properties", "persist.");
     for (const auto& property : kBootProperties) {
@@ -198,7 +198,7 @@ class DaemonMinder {
     }
 
     pid_t mDaemon = -1;
-    int mPauseMs = kMinRestartPauseMs;  // before the next start
+    long mPauseMs = kMinRestartPauseMs;  // before the next start
     Write mFollowed;
 };
 

@@ -2,12 +2,13 @@
 
 #include <fcntl.h>
 #include <getopt.h>
-#include <strings.h>
+#include <poll.h>
 #include <sys/stat.h>
 #include <time.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cctype>
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -25,20 +26,14 @@ namespace device {
 
 namespace {
 
-constexpr timespec kFollowPause = {0, 50'000'000};
+constexpr int kFollowPauseMs = 50;
 constexpr uint32_t kMaxEntryBytes = 1 << 20;  // what is longer is no entry
 constexpr size_t kTagWidth = 8;               // columns, as on a device
 constexpr char kOtherTags[] = "*";
 
 constexpr char kUsage[] =
-        "usage: logcat [-d] [-c] [-t COUNT] [-f FILE] [-s] [-v FORMAT] [TAG[:PRIORITY]...]\n"
-        "  -d  ends with the last entry instead of waiting for more\n"
-        "  -c  empties the log and ends\n"
-        "  -t  shows the last COUNT entries and ends\n"
-        "  -f  appends to FILE instead of standard output\n"
-        "  -s  shows only what a filter lets through\n"
-        "  -v  threadtime (the default), brief, epoch or raw\n"
-        "PRIORITY: the lowest to show, V D I W E F, or S for none. TAG *: all others.\n";
+        "usage: logcat [-d] [-c] [-t COUNT] [-f FILE] [-s] [-v threadtime|brief|epoch|raw]\n"
+        "              [TAG[:V|D|I|W|E|F|S]...]   tag * is for all others\n";
 
 struct Entry {
     host::LogEntryHeader header;
@@ -56,40 +51,48 @@ struct Options {
     std::map<std::string, int> filters = {{kOtherTags, ANDROID_LOG_VERBOSE}};  // lowest shown
 };
 
-bool AddFilter(const std::string& filter, Options& options) {
-    const size_t colon = std::min(filter.rfind(':'), filter.length());
-    const std::string letter = colon < filter.length() ? filter.substr(colon + 1) : "V";
-    int priority = ANDROID_LOG_VERBOSE;
-    while (priority <= ANDROID_LOG_SILENT &&
-           strcasecmp(letter.c_str(), std::string(1, host::LogPriorityLetter(priority)).c_str())) {
-        ++priority;
+// The priority that readers show as this letter; ANDROID_LOG_UNKNOWN when there is none.
+int PriorityOf(const std::string& letter) {
+    for (int priority = ANDROID_LOG_SILENT; priority >= ANDROID_LOG_VERBOSE; --priority) {
+        if (letter.length() == 1 && toupper(letter[0]) == host::LogPriorityLetter(priority)) {
+            return priority;
+        }
     }
+    return ANDROID_LOG_UNKNOWN;
+}
+
+bool AddFilter(const std::string& filter, Options& options) {
+    const size_t colon = filter.find_last_of(':');
+    const std::string letter = colon == std::string::npos ? "V" : filter.substr(colon + 1);
+    const int priority = PriorityOf(letter);
     options.filters[filter.substr(0, colon)] = priority;
-    return colon > 0 && priority <= ANDROID_LOG_SILENT;
+    return colon != 0 && priority != ANDROID_LOG_UNKNOWN;
 }
 
 // False for wrong use.
 bool ParseOptions(int argc, char** argv, Options& options) {
     const std::set<std::string> formats = {"threadtime", "brief", "epoch", "raw"};
-    char* end = argv[0] + strlen(argv[0]);
+    bool isRight = true;
     for (int option = 0; (option = getopt(argc, argv, "dct:f:sv:")) != -1;) {
+        isRight &= option != '?';
         options.clears |= option == 'c';
         options.follows &= option != 'd' && option != 't';
         if (option == 't') {
+            char* end = nullptr;
             options.last = strtoul(optarg, &end, 10);
+            isRight &= isdigit(*optarg) != 0 && *end == '\0';
         } else if (option == 'f') {
             options.file = optarg;
         } else if (option == 's') {
             options.filters[kOtherTags] = ANDROID_LOG_SILENT;
         } else if (option == 'v') {
             options.format = optarg;
-        }
-        if (option == '?' || *end != '\0' || end == optarg || formats.count(options.format) == 0) {
-            return false;
+            isRight &= formats.count(options.format) > 0;
         }
     }
-    return std::all_of(argv + optind, argv + argc,
-                       [&options](const char* filter) { return AddFilter(filter, options); });
+    return isRight && std::all_of(argv + optind, argv + argc, [&options](const char* filter) {
+               return AddFilter(filter, options);
+           });
 }
 
 bool IsShown(const Entry& entry, const Options& options) {
@@ -102,9 +105,8 @@ bool IsShown(const Entry& entry, const Options& options) {
 // What stands before each line of the entry.
 std::string LineHeader(const Entry& entry, const std::string& format) {
     const host::LogEntryHeader& header = entry.header;
-    const std::string tag =
-            entry.tag + std::string(kTagWidth - std::min(kTagWidth, entry.tag.length()), ' ');
     const char letter = host::LogPriorityLetter(entry.priority);
+    const std::string padding(kTagWidth - std::min(kTagWidth, entry.tag.length()), ' ');
     char fields[96] = "";
     char when[32] = "";
     if (format == "raw") {
@@ -112,7 +114,7 @@ std::string LineHeader(const Entry& entry, const std::string& format) {
     }
     if (format == "brief") {
         snprintf(fields, sizeof(fields), "(%5d): ", header.pid);
-        return std::string{letter, '/'} + tag + fields;
+        return std::string{letter, '/'} + entry.tag + padding + fields;
     }
     if (format == "epoch") {
         snprintf(when, sizeof(when), "%19u", header.seconds);
@@ -124,7 +126,7 @@ std::string LineHeader(const Entry& entry, const std::string& format) {
     }
     snprintf(fields, sizeof(fields), "%s.%03u %5d %5d %c ", when, header.nanoseconds / 1000000,
              header.pid, header.tid, letter);
-    return fields + tag + ": ";
+    return fields + entry.tag + padding + ": ";
 }
 
 // An entry of several lines is shown as several lines with the same header.
@@ -157,7 +159,7 @@ bool ReadEntry(int log, off_t& offset, Entry& entry) {
         return false;
     }
     offset += kHeaderBytes + size;
-    entry.priority = content[0];
+    entry.priority = static_cast<unsigned char>(content[0]);
     entry.tag = content.c_str() + 1;
     entry.text = content.c_str() + std::min(content.size() - 1, 2 + entry.tag.length());
     return true;
@@ -188,6 +190,7 @@ int Logcat(int argc, char** argv) {
         return Fail(options.file);
     }
     off_t offset = 0;
+    pollfd output = {STDOUT_FILENO, 0, 0};  // ready when its reader goes
     do {
         std::deque<Entry> entries;
         for (Entry entry = {}; ReadEntry(log, offset, entry);) {
@@ -201,7 +204,7 @@ int Logcat(int argc, char** argv) {
         for (const Entry& entry : entries) {
             Print(entry, options);
         }
-    } while (fflush(stdout) == 0 && options.follows && nanosleep(&kFollowPause, nullptr) == 0);
+    } while (fflush(stdout) == 0 && options.follows && poll(&output, 1, kFollowPauseMs) == 0);
     return 0;
 }
 

@@ -17,7 +17,8 @@
 
 namespace {
 
-constexpr size_t kMaxSettingBytes = 65536;
+// The longest argument that the kernel passes to a program.
+constexpr size_t kMaxSettingBytes = 131072;
 
 int Usage(const char* usage) {
     fprintf(stderr, "usage: %s\n", usage);
@@ -78,10 +79,6 @@ int Setenforce(int argc, char** argv) {
     return 0;
 }
 
-bool IsPlainName(const std::string& name) {
-    return !name.empty() && name.front() != '.' && name.find('/') == std::string::npos;
-}
-
 std::string GetSetting(const std::string& path) {
     std::string value(kMaxSettingBytes, '\0');
     const ssize_t length = host::ReadFile(path, value.data(), value.size());
@@ -89,22 +86,24 @@ std::string GetSetting(const std::string& path) {
 }
 
 int Settings(int argc, char** argv) {
+    constexpr char kUsage[] = "settings put|get|delete|list system|secure|global [KEY [VALUE]]";
     const std::string verb = argc > 1 ? argv[1] : "";
     const std::string space = argc > 2 ? argv[2] : "";
     const std::string key = argc > 3 ? argv[3] : "";
-    const std::string folder = "settings/" + space;
-    const std::string path = folder + "/" + key;
-    const bool isListed = verb == "list" && argc == 3;
-    if ((space != "system" && space != "secure" && space != "global") ||
-        (!isListed && !IsPlainName(key))) {
-        argc = 0;
+    const std::string folder = "settings/" + space + "/";
+    if (space != "system" && space != "secure" && space != "global") {
+        return Usage(kUsage);
     }
-    if (isListed && argc > 0) {
+    if (verb == "list" && argc == 3) {
         for (const std::string& name : device::FilesIn(folder)) {
-            printf("%s=%s\n", name.c_str(), GetSetting(folder + "/" + name).c_str());
+            printf("%s=%s\n", name.c_str(), GetSetting(std::string(folder).append(name)).c_str());
         }
         return 0;
     }
+    if (key.empty() || key.front() == '.' || key.find('/') != std::string::npos) {
+        return Usage(kUsage);
+    }
+    const std::string path = folder + key;
     if (verb == "get" && argc == 4) {
         puts(GetSetting(path).c_str());
         return 0;
@@ -113,10 +112,10 @@ int Settings(int argc, char** argv) {
         printf("Deleted %d rows\n", unlinkat(host::DeviceRoot(), path.c_str(), 0) == 0 ? 1 : 0);
         return 0;
     }
-    if (verb == "put" && argc == 5 && strlen(argv[4]) <= kMaxSettingBytes) {
+    if (verb == "put" && argc == 5) {
         return host::ReplaceFile(path, argv[4]) ? 0 : Fail("settings");
     }
-    return Usage("settings put|get|delete|list system|secure|global [KEY [VALUE]]");
+    return Usage(kUsage);
 }
 
 constexpr struct {

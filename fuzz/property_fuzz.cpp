@@ -1,25 +1,26 @@
-// The property store over hostile files: whatever a file holds reads as a text within the limits,
-// and whatever is accepted reads back.
+// The properties of a device root whose files hold any bytes, and writes of any name and value.
 #include <sys/system_properties.h>
-
-#include <cstring>
+#include <unistd.h>
 
 #include "fuzz.h"
+#include "platform/device_root.h"
+#include "platform/files.h"
 
 int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    const std::string bytes(reinterpret_cast<const char*>(data), size);
-    WriteFile(UseDeviceRoot() + "/properties/odm.thp.binder", bytes);
+    const std::string bytes = ToString(data, size);
+    Check(host::ReplaceFile("properties/odm.thp.binder", bytes));
     char value[PROP_VALUE_MAX];
-    const int length = __system_property_get("odm.thp.binder", value);
-    Check(std::string(value, static_cast<size_t>(length)) == bytes.substr(0, 91).c_str());
+    __system_property_get("odm.thp.binder", value);
+    Check(value == std::string(bytes.substr(0, 91).c_str()));
 
     const std::string text = bytes.c_str();
-    const bool set = __system_property_set("odm.thp.rotate", text.c_str()) == 0;
-    Check(set == (text.size() < PROP_VALUE_MAX));
-    Check(!set || (__system_property_get("odm.thp.rotate", value), text == value));
+    const bool accepted = __system_property_set("odm.thp.rotate", text.c_str()) == 0;
+    Check(accepted == (text.size() < PROP_VALUE_MAX));
+    __system_property_get("odm.thp.rotate", value);
+    Check(!accepted || text == value);
 
-    // The text as a name: nothing outside the store is ever written.
-    Check(__system_property_set(text.c_str(), "1") != 0 || text.find('/') == std::string::npos);
-    unlink((UseDeviceRoot() + "/properties/" + text).c_str());
+    const bool named = __system_property_set(text.c_str(), "1") == 0;
+    Check(!named || text.find('/') == std::string::npos);
+    unlinkat(host::DeviceRoot(), ("properties/" + text).c_str(), 0);
     return 0;
 }

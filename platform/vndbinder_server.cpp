@@ -110,13 +110,15 @@ status_t PublishService(const std::string& driver, const std::string& name,
         return android::BAD_VALUE;
     }
     sockaddr_un address;
-    const int socket = NewSocket(driver, name, address);
-    if (socket < 0) {
+    int listener = NewSocket(driver, name, address);
+    if (listener < 0) {
         return -errno;
     }
-    const int high = fcntl(socket, F_DUPFD_CLOEXEC, kListenerDescriptor);
-    const int listener = high >= 0 ? high : dup(socket);
-    close(socket);
+    const int high = fcntl(listener, F_DUPFD_CLOEXEC, kListenerDescriptor);
+    if (high >= 0) {
+        close(listener);
+        listener = high;
+    }
     MakeFolders(DeviceRoot(), driver.substr(1));
     if (!ListenAt(listener, address)) {
         const status_t status = -errno;

@@ -55,17 +55,17 @@ bool Receive(int connection, void* buffer, size_t size) {
 }
 
 int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address) {
-    constexpr size_t kMaxNameBytes = 80;
-    if (DeviceRoot() < 0 || name.empty() || name.front() == '.' ||
-        name.find('/') != std::string::npos || name.length() > kMaxNameBytes) {
-        errno = EINVAL;
-        return -1;
-    }
     address = {};
     address.sun_family = AF_UNIX;
     // Through the root's descriptor, so that no length of the root's path matters.
-    snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d%s/%s", DeviceRoot(),
-             driver.c_str(), name.c_str());
+    const int length = snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d%s/%s",
+                                DeviceRoot(), driver.c_str(), name.c_str());
+    if (DeviceRoot() < 0 || name.empty() || name.front() == '.' ||
+        name.find('/') != std::string::npos ||
+        static_cast<size_t>(length) >= sizeof(address.sun_path)) {
+        errno = EINVAL;
+        return -1;
+    }
     return socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
 }
 

@@ -32,8 +32,8 @@ bool SendMessage(int connection, const void* header, size_t headerSize,
 bool Receive(int connection, void* buffer, size_t size);
 
 // A new socket, which the caller closes, and the address of the service's socket below the driver's
-// folder. -1 when there is no root, the name is no file name or there is no socket; the reason is
-// in errno.
+// folder. -1 when there is no root, the name is no file name or too long, or there is no socket;
+// the reason is in errno.
 int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address);
 
 }  // namespace host

@@ -1,48 +1,98 @@
-// The boot command line: splitting, key/value pairs, and how the device was booted.
 #include "cmdline/CmdLine.h"
 
-#include "tests/fake_device.h"
+#include <climits>
+
+#include "tests/unit_test.h"
 
 namespace test {
 
-using BootLine = Device;
+TEST(SplitTest, KeepsWhatIsBetweenWholeDelimiters) {
+    EXPECT_THAT(Split("  a b  c ", " "), ElementsAre("a", "b", "c"));
+    EXPECT_THAT(Split("", " "), IsEmpty());
+    EXPECT_THAT(Split("a<>b<c>d", "<>"), ElementsAre("a", "b<c>d"));
+    EXPECT_THAT(Split("aaa", "aa"), ElementsAre("a"));
+    EXPECT_THAT(Split("", ""), ElementsAre(""));
+}
 
-TEST_F(BootLine, HoldsPairs) {
+TEST(StringPairParserTest, KeepsTheFirstValueOfAKey) {
     StringPairParser pairs;
-    pairs.Init("a=1  b==-2x a=3 flag quiet= =z x=y=w o=2147483648 t=true A=0x10 ", " ", "=");
-    pairs.Init("b: 7;l: -7;u:-2147483648;f:-2147483649;n:2147483647;z:00", ";", ":");
-    const auto kCases = Table<3>(
-            "a|1|1|b|-2x|-2|flag|-|99|quiet|-|99||-|99|x|-|99|o|2147483648|99|t|true|99|A|0x10|0|"
-            "l| -7|-7|u|-2147483648|-2147483648|f|-2147483649|99|n|2147483647|2147483647|z|00|0");
-    for (const auto& [key, value, parsed] : kCases) {
-        std::string text = "-";
-        EXPECT_EQ(pairs.GetValue(key, text), value != "-") << key;
-        EXPECT_EQ(text, value);
-        int number = 99;
-        EXPECT_EQ(pairs.GetIntValue(key, number), parsed != "99") << key;
-        EXPECT_EQ(std::to_string(number), parsed);
-        bool flag = false;
-        EXPECT_EQ(pairs.GetBoolValue(key, flag), parsed != "99") << key;
-        EXPECT_EQ(flag, parsed != "99" && parsed != "0");
+    pairs.Init("a=1 a=2  b==3 ", " ", "=");
+    pairs.Init("a:4;c: 5", ";", ":");
+    std::string a, b, c;
+    EXPECT_TRUE(pairs.GetValue("a", a) && pairs.GetValue("b", b) && pairs.GetValue("c", c));
+    EXPECT_THAT(std::vector({a, b, c}), ElementsAre("1", "3", " 5"));
+}
+
+TEST(StringPairParserTest, IgnoresWhatIsNoPair) {
+    StringPairParser pairs;
+    pairs.Init("flag quiet= =value x=y=z", " ", "=");
+    std::string value = "before";
+    for (const char* key : {"flag", "quiet", "value", "x", "y", ""}) {
+        EXPECT_FALSE(pairs.GetValue(key, value)) << key;
+    }
+    EXPECT_EQ(value, "before");
+    int number = 0;
+    EXPECT_FALSE(pairs.GetIntValue("x", number));
+}
+
+TEST(StringPairParserTest, ReadsNumbersWithinTheRangeOfInt) {
+    constexpr int kBefore = 99;
+    const struct {
+        const char* text;
+        bool found;
+        int number;
+    } kRows[] = {{"12abc", true, 12},
+                 {"\t-7", true, -7},
+                 {"010", true, 10},
+                 {"0x10", true, 0},
+                 {"true", false, kBefore},
+                 {"2147483647", true, INT_MAX},
+                 {"2147483648", false, kBefore},
+                 {"-2147483648", true, INT_MIN},
+                 {"-2147483649", false, kBefore}};
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(row.text);
+        StringPairParser pairs;
+        pairs.Init(std::string("key=") + row.text, " ", "=");
+        int number = kBefore;
+        EXPECT_EQ(pairs.GetIntValue("key", number), row.found);
+        EXPECT_EQ(number, row.number);
+        bool flag = true;
+        EXPECT_EQ(pairs.GetBoolValue("key", flag), row.found);
+        EXPECT_EQ(flag, row.number != 0);
     }
 }
 
-TEST_F(BootLine, TellsUpgradeModeAndFactoryBuild) {
-    const auto kCases = Table<2>(  // u: upgrade mode, f: factory build
-            "quiet enter_recovery=1 ro\n|u|enter_recovery=0 enter_erecovery=1|u|"
-            "enter_recovery=0 enter_recovery=1||enter_recovery=1 enter_erecovery=0|u|"
-            "enter_recovery=yes enter_erecovery=-1|u|Enter_recovery=1 enter_recovery||"
-            "androidboot.swtype=a-factory_test enter_recovery=2|uf|androidboot.swtype=Factory||"
-            "androidboot.swtype=x=factory a=1\tenter_recovery=1||"
-            "androidboot.swtype=factory\nenter_recovery=1|f");
-    for (const auto& [line, told] : kCases) {
-        bootLine = line;
-        const CmdLine device;
-        EXPECT_EQ(std::string(device.IsUpgradeMode() ? "u" : "") +
-                          (device.IsFactoryVersion() ? "f" : ""),
-                  told)
-                << line;
+using CmdLineTest = DeviceTest;
+
+TEST_F(CmdLineTest, TellsHowTheDeviceWasBooted) {
+    const struct {
+        const char* line;
+        bool upgradeMode;
+        bool factoryVersion;
+    } kRows[] = {{"", false, false},
+                 {"quiet enter_recovery=-1 ro", true, false},
+                 {"enter_recovery=0 enter_erecovery=1", true, false},
+                 {"enter_recovery=1 enter_erecovery=0", true, false},
+                 {"enter_recovery=0 enter_recovery=1", false, false},
+                 {"enter_recovery=yes enter_erecovery", false, false},
+                 {"androidboot.swtype=a-factory_test enter_recovery=1", true, true},
+                 {"androidboot.swtype=Factory", false, false}};
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(row.line);
+        device.kernelCommandLine = row.line;
+        EXPECT_EQ(CmdLine().IsUpgradeMode(), row.upgradeMode);
+        EXPECT_EQ(CmdLine().IsFactoryVersion(), row.factoryVersion);
     }
+}
+
+TEST_F(CmdLineTest, ReadsTheFirstLineUpToItsLimit) {
+    device.kernelCommandLine = "first\nsecond";
+    EXPECT_EQ(CmdLine::GetCmdLine(), "first");
+    device.kernelCommandLine = std::string(9000, 'x');
+    EXPECT_EQ(CmdLine::GetCmdLine(), std::string(8191, 'x'));
+    device.kernelCommandLine = std::nullopt;
+    EXPECT_EQ(CmdLine::GetCmdLine(), "");
 }
 
 }  // namespace test

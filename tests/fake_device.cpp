@@ -1,14 +1,17 @@
 #include "tests/fake_device.h"
 
-#include <android/log.h>
 #include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdarg>
+#include <cstdio>
 #include <cstring>
+#include <new>
 
+#include "binder/ICorvaneInterfaceClient.h"
 #include "daemon/TpdCmd.h"
 #include "main/TpdMain.h"
 #include "platform/device_root.h"
@@ -17,76 +20,85 @@ using namespace android;
 
 namespace test {
 
-static Device* gDevice;
+namespace {
+
+FakeDevice* gDevice;
 
 template <typename T>
-static T Next(std::deque<T>& queue, T standard) {
-    if (!queue.empty()) {
-        standard = queue.front();
-        queue.pop_front();
+T TakeFirst(std::deque<T>& queue, T whenEmpty) {
+    if (queue.empty()) {
+        return whenEmpty;
     }
-    return standard;
+    T first = std::move(queue.front());
+    queue.pop_front();
+    return first;
 }
 
-// The daemon's service, named by the number of the lookup that found it.
-class Service : public IBinder {
+class FakeService : public IBinder {
   public:
-    explicit Service(int number) : mName(std::to_string(number)) {}
+    explicit FakeService(int number) : mNumber(number) {}
+
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
         gDevice->request.assign(reinterpret_cast<const char*>(data.data()), data.dataSize());
-        data.setDataPosition(0);
-        const bool known = data.enforceInterface(ICorvaneInterfaceClient::descriptor) && code == 0;
-        std::string text = known ? mName : "of another's";
-        text += flags == 0 ? " two-way" : flags == FLAG_ONEWAY ? " one-way" : " odd";
-        text += std::string(" [") + data.readCString() + "]";
-        if (data.readInt32() == 1) {
-            text += std::string(" [") + data.readCString() + "]";
-        }
-        gDevice->Note("call", text + (data.dataPosition() == data.dataSize() ? "" : " and more"));
-        const Answer answer = Next(gDevice->answers, {});
-        if (answer.meanwhile) {
-            answer.meanwhile();
+        gDevice->Record(ReadRequest(code, data, flags));
+        const Answer answer = TakeFirst(gDevice->answers, {});
+        if (answer.duringCall) {
+            answer.duringCall();
         }
         reply->writeCString(answer.text);
         reply->setDataPosition(0);
         return answer.status;
     }
+
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
                          uint32_t flags) override {
-        gDevice->Note("tie", mName + (cookie == nullptr && flags == 0 ? "" : " oddly"));
-        return gDevice->tied.push_back(recipient), -38;
+        const bool expected = recipient == g_deathRecipient && cookie == nullptr && flags == 0;
+        gDevice->Record(LinkToDeath(expected ? mNumber : -1));
+        return gDevice->linkStatus;
     }
+
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie, uint32_t flags,
                            wp<DeathRecipient>* out) override {
-        const bool plain = cookie == nullptr && flags + (out != nullptr) == 0;
-        gDevice->Note("untie", mName + (plain && gDevice->tied[0] == recipient ? "" : " oddly"));
+        const bool expected =
+                recipient == wp<DeathRecipient>(g_deathRecipient) && cookie == nullptr;
+        gDevice->Record(UnlinkToDeath(expected && flags == 0 && out == nullptr ? mNumber : -1));
         return OK;
     }
 
   private:
-    const std::string mName;
+    Call ReadRequest(uint32_t code, const Parcel& data, uint32_t flags) {
+        data.setDataPosition(0);
+        if (!data.enforceInterface(ICorvaneInterfaceClient::descriptor) || code != 0) {
+            return {kTransact, "not of this interface"};
+        }
+        const std::string command = data.readCString();
+        const char* const way = flags == IBinder::FLAG_ONEWAY ? kOneWay : kTwoWay;
+        if (data.readInt32() == 0) {
+            return Transact(mNumber, way, command);
+        }
+        return Transact(mNumber, way, command, data.readCString());
+    }
+
+    const int mNumber;
 };
 
-class ServiceManager : public IServiceManager {
+class FakeServiceManager : public IServiceManager {
     sp<IBinder> getService(const String16& name) const override {
-        gDevice->Note("find", std::string(name.string(), name.string() + name.size()));
-        return Next(gDevice->lookups, true) ? new Service(++gDevice->found) : nullptr;
+        gDevice->Record({kGetService, std::string(name.string(), name.string() + name.size())});
+        const bool found = TakeFirst(gDevice->lookups, true);
+        return found ? new FakeService(++gDevice->servicesFound) : nullptr;
     }
-    sp<IBinder> checkService(const String16& /* name */) const override { return nullptr; }
-    status_t addService(const String16&, const sp<IBinder>&, bool, int) override { return -1; }
+    sp<IBinder> checkService(const String16&) const override { return nullptr; }
+    status_t addService(const String16&, const sp<IBinder>&, bool, int) override {
+        return INVALID_OPERATION;
+    }
     IBinder* onAsBinder() override { return nullptr; }
 };
 
-Device::Device() {
-    gDevice = this;
-    StartsAfresh();
-    setDefaultServiceManager(new ServiceManager);
-}
-
-void Device::StartsAfresh() {
-    mSteps.clear();
+// Sets the tool's process-wide variables to what they are before main.
+void ForgetToolState() {
     aliveConfirmed = false;
-    failedWaitCount = found = 0;
+    failedWaitCount = 0;
     g_thpBinder = nullptr;
     g_deathRecipient = nullptr;
     delete g_tpdCmd;
@@ -94,94 +106,122 @@ void Device::StartsAfresh() {
     gTpdCmds.clear();
 }
 
-void Device::DaemonIs(const std::string& alive, const std::string& binder,
-                      const std::string& updating, const std::string& reboots) {
-    holds[kAlive] = alive;
-    holds["odm.thp.binder"] = binder;
-    holds["odm.thp.is_updating_fw"] = updating;
-    holds["odm.thp.dae_reboot_times"] = reboots;
+}  // namespace
+
+Call LogWithTag(const char* tag, int priority, const std::string& text) {
+    constexpr const char* kNames[] = {"?", "?", "VERBOSE", "DEBUG", "INFO", "WARN", "ERROR"};
+    return {kLog,
+            std::string(kNames[priority]) + ", " + (tag != nullptr ? tag : "no tag") + ", " + text};
 }
 
-std::string Device::Trail(const std::string& kinds) const {
-    std::string trail;
-    for (const auto& [kind, text] : mSteps) {
-        if ((" " + kinds + " ").find(" " + kind + " ") != std::string::npos) {
-            trail += (trail.empty() ? "" : "; ") + (kind == kinds ? text : kind + " " + text);
-        }
-    }
-    return trail;
+Call Transact(int service, const char* way, const std::string& command,
+              const std::optional<std::string>& parameters) {
+    const std::string end = parameters ? ", " + *parameters : "";
+    return {kTransact, std::to_string(service) + ", " + way + ", " + command + end};
 }
 
-std::string Device::Shape(const std::string& kinds) const {
-    std::string shape;
-    for (const auto& step : mSteps) {
-        shape.append(step.first, 0, (" " + kinds).find(" " + step.first) != std::string::npos);
-    }
-    return shape;
+FakeDevice::FakeDevice() {
+    gDevice = this;
+    ForgetToolState();
+    setDefaultServiceManager(new FakeServiceManager);
+}
+
+FakeDevice::~FakeDevice() {
+    ForgetToolState();
+    gDevice = nullptr;
+}
+
+std::vector<Call> FakeDevice::calls(const std::set<std::string>& functions) const {
+    std::vector<Call> selected;
+    std::copy_if(mCalls.begin(), mCalls.end(), std::back_inserter(selected), [&](const Call& call) {
+        return functions.empty() || functions.count(call.function) != 0;
+    });
+    return selected;
 }
 
 }  // namespace test
 
 using test::gDevice;
 
-int host::DeviceRoot() { return -1; }  // no test reaches a device on disk
+// No test reaches a device on disk.
+int host::DeviceRoot() { return -1; }
 
 int __system_property_get(const char* name, char* value) {
-    gDevice->Note("read", name);
-    const auto soon = gDevice->appears.find(name);
-    if (soon != gDevice->appears.end() && --soon->second.first == 0) {
-        gDevice->holds[name] = soon->second.second;
+    gDevice->Record(test::Read(name));
+    const auto delayed = gDevice->delayedValues.find(name);
+    if (delayed != gDevice->delayedValues.end() && --delayed->second.read == 0) {
+        gDevice->properties[name] = delayed->second.value;
     }
-    return snprintf(value, PROP_VALUE_MAX, "%s", gDevice->holds[name].c_str());
+    return snprintf(value, PROP_VALUE_MAX, "%s", gDevice->properties[name].c_str());
 }
 
 int __system_property_set(const char* name, const char* value) {
-    gDevice->Note("write", std::string(name) + "=" + value);
-    const bool taken = gDevice->refuses.count(name) == 0 && strlen(value) < PROP_VALUE_MAX;
-    gDevice->holds[name] = taken ? value : gDevice->holds[name];
-    return taken ? 0 : -1;
+    gDevice->Record(test::Write(name, value));
+    if (gDevice->readOnly.count(name) != 0 || strlen(value) >= PROP_VALUE_MAX) {
+        return -1;
+    }
+    gDevice->properties[name] = value;
+    return 0;
 }
 
 int __android_log_print(int priority, const char* tag, const char* format, ...) {
-    char text[4096];
+    char* text = nullptr;
     va_list args;
     va_start(args, format);
-    vsnprintf(text, sizeof(text), format, args);
+    const int length = vasprintf(&text, format, args);
     va_end(args);
-    const std::string letter(1, "??VDIWEFS"[priority]);
-    gDevice->Note("log", letter + " " + (tag != nullptr ? tag : "(null)") + ": " + text);
-    return 1;
+    gDevice->Record(test::LogWithTag(tag, priority, text));
+    free(text);
+    return length;
 }
 
 void* operator new(size_t size, const std::nothrow_t& /* tag */) noexcept {
-    int none = 0;
-    int& left = gDevice != nullptr ? gDevice->failingAllocation : none;
-    return left > 0 && --left == 0 ? nullptr : operator new(size);
+    const bool fails = gDevice != nullptr && gDevice->failingAllocation > 0 &&
+                       --gDevice->failingAllocation == 0;
+    return fails ? nullptr : operator new(size);
 }
 
+// The linker leads the C library's calls here.
 extern "C" {
 
 FILE* __real_fopen(const char* path, const char* mode);
+int __real_clock_gettime(clockid_t clock, timespec* time);
 
 static FILE* OpenText(std::optional<std::string>& text) {
     return text ? fmemopen(text->data(), text->size(), "r") : nullptr;
 }
 
 FILE* __wrap_fopen(const char* path, const char* mode) {
-    return strcmp(path, "/proc/cmdline") == 0 ? OpenText(gDevice->bootLine)
-                                              : __real_fopen(path, mode);
+    const bool ofDevice = strcmp(path, "/proc/cmdline") == 0;
+    return ofDevice ? OpenText(gDevice->kernelCommandLine) : __real_fopen(path, mode);
 }
 
 FILE* __wrap_popen(const char* command, const char* mode) {
-    gDevice->Note("shell", std::string(command) + " >" + mode);
-    return OpenText(gDevice->getenforce);
+    gDevice->Record(test::Shell(command));
+    return strcmp(mode, "r") == 0 ? OpenText(gDevice->getenforce) : nullptr;
 }
 
 int __wrap_pclose(FILE* stream) {
-    return gDevice->Note("end", ""), fclose(stream) + gDevice->closeStatus;
+    gDevice->Record(test::CloseShell());
+    fclose(stream);
+    return gDevice->getenforceStatus;
 }
 
-int __wrap_system(const char* command) { return gDevice->Note("shell", command), 1; }
+int __wrap_system(const char* command) {
+    gDevice->Record(test::Shell(command));
+    return 0;
+}
 
-int __wrap_usleep(useconds_t pause) { return gDevice->Note("pause", std::to_string(pause)), 0; }
+int __wrap_usleep(useconds_t time) {
+    gDevice->Record(test::Pause(std::chrono::microseconds(time)));
+    return 0;
+}
+
+int __wrap_clock_gettime(clockid_t clock, timespec* time) {
+    if (gDevice == nullptr || clock != CLOCK_MONOTONIC) {
+        return __real_clock_gettime(clock, time);
+    }
+    *time = gDevice->monotonicClock.value_or(timespec{1, 0});
+    return gDevice->monotonicClock ? 0 : -1;
+}
 }

@@ -1,80 +1,115 @@
-// A device in memory: it stands behind the platform's and the C library's calls that the tool
-// makes, and keeps one trail of everything done to it, in order.
+// A device in memory. It implements the calls that the tool makes to the platform and to the C
+// library, and records each of them.
 #pragma once
 
-#include <gtest/gtest.h>
-#include <array>
+#include <android/log.h>
+#include <time.h>
+#include <utils/Errors.h>
+
+#include <chrono>
 #include <deque>
 #include <functional>
 #include <map>
 #include <optional>
+#include <ostream>
 #include <set>
 #include <string>
 #include <vector>
 
-#include "binder/ICorvaneInterfaceClient.h"
-
 namespace test {
 
-// Rows of N cells out of a text that has "|" between all cells.
-template <size_t N>
-std::vector<std::array<std::string, N>> Table(const std::string& text) {
-    std::vector<std::array<std::string, N>> rows;
-    for (size_t begin = 0, end, cell = 0; begin <= text.length(); begin = end + 1, ++cell) {
-        end = std::min(text.find('|', begin), text.length());
-        rows.resize(cell / N + 1);
-        rows.back()[cell % N] = text.substr(begin, end - begin);
+// A recorded call. The functions below make those that a test expects.
+struct Call {
+    std::string function;
+    std::string arguments;
+    bool operator==(const Call& other) const {
+        return function == other.function && arguments == other.arguments;
     }
-    return rows;
-}
-
-constexpr char kAlive[] = "odm.thp.dae_alive";
-constexpr char kEnable[] = "odm.thp.service_enable";
-constexpr char kPermissive[] = "odm.thp.debug.selinux.permissive";
-constexpr char kNoService[] = "0F_1F; failed to get binder service";
-const std::string kRestart =
-        "odm.thp.service_enable=0; odm.thp.dae_bootflag=true; odm.thp.service_enable=1";
-
-// What the daemon makes of one call.
-struct Answer {
-    android::status_t status = android::OK;
-    const char* text = "answer";                // null: the reply carries no text
-    std::function<void()> meanwhile = nullptr;  // happens on the device during the call
 };
 
-// Each test finds a device that has just booted, and the tool's process as it is before main.
-class Device : public testing::Test {
+inline std::ostream& operator<<(std::ostream& out, const Call& call) {
+    return out << call.function << "(" << call.arguments << ")";
+}
+
+constexpr char kRead[] = "Read", kWrite[] = "Write", kLog[] = "Log", kPause[] = "Pause",
+               kShell[] = "Shell", kCloseShell[] = "CloseShell", kGetService[] = "GetService",
+               kLinkToDeath[] = "LinkToDeath", kUnlinkToDeath[] = "UnlinkToDeath",
+               kTransact[] = "Transact";
+
+constexpr int INFO = ANDROID_LOG_INFO;
+constexpr int WARN = ANDROID_LOG_WARN;
+constexpr int ERROR = ANDROID_LOG_ERROR;
+
+Call LogWithTag(const char* tag, int priority, const std::string& text);
+inline Call Log(int priority, const std::string& text) {
+    return LogWithTag("corvane_daemon", priority, text);
+}
+inline Call UntaggedLog(int priority, const std::string& text) {
+    return LogWithTag(nullptr, priority, text);
+}
+
+inline Call Read(const std::string& key) { return {kRead, key}; }
+inline Call Write(const std::string& key, const std::string& value) {
+    return {kWrite, key + ", " + value};
+}
+inline Call Pause(std::chrono::microseconds time) {
+    return {kPause, std::to_string(time.count()) + " us"};
+}
+inline Call Shell(const std::string& command) { return {kShell, command}; }
+inline Call CloseShell() { return {kCloseShell, ""}; }
+
+// The daemon's service is numbered by the lookups that found it.
+inline Call GetService() { return {kGetService, "service.corvaneinterfaceservice"}; }
+inline Call LinkToDeath(int service) { return {kLinkToDeath, std::to_string(service)}; }
+inline Call UnlinkToDeath(int service) { return {kUnlinkToDeath, std::to_string(service)}; }
+
+constexpr char kTwoWay[] = "two-way";
+constexpr char kOneWay[] = "one-way";
+// `parameters` are absent when none are sent.
+Call Transact(int service, const char* way, const std::string& command,
+              const std::optional<std::string>& parameters = std::nullopt);
+
+// What the daemon makes of a call.
+struct Answer {
+    android::status_t status = android::OK;
+    const char* text = "answer";                 // null for a reply without a text
+    std::function<void()> duringCall = nullptr;  // what happens on the device meanwhile
+};
+
+struct DelayedValue {
+    int read;  // the property has the value from this read on, counted from 1
+    std::string value;
+};
+
+// A device whose daemon is alive, and the tool's process as it is before main. One at a time.
+class FakeDevice {
   public:
-    Device();
-    ~Device() override { StartsAfresh(); }
+    FakeDevice();
+    ~FakeDevice();
 
-    // Given.
-    void StartsAfresh();  // forgets the trail and what the process remembers
-    void DaemonIs(const std::string& alive, const std::string& binder,
-                  const std::string& updating = "0", const std::string& reboots = "0");
-    std::map<std::string, std::string> holds;                    // properties
-    std::set<std::string> refuses;                               // writes to these
-    std::map<std::string, std::pair<int, std::string>> appears;  // at the n-th read from now
-    std::optional<std::string> bootLine = "", getenforce = "";   // none: cannot be opened, run
-    int closeStatus = 256;                                       // of getenforce
-    std::deque<bool> lookups;    // whether the next ones find the service; then they all do
-    std::deque<Answer> answers;  // to the next calls; then the standard one
-    int failingAllocation = 0;   // the n-th from now of those that may fail
+    std::map<std::string, std::string> properties = {{"odm.thp.dae_alive", "true"},
+                                                     {"odm.thp.binder", "1"}};
+    std::map<std::string, DelayedValue> delayedValues;
+    std::set<std::string> readOnly;                     // writes to these properties are rejected
+    std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened
+    std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
+    int getenforceStatus = 0;                               // what closing its output returns
+    std::optional<timespec> monotonicClock = timespec{};    // none: it cannot be read
+    int failingAllocation = 0;  // of those that may fail, counted from 1
+    std::deque<bool> lookups;   // whether each finds the service; all later ones do
+    android::status_t linkStatus = android::OK;
+    std::deque<Answer> answers;  // to the calls, in order; all later ones get the default
 
-    // Then: the steps of these kinds, each with its kind when several are asked for. There are
-    // read, write, log, pause (in microseconds), shell, end (of its output), find (the service),
-    // tie (to its death), untie and call. A shape is their initials.
-    std::string Trail(const std::string& kinds) const;
-    std::string Shape(const std::string& kinds = "read write log pause find call") const;
-    std::string request;  // the bytes of the last call
-    std::vector<android::wp<android::IBinder::DeathRecipient>> tied;
+    // The recorded calls of these functions, or of all when none is named.
+    std::vector<Call> calls(const std::set<std::string>& functions = {}) const;
+    std::string request;  // the bytes of the last call's parcel
 
-    // For the calls that end here.
-    void Note(const std::string& kind, const std::string& text) { mSteps.push_back({kind, text}); }
-    int found = 0;
+    // For the functions that end here.
+    void Record(Call call) { mCalls.push_back(std::move(call)); }
+    int servicesFound = 0;
 
   private:
-    std::vector<std::pair<std::string, std::string>> mSteps;
+    std::vector<Call> mCalls;
 };
 
 }  // namespace test

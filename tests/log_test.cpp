@@ -1,30 +1,58 @@
-// The log facility: which lines it writes and how they read.
 #include "log/Log.h"
 
-#include "tests/fake_device.h"
+#include "tests/unit_test.h"
 
 namespace test {
 
-using LogFacility = Device;
+using LogTest = DeviceTest;
 
-TEST_F(LogFacility, WritesLevelsUpToItsThreshold) {
+// Writes debug lines, too, and keeps texts in memory.
+class DebugLog : public LogBase {
+  public:
+    DebugLog() : LogBase("debug") {}
+    int GetLogLevel() const override { return LOG_DEBUG; }
+    void Append(std::string text) const override { mLog += text; }
+};
+
+TEST_F(LogTest, WritesLevelsUpToItsThreshold) {
     for (int level = -1; level <= 5; ++level) {
-        gSysLog.Printf(static_cast<LogLevel>(level), "static unsigned long A::B(int) const", level,
-                       "%s", "m");
+        gSysLog.Printf(static_cast<LogLevel>(level), "f", level, "%s", "text");
     }
-    EXPECT_EQ(Trail("log"),
-              "E corvane_daemon: A::B[1] m; W corvane_daemon: A::B[2] m; I corvane_daemon: A::B[3] "
-              "m");
-    EXPECT_EQ(gSysLog.GetName() + gSysLog.GetLog() + gSysLog.GetLogClear(), "sys");
+    gSysLog.AndroidLog(LOG_DEBUG, "f", 4, "text");
+    EXPECT_THAT(device.calls(), ElementsAre(Log(ERROR, "f[1] text"), Log(WARN, "f[2] text"),
+                                            Log(INFO, "f[3] text")));
 }
 
-TEST_F(LogFacility, SaysThatAMessageWasTooLong) {
-    const std::string fits(2047, 'x');
-    gSysLog.Printf(LOG_INFO, "f", 1, "%s", fits.c_str());
-    gSysLog.Printf(LOG_INFO, "f", 2, "%sy", fits.c_str());
-    EXPECT_EQ(Trail("log"), "I corvane_daemon: f[1] " + fits +
-                                    "; I corvane_daemon: over size 0; I corvane_daemon: f[2] " +
-                                    fits);
+TEST_F(LogTest, WritesDebugLinesWithThePriorityOfInformation) {
+    DebugLog().Printf(LOG_DEBUG, "f", 1, "%d", 7);
+    EXPECT_THAT(device.calls(), ElementsAre(Log(INFO, "f[1] 7")));
+}
+
+TEST_F(LogTest, NamesTheFunctionWithoutItsSignature) {
+    gSysLog.Printf(LOG_ERROR, "unsigned long A::B(int (*)(int)) const", 120, "failed");
+    EXPECT_THAT(device.calls(), ElementsAre(Log(ERROR, "A::B[120] failed")));
+}
+
+TEST_F(LogTest, SaysThatAMessageIsTooLong) {
+    const std::string longest(2047, 'x');
+    gSysLog.Printf(LOG_INFO, "f", 1, "%s", longest.c_str());
+    gSysLog.Printf(LOG_INFO, "f", 2, "%sy", longest.c_str());
+    EXPECT_THAT(device.calls(), ElementsAre(Log(INFO, "f[1] " + longest), Log(INFO, "over size 0"),
+                                            Log(INFO, "f[2] " + longest)));
+}
+
+TEST_F(LogTest, EmptiesItsMemory) {
+    DebugLog log;
+    log.Append("kept");
+    EXPECT_EQ(log.GetLog(), "kept");
+    EXPECT_EQ(log.GetLogClear(), "kept");
+    EXPECT_EQ(log.GetLogClear(), "");
+}
+
+TEST_F(LogTest, KeepsNothingInMemoryByItself) {
+    gSysLog.Append("text");
+    EXPECT_EQ(gSysLog.GetLog(), "");
+    EXPECT_EQ(gSysLog.GetName(), "sys");
 }
 
 }  // namespace test

@@ -1,89 +1,134 @@
-// The daemon's client: how long it waits, what it reports, and how it judges a command's outcome.
 #include "daemon/TpdClient.h"
 
-#include "tests/fake_device.h"
+#include "tests/unit_test.h"
 
 namespace test {
 
-class Client : public Device {
-  public:
+constexpr char kAliveKey[] = "odm.thp.dae_alive";
+constexpr char kBinderKey[] = "odm.thp.binder";
+constexpr char kUpdatingKey[] = "odm.thp.is_updating_fw";
+constexpr char kRebootTimesKey[] = "odm.thp.dae_reboot_times";
+
+class TpdClientTest : public DeviceTest {
+  protected:
+    TpdClientTest() {
+        device.properties[kUpdatingKey] = "false";
+        device.properties[kRebootTimesKey] = "0";
+    }
+    void StopDaemon() { device.properties[kAliveKey] = "false"; }
+    void StartDaemon() { device.properties[kAliveKey] = "true"; }
+    size_t ChecksWhileDaemonIsDown() {
+        StopDaemon();
+        const size_t before = device.calls({kLog}).size();
+        client.ThpExecuteCmdParams("[TPD]c", "");
+        return device.calls({kLog}).size() - before;
+    }
+
     TpdClient client;
 };
 
-TEST_F(Client, WaitsForTheDaemonAndRemembersIt) {
-    DaemonIs("false", "1");
-    appears[kAlive] = {4, "true"};
+TEST_F(TpdClientTest, ChecksALivingDaemonOnceForAllCommands) {
+    EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 0.thp.dae_alive : 1. thp.binder: 1");
+    EXPECT_EQ(client.daemonUnavailable, 0);
+    TpdClient another;
+    EXPECT_EQ(another.WaitDaemonAlive(1), "check_time: 0.");
+    EXPECT_EQ(another.daemonUnavailable, 0);
+    EXPECT_THAT(device.calls(), ElementsAre(Read(kAliveKey), Read(kBinderKey)));
+}
+
+TEST_F(TpdClientTest, WaitsForADaemonThatStarts) {
+    device.properties[kBinderKey] = "0";
+    device.delayedValues[kBinderKey] = {4, "1"};
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 3.thp.dae_alive : 1. thp.binder: 1");
-    EXPECT_EQ(Shape() + "; " + Trail("log pause"),
-              "rrrlrrrlprrrlprr; log I corvane_daemon: CheckAlive 0; log I corvane_daemon: "
-              "CheckAlive 1; pause 200000; log I corvane_daemon: CheckAlive 2; pause 200000");
-    EXPECT_EQ(TpdClient().WaitDaemonAlive(1), "check_time: 0.");
-    EXPECT_EQ(Shape(), "rrrlrrrlprrrlprr");
+    EXPECT_THAT(device.calls({kLog, kPause}),
+                ElementsAre(Log(INFO, "CheckAlive 0"), Log(INFO, "CheckAlive 1"), Pause(200ms),
+                            Log(INFO, "CheckAlive 2"), Pause(200ms)));
 }
 
-TEST_F(Client, ReportsADaemonThatStaysDown) {
-    const auto kCases = Table<7>(
-            "false|1|false|1|11|check_time: 10.thp.dae_alive : 0. thp.binder: 1 reboot_times: 1|"
-            "rrrlrrrlprrrlprrrlprrrlprrrlprrrlprrrlprrrlprrrlprrrlpr|"
-            "true|0|0|2|2|check_time: 1.thp.dae_alive : 1. thp.binder: 0 reboot_times: "
-            "0|rrrlrrrlpr|"
-            "true|1|0|1|0| reboot_times: 1|r|true|1|0|0|-1| reboot_times: 0|r|0|true|1|1|11|"
-            "bypass-when-fw-updatingcheck_time: 0.thp.dae_alive : 0. thp.binder: 1|rrr");
-    for (const auto& [alive, binder, updating, reboots, checks, report, shape] : kCases) {
-        StartsAfresh();
-        DaemonIs(alive, binder, updating, reboots);
-        client.daemonUnavailable = 0;
-        EXPECT_EQ(client.WaitDaemonAlive(atoi(checks.c_str())), "0P_1P; " + report);
+TEST_F(TpdClientTest, ReportsADaemonThatStaysDown) {
+    StopDaemon();
+    device.properties[kRebootTimesKey] = "1";
+    client.daemonUnavailable = 0;
+    EXPECT_EQ(client.WaitDaemonAlive(2),
+              "0P_1P; check_time: 1.thp.dae_alive : 0. thp.binder: 1 reboot_times: 1");
+    EXPECT_EQ(client.daemonUnavailable, 1);
+}
+
+TEST_F(TpdClientTest, DoesNotWaitForAFirmwareUpdate) {
+    StopDaemon();
+    device.properties[kUpdatingKey] = "true";
+    EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", "p"),
+              "0P_1P; bypass-when-fw-updatingcheck_time: 0.thp.dae_alive : 0. thp.binder: 1");
+    EXPECT_THAT(device.calls({kLog, kPause, kTransact}), IsEmpty());
+}
+
+TEST_F(TpdClientTest, ChecksOnlyOnceAfterTwoFailedWaits) {
+    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
+    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
+    EXPECT_EQ(ChecksWhileDaemonIsDown(), 1U);
+    EXPECT_EQ(ChecksWhileDaemonIsDown(), 1U);
+    StartDaemon();
+    device.answers = {{android::OK, "an ERROR"}};
+    EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", ""), "an ERROR");
+    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
+}
+
+TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerTellsAFailure) {
+    const struct {
+        const char* answer;
+        bool trusted;
+    } kRows[] = {{"an ERROR", false}, {"an error", true}, {"x0F_1F; y", false}, {"0f_1F", true}};
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(row.answer);
+        device.answers = {{android::OK, row.answer}};
+        EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", "p"), row.answer);
+        EXPECT_EQ(aliveConfirmed, row.trusted);
+    }
+}
+
+TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
+    device.readOnly = {"odm.thp.service_enable"};
+    for (const std::string enabled : {"0", "1"}) {
+        device.properties["odm.thp.service_enable"] = enabled;
+        device.lookups = {false, false};
+        EXPECT_EQ(client.RunCmd("c", ""), "0F_1F; failed to get binder service");
         EXPECT_EQ(client.daemonUnavailable, 1);
-        EXPECT_EQ(Shape(), shape);
+        EXPECT_EQ(device.calls({kLog}).back(),
+                  Log(ERROR, "RunCmd, failed to Get binder service. thp.service_enable: " +
+                                     enabled + "\n"));
     }
 }
 
-TEST_F(Client, LosesPatienceAfterTwoFailedWaits) {
-    std::string story;  // of each command: how many checks failed, whether the daemon is trusted
-    for (const std::string answer :
-         {"", "", "", "", "an ERROR", "", "fine", "0F_1", "error 0f_1f", "x0F_1F; y", "", "", ""}) {
-        const size_t before = Shape("pause").length();
-        DaemonIs(answer.empty() ? "false" : "true", "1");
-        answers = {{0, answer.c_str()}};
-        const std::string result = client.ThpExecuteCmdParams("[TPD]c", "p");
-        EXPECT_EQ(answer.empty() ? result.substr(0, 7) : result,
-                  answer.empty() ? "0P_1P; " : answer);
-        EXPECT_EQ(client.daemonUnavailable, answer.empty() ? 1 : 0);
-        story += std::to_string(Shape("pause").length() - before) + (aliveConfirmed ? "+ " : " ");
+TEST_F(TpdClientTest, JudgesACapacityTestByTheDaemonAfterwards) {
+    const std::string failure =
+            "captest fail due to corvane_daemon is not alive or unexpected reboot. ";
+    const std::string died = "thp.dae_alive : 0. thp.binder: 1" + failure;
+    const std::string restarted = "thp.dae_alive : 1. thp.binder: 1" + failure;
+    const struct {
+        const char* command;
+        const char* parameters;
+        const char* alive;
+        const char* rebootTimes;
+        std::string failure;
+    } kRows[] = {
+            {"captest", "running_test", "true", "2", ""},
+            {"captest", "running_testrunning", "false", "0", died + "before: 0, after: 0"},
+            {"captest", "running_test_lasttime", "true", "1", restarted + "before: 0, after: 1"},
+            {"captest", "lasttimerunning", "false", "1", ""},
+            {"captest", "", "false", "1", ""},
+            {"[TPD]captest", "running_test", "false", "1", ""}};
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(std::string(row.command) + " " + row.parameters);
+        StartDaemon();
+        device.properties[kRebootTimesKey] = "0";
+        device.answers = {{android::OK, "answer", [&] {
+                               device.properties[kAliveKey] = row.alive;
+                               device.properties[kRebootTimesKey] = row.rebootTimes;
+                           }}};
+        client.daemonUnavailable = 1;
+        EXPECT_EQ(client.RunCmd(row.command, row.parameters), "answer" + row.failure);
+        EXPECT_EQ(client.daemonUnavailable, 0);
     }
-    EXPECT_EQ(story, "10 10 0 0 0 10 0+ 0+ 0+ 0 10 10 0 ");
-}
-
-TEST_F(Client, JudgesACapacityTest) {
-    const std::string why =
-            "captest fail due to corvane_daemon is not alive or unexpected reboot. before: ";
-    const auto kCases = Table<6>(
-            "captest|running_test|0|0|true||captest|test|2|3|true||"
-            "captest|running_test_lasttime|0|1|true|thp.dae_alive : 1. thp.binder: 1" +
-            why +
-            "0, after: 1|"
-            "captest|testrunning|1|2|0|thp.dae_alive : 0. thp.binder: 1" +
-            why +
-            "1, after: 0|"
-            "captest|_|1|1|0|thp.dae_alive : 0. thp.binder: 1" +
-            why + "1, after: 1");
-    for (const auto& row : kCases) {
-        StartsAfresh();
-        DaemonIs("true", "1", "0", row[2]);
-        answers = {{0, "answer", [&] { DaemonIs(row[4], "1", "0", row[3]); }}};
-        EXPECT_EQ(client.RunCmd(row[0].c_str(), row[1].c_str()), "answer" + row[5]);
-        EXPECT_EQ(Shape("read call") + std::to_string(client.daemonUnavailable), "rcrrr0");
-    }
-    StartsAfresh();
-    lookups = {false, false};
-    EXPECT_EQ(client.RunCmd("c", ""), kNoService);
-    const std::string trail = Trail("log");
-    EXPECT_EQ(trail.substr(trail.find("; E corvane")) + std::to_string(client.daemonUnavailable),
-              "; E corvane_daemon: RunCmd, failed to Get binder service. "
-              "thp.service_enable: 1\n1");
-    EXPECT_FALSE(TpdClient::IsCaptestInRt("captest", "lasttimerunning"));
-    EXPECT_FALSE(TpdClient::IsCaptestInRt("captest", "") || TpdClient::IsCaptestInRt("", "test"));
 }
 
 }  // namespace test

@@ -1,71 +1,100 @@
-// The daemon's controller: start, stop, restart, log switches, and who may forward commands.
 #include "daemon/TpdCmd.h"
 
-#include "tests/fake_device.h"
+#include "tests/unit_test.h"
 
 namespace test {
 
-using Controller = Device;
+using TpdCmdTest = DeviceTest;
 
-TEST_F(Controller, SwitchesTheLogWhenItStandsOtherwise) {
-    const std::string enabling = "persist.odm.thp.thplog_enabled=true; " + kRestart;
-    const std::string disabling =
-            "persist.odm.thp.ver_dae=true; odm.thp.ver_dae=true; "
-            "persist.odm.thp.thplog_enabled=false; " +
-            kRestart;
-    const auto kCases = Table<4>(  // log property, user type, boot line, counts as on
-            "true|0||1|false|3||0|truefalse|5||0|untrue|||1|1|3||1||5||1||4||0||||0||x5||0||35||0||"
-            "4294967299||0|"
-            "false||enter_recovery=1|0|true||enter_erecovery=2|1");
-    for (const auto& [thplog, userType, line, counts] : kCases) {
-        for (const bool enable : {true, false}) {
-            StartsAfresh();
-            holds = {{"persist.odm.thp.thplog_enabled", thplog},
-                     {"ro.logsystem.usertype", userType}};
-            bootLine = line;
-            const bool on = counts == "1", switches = on != enable && line.empty();
-            EXPECT_EQ(TpdCmd::IsThplogEnable(), on) << thplog << userType;
-            enable ? TpdCmd().EnableThplog() : TpdCmd().DisableThplog();
-            EXPECT_EQ(Trail("write"), !switches ? "" : enable ? enabling : disabling);
-            EXPECT_EQ(TpdCmd::IsThplogEnable(), switches ? enable : on);
-        }
+TEST_F(TpdCmdTest, TellsWhetherTheThplogIsOn) {
+    const struct {
+        const char* thplog;
+        const char* userType;
+        bool on;
+    } kRows[] = {{"untrue", "", true}, {"truefalse", "3", false}, {"1", "3", true},
+                 {"", "5", true},      {"", "4", false},          {"", "", false}};
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(std::string(row.thplog) + "/" + row.userType);
+        device.properties = {{kThplogKey, row.thplog}, {"ro.logsystem.usertype", row.userType}};
+        EXPECT_EQ(TpdCmd::IsThplogEnable(), row.on);
     }
 }
 
-TEST_F(Controller, LetsCommandsThroughWhenSelinuxDoes) {
-    const std::string fits = "Permissive" + std::string(189, 'x');
-    const auto kCases = Table<5>(  // stored flag, boot line, getenforce, stored afterwards, passes
-            "||Enforcing\n|null|0|||Permissive\n|true|1|0|| \nPermissively so|true|1|"
-            "||Not Permissive\n|null|0|||xPermissive\n|null|0||| \n|null|0|1||Enforcing\n|1|1|"
-            "true||Enforcing\n|true|1||enter_recovery=1|Enforcing\n|null|1|"
-            "|androidboot.swtype=factory|Enforcing\n|null|1|||" +
-            fits + "|true|1|||" + fits + "x|null|0");
-    for (const auto& [stored, line, printed, storedAfter, passes] : kCases) {
-        StartsAfresh();
-        holds[kPermissive] = stored;
-        bootLine = line;
-        getenforce = printed;
-        EXPECT_EQ(TpdCmd().IsSelinuxPermissive() ? "1" : "0", passes) << printed;
-        const bool asks = stored != "true" && stored != "1" && line.empty();
-        EXPECT_EQ(Trail("shell end"), asks ? "shell getenforce >r; end " : "");
-        EXPECT_EQ(holds[kPermissive], storedAfter) << printed;
+TEST_F(TpdCmdTest, EnablesTheThplogOnce) {
+    TpdCmd().EnableThplog();
+    TpdCmd().EnableThplog();
+    EXPECT_THAT(device.calls({kWrite}),
+                ElementsAre(Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart));
+}
+
+TEST_F(TpdCmdTest, DisablesTheThplogOnce) {
+    device.properties["ro.logsystem.usertype"] = "3";
+    TpdCmd().DisableThplog();
+    TpdCmd().DisableThplog();
+    EXPECT_THAT(
+            device.calls({kWrite}),
+            ElementsAre(Write("persist.odm.thp.ver_dae", "true"), Write("odm.thp.ver_dae", "true"),
+                        Write(kThplogKey, "false"), kStop, kSetBootFlag, kStart));
+}
+
+TEST_F(TpdCmdTest, LeavesTheThplogAloneInUpgradeMode) {
+    device.kernelCommandLine = "enter_recovery=1";
+    TpdCmd().EnableThplog();
+    device.properties[kThplogKey] = "true";
+    TpdCmd().DisableThplog();
+    EXPECT_THAT(device.calls({kWrite}), IsEmpty());
+}
+
+TEST_F(TpdCmdTest, ReadsTheMonotonicClockInMilliseconds) {
+    device.monotonicClock = timespec{12, 345999999};
+    EXPECT_EQ(TpdCmd::GetMonotonicTime(), 12345U);
+    device.monotonicClock = std::nullopt;
+    EXPECT_EQ(TpdCmd::GetMonotonicTime(), 0U);
+}
+
+TEST_F(TpdCmdTest, StoresThatSelinuxIsPermissive) {
+    device.getenforce = " \nPermissively so";
+    EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
+    EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
+    EXPECT_THAT(device.calls({kShell, kCloseShell, kWrite}),
+                ElementsAre(Write(kPermissiveKey, "null"), Shell("getenforce"), CloseShell(),
+                            Write(kPermissiveKey, "true")));
+}
+
+TEST_F(TpdCmdTest, AllowsCommandsWithoutAskingSelinux) {
+    device.properties[kPermissiveKey] = "1";
+    EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
+    device.properties[kPermissiveKey] = "null";
+    for (const char* line : {"enter_recovery=1", "androidboot.swtype=factory"}) {
+        device.kernelCommandLine = line;
+        EXPECT_TRUE(TpdCmd().IsSelinuxPermissive()) << line;
+    }
+    EXPECT_THAT(device.calls({kWrite, kShell}), IsEmpty());
+}
+
+TEST_F(TpdCmdTest, AllowsCommandsOnlyWhenGetenforceSaysPermissive) {
+    const std::string longest = "Permissive" + std::string(189, 'x');  // 200 bytes with its zero
+    const struct {
+        const char* name;
+        std::optional<std::string> output;
+        bool allowed;
+    } kRows[] = {{"enforcing", "Enforcing\n", false}, {"within a word", "xPermissive\n", false},
+                 {"no output", " \n", false},         {"cannot be run", std::nullopt, false},
+                 {"longest word", longest, true},     {"word too long", longest + "x", false}};
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(row.name);
+        device.properties.clear();
+        device.getenforce = row.output;
+        EXPECT_EQ(TpdCmd().IsSelinuxPermissive(), row.allowed);
     }
 }
 
-TEST_F(Controller, StopsCommandsWhenItCannotFindOut) {
-    getenforce = "Permissive\n";
-    closeStatus = -1;
-    bootLine.reset();
+TEST_F(TpdCmdTest, MindsOnlyAnOutputThatCannotBeClosed) {
+    device.getenforce = "Permissive\n";
+    device.getenforceStatus = -1;
     EXPECT_FALSE(TpdCmd().IsSelinuxPermissive());
-    holds.clear();
-    getenforce.reset();
-    EXPECT_FALSE(TpdCmd().IsSelinuxPermissive());
-}
-
-TEST_F(Controller, ReadsTheClockInMilliseconds) {
-    timespec now;
-    clock_gettime(CLOCK_MONOTONIC, &now);
-    EXPECT_LE(TpdCmd::GetMonotonicTime() - static_cast<uint64_t>(now.tv_sec) * 1000, 2000U);
+    device.getenforceStatus = 256;
+    EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
 }
 
 }  // namespace test

@@ -1,94 +1,135 @@
-// The front end, called like the program: words in, what it prints and does to the device out.
 #include "main/TpdMain.h"
 
-#include "tests/fake_device.h"
+#include "tests/unit_test.h"
 
 int tpd_main(int argc, char** argv);
 
 namespace test {
 
-const std::string kHelpText =
-        "\n\n//aaa special gTpdCmds\ndebugDifEnable\ndebugRawEnable\nlog_afe_disable\n"
-        "log_afe_enable\nlog_disable\nlog_enable\nreboot\nshowtouch\nshowtouch_"
-        "close\nstart\nstop\n";
+constexpr char kHelpText[] =
+        "\n\n//aaa special gTpdCmds\n"
+        "debugDifEnable\ndebugRawEnable\nlog_afe_disable\nlog_afe_enable\nlog_disable\n"
+        "log_enable\nreboot\nshowtouch\nshowtouch_close\nstart\nstop\n";
 
-class Tool : public Device {
-  public:
-    // What the tool prints for these words, its own name the first, with "," between them.
-    std::string Prints(std::string words) {
-        std::vector<char*> arguments = {words.data()};
-        for (size_t at = 0; (at = words.find(',', at)) != std::string::npos;) {
-            words[at] = '\0';
-            arguments.push_back(&words[++at]);
-        }
-        testing::internal::CaptureStdout();
-        EXPECT_EQ(tpd_main(static_cast<int>(arguments.size()), arguments.data()), 0);
-        return testing::internal::GetCapturedStdout();
+// What the tool prints when it is called with these arguments.
+std::string RunTool(std::vector<std::string> arguments) {
+    std::vector<char*> argv;
+    for (std::string& argument : arguments) {
+        argv.push_back(argument.data());
     }
-};
-
-TEST_F(Tool, DispatchesOnTheNumberOfWords) {
-    const auto kCases = Table<3>(  // words, call, whether the help text follows
-            "tpd|[help]|y|tpd,help|[help]|y|tpd,Start|[Start]||tpd,|[]||tpd,help,|[help]||"
-            "tpd,start,x|[start] [x]||tpd,TSA_ExecuteCommand,a|[TSA_ExecuteCommand] [a]||"
-            "tpd,TSA_ExecuteCommand,a,b|[TSA_ExecuteCommand] [a b]||"
-            "tpd,TSA_ExecuteCommand,a,|[TSA_ExecuteCommand] [a ]||tpd,TSA_ExecuteCommand,,b|||"
-            "tpd,TSA_ExecuteCommands,a,b|||tpd,tsa_ExecuteCommand,a,b|||tpd,TSA_ExecuteCommand,a,b,"
-            "c||");
-    getenforce = "Permissive\n";
-    DaemonIs("true", "1");
-    for (const auto& [words, call, help] : kCases) {
-        StartsAfresh();
-        EXPECT_EQ(Prints(words),
-                  (call.empty() ? "" : "answer") + (help == "y" ? kHelpText : "") + "\n");
-        EXPECT_EQ(Trail("call"), call.empty() ? "" : "1 two-way " + call);
-        EXPECT_TRUE(g_tpdCmd == nullptr && gTpdCmds.empty() && holds.count(kEnable) == 0);
-    }
+    testing::internal::CaptureStdout();
+    EXPECT_EQ(tpd_main(static_cast<int>(argv.size()), argv.data()), 0);
+    return testing::internal::GetCapturedStdout();
 }
 
-TEST_F(Tool, RunsItsOwnCommands) {
-    const auto kCases = Table<2>(
-            "start|odm.thp.dae_bootflag=true; "
-            "odm.thp.service_enable=1|stop|odm.thp.service_enable=0|"
-            "log_enable|persist.odm.thp.thplog_enabled=true; " +
-            kRestart + "|reboot|" + kRestart +
-            "|log_disable|persist.sys.zelmor.debug.on=false|debugRawEnable|thp.debug.raw=true|"
-            "debugDifEnable|thp.debug.raw=false|log_afe_enable|odm.thp.debug.afelog=true; " +
-            kRestart + "|log_afe_disable|odm.thp.debug.afelog=false; " + kRestart +
-            "|showtouch|settings put system show_touches 1; settings put system pointer_location 1|"
-            "showtouch_close|settings put system show_touches 0; settings put system "
-            "pointer_location 0");
-    for (const auto& [name, steps] : kCases) {
-        StartsAfresh();
-        holds.clear();
-        EXPECT_EQ(Prints("tpd," + name), "\n");
-        EXPECT_EQ(Trail("write") + Trail("shell") + Trail("find"), steps);
-        EXPECT_NE(Trail("log").find("Cmd[145] Get cmd. " + name + "\n"), std::string::npos);
+TEST(TpdMainTest, ForwardsCommands) {
+    const struct {
+        std::vector<std::string> arguments;
+        Call call;
+        const char* help;
+    } kRows[] = {
+            {{"tpd"}, Transact(1, kTwoWay, "help"), kHelpText},
+            {{"tpd", "help"}, Transact(1, kTwoWay, "help"), kHelpText},
+            {{"tpd", "help", ""}, Transact(1, kTwoWay, "help"), ""},
+            {{"tpd", "Start"}, Transact(1, kTwoWay, "Start"), ""},
+            {{"tpd", "start", "x"}, Transact(1, kTwoWay, "start", "x"), ""},
+            {{"tpd", "TSA_ExecuteCommand", "a", "b"},
+             Transact(1, kTwoWay, "TSA_ExecuteCommand", "a b"),
+             ""},
+    };
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(testing::PrintToString(row.arguments));
+        FakeDevice device;
+        device.getenforce = "Permissive\n";
+        EXPECT_EQ(RunTool(row.arguments), std::string("answer") + row.help + "\n");
+        EXPECT_THAT(device.calls({kTransact}), ElementsAre(row.call));
     }
 }
 
-TEST_F(Tool, TracesAForwardedCommand) {
-    const std::string refused =
-            "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n";
-    EXPECT_EQ(Prints("tpd"), refused + kHelpText + "\n");
-    StartsAfresh();
-    DaemonIs("0", "0", "1");
-    holds[kPermissive] = "true";
-    const std::string report =
-            "0P_1P; bypass-when-fw-updatingcheck_time: 0.thp.dae_alive : 0. thp.binder: 0";
-    EXPECT_EQ(Prints("tpd,help"), report + kHelpText + "\n");
-    EXPECT_EQ(Trail("log"),
-              "I corvane_daemon: InitTpdCmds[120] +\n; I corvane_daemon: ExcuteTpdCmd[142] +\n; I "
-              "corvane_daemon: ExcuteTpdCmd[150] -\n; I corvane_daemon: corvane_daemon "
-              "ThpDebugExecuteCmd[156] cmd help\n; I corvane_daemon: ret = " +
-                      report + "; I corvane_daemon: CmdsToStr[130] +\n");
+TEST(TpdMainTest, IgnoresOtherArguments) {
+    const std::vector<std::string> kRows[] = {
+            {},
+            {"tpd", "TSA_ExecuteCommand", "", "b"},
+            {"tpd", "TSA_ExecuteCommands", "a", "b"},
+            {"tpd", "TSA_ExecuteCommand", "a", "b", "c"},
+    };
+    for (const auto& arguments : kRows) {
+        SCOPED_TRACE(testing::PrintToString(arguments));
+        FakeDevice device;
+        EXPECT_EQ(RunTool(arguments), "\n");
+        EXPECT_THAT(device.calls({kRead}), IsEmpty());
+    }
 }
 
-TEST_F(Tool, SaysThatItHasNoMemory) {
-    failingAllocation = 1;
-    EXPECT_EQ(Prints("tpd,start"), "can NOT alloc memory for g_tpdCmd");
-    failingAllocation = 2;
-    EXPECT_EQ(Prints("tpd,start"), "can NOT alloc memory for tpd_clientcan NOT Init g_tpdCmd");
+TEST(TpdMainTest, CarriesOutLocalCommands) {
+    const Call enableAfeLog = Write("odm.thp.debug.afelog", "true");
+    const Call disableAfeLog = Write("odm.thp.debug.afelog", "false");
+    const struct {
+        const char* command;
+        std::vector<Call> calls;
+    } kRows[] = {
+            {"start", {kSetBootFlag, kStart}},
+            {"stop", {kStop}},
+            {"reboot", {kStop, kSetBootFlag, kStart}},
+            {"log_enable", {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart}},
+            {"log_disable", {Write("persist.sys.zelmor.debug.on", "false")}},
+            {"debugRawEnable", {Write("thp.debug.raw", "true")}},
+            {"debugDifEnable", {Write("thp.debug.raw", "false")}},
+            {"log_afe_enable", {enableAfeLog, kStop, kSetBootFlag, kStart}},
+            {"log_afe_disable", {disableAfeLog, kStop, kSetBootFlag, kStart}},
+            {"showtouch",
+             {Shell("settings put system show_touches 1"),
+              Shell("settings put system pointer_location 1")}},
+            {"showtouch_close",
+             {Shell("settings put system show_touches 0"),
+              Shell("settings put system pointer_location 0")}},
+    };
+    for (const auto& row : kRows) {
+        SCOPED_TRACE(row.command);
+        FakeDevice device;
+        EXPECT_EQ(RunTool({"tpd", row.command}), "\n");
+        EXPECT_THAT(device.calls({kWrite, kShell, kGetService}), ElementsAreArray(row.calls));
+        EXPECT_EQ(device.calls({kLog})[2],
+                  Log(INFO, std::string("ExcuteTpdCmd[145] Get cmd. ") + row.command + "\n"));
+    }
+}
+
+TEST(TpdMainTest, DisablesDebuggingBeforeTheThplog) {
+    FakeDevice device;
+    device.properties[kThplogKey] = "true";
+    RunTool({"tpd", "log_disable"});
+    EXPECT_EQ(device.calls({kWrite}).front(), Write("persist.sys.zelmor.debug.on", "false"));
+    EXPECT_EQ(device.properties[kThplogKey], "false");
+}
+
+TEST(TpdMainTest, LogsAForwardedCommand) {
+    FakeDevice device;
+    device.properties[kPermissiveKey] = "1";
+    RunTool({"tpd", "help"});
+    EXPECT_THAT(device.calls({kLog}),
+                IsSupersetOf({Log(INFO, "InitTpdCmds[120] +\n"), Log(INFO, "ExcuteTpdCmd[142] +\n"),
+                              Log(INFO, "ExcuteTpdCmd[150] -\n"),
+                              Log(INFO, "corvane_daemon ThpDebugExecuteCmd[156] cmd help\n"),
+                              Log(INFO, "ret = answer"), Log(INFO, "CmdsToStr[130] +\n")}));
+}
+
+TEST(TpdMainTest, SendsNothingWhileSelinuxEnforces) {
+    FakeDevice device;
+    EXPECT_EQ(RunTool({"tpd"}),
+              std::string("please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n") +
+                      kHelpText + "\n");
+    EXPECT_THAT(device.calls({kGetService}), IsEmpty());
+    EXPECT_EQ(g_tpdCmd, nullptr);
+    EXPECT_THAT(gTpdCmds, IsEmpty());
+}
+
+TEST(TpdMainTest, SaysThatThereIsNoMemory) {
+    FakeDevice device;
+    device.failingAllocation = 1;
+    EXPECT_EQ(RunTool({"tpd", "start"}), "can NOT alloc memory for g_tpdCmd");
+    device.failingAllocation = 2;
+    EXPECT_EQ(RunTool({"tpd", "start"}),
+              "can NOT alloc memory for tpd_clientcan NOT Init g_tpdCmd");
 }
 
 }  // namespace test

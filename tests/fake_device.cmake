@@ -1,0 +1,14 @@
+# The product's front end and the fake device under it, for the unit tests and the fuzz targets. The
+# front end's main is called like any function; the linker leads the C library's calls to the device.
+include_guard(GLOBAL)
+
+add_library(tpd_front_end STATIC ${PROJECT_SOURCE_DIR}/main/TpdMain.cpp)
+target_compile_definitions(tpd_front_end PRIVATE main=tpd_main)
+target_link_libraries(tpd_front_end PUBLIC tpd_daemon PRIVATE tpd_build_options)
+
+# An object library: it comes whole and, unlike platform_device, before the product's archives.
+add_library(fake_device OBJECT ${CMAKE_CURRENT_LIST_DIR}/fake_device.cpp)
+target_link_libraries(fake_device PUBLIC tpd_front_end tpd_log PRIVATE tpd_build_options)
+foreach(function clock_gettime fopen pclose popen system usleep)
+    target_link_options(fake_device INTERFACE -Wl,--wrap=${function})
+endforeach()

@@ -1,0 +1,30 @@
+// What all unit tests need: GoogleMock, and a fresh fake device for each test.
+#pragma once
+
+#include <gmock/gmock.h>
+
+#include "tests/fake_device.h"
+
+namespace test {
+
+using namespace std::chrono_literals;
+using testing::Contains;
+using testing::ElementsAre;
+using testing::ElementsAreArray;
+using testing::IsEmpty;
+using testing::IsSupersetOf;
+using testing::Pair;
+using testing::SizeIs;
+
+class DeviceTest : public testing::Test {
+  protected:
+    FakeDevice device;
+};
+
+const Call kStop = Write("odm.thp.service_enable", "0");
+const Call kSetBootFlag = Write("odm.thp.dae_bootflag", "true");
+const Call kStart = Write("odm.thp.service_enable", "1");
+constexpr char kThplogKey[] = "persist.odm.thp.thplog_enabled";
+constexpr char kPermissiveKey[] = "odm.thp.debug.selinux.permissive";
+
+}  // namespace test
