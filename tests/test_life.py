@@ -21,12 +21,6 @@ def test_is_up_when_start_returns(stopped_device):
     assert "running" in stopped_device.output("device", "status")
 
 
-def test_starts_only_once(device):
-    before = device.processes()
-    device.output("device", "start")
-    assert device.processes() == before
-
-
 def test_is_stopped_for_all_who_ask_at_once(stopped_device):
     asked = in_parallel(stopped_device, *[["status"]] * 16)
     assert {(done.returncode, done.stdout) for done in asked} == {(3, "stopped\n")}
