@@ -51,8 +51,8 @@ def test_reports_a_service_that_ends_in_the_call(stopped_device, service):
 
 def test_finds_a_service_that_comes_during_the_lookup(stopped_device, service):
     threading.Timer(0.5, service.answer, [reply()]).start()
-    patient = stopped_device.env | {"TPD_GET_SERVICE_MS": "20000"}
-    assert stopped_device.tpd("x", env=patient) == "done\n"
+    environment = stopped_device.env | {"TPD_GET_SERVICE_MS": "20000"}
+    assert stopped_device.tpd("x", env=environment) == "done\n"
     assert len(stopped_device.events("lookup")) == 1
 
 
@@ -128,5 +128,5 @@ def test_keeps_a_property_when_the_disk_is_full(device):
         'mkdir -m 700 /mnt/root; "$@" debugRawEnable; ! head -c 99999 /dev/zero >/mnt/full;'
         '"$@" debugDifEnable; getprop thp.debug.raw; ls /mnt/root/tmp'
     )
-    printed = device.output("unshare", "-rm", "sh", "-ec", script, "sh", *device.tool)
-    assert printed == "\n\ntrue\n"
+    stdout = device.output("unshare", "-rm", "sh", "-ec", script, "sh", *device.tool)
+    assert stdout == "\n\ntrue\n"

@@ -22,8 +22,8 @@ def run_clients(commands, check):
 
     def client(number):
         for turn in range(commands):
-            word = f"{number}.{turn}"
-            check(f"version:3+main,{word},{word[::-1]}")
+            token = f"{number}.{turn}"
+            check(f"version:3+main,{token},{token[::-1]}")
 
     with concurrent.futures.ThreadPoolExecutor(CLIENTS) as pool:
         list(pool.map(client, range(CLIENTS)))
@@ -40,8 +40,8 @@ def resources(process):
 def test_answers_all_clients(device, commands):
     def check(state):
         assert device.tpd("captest", state) == f"captest {state}: PASS\n"
-        _, word, mirrored = device.getprop("odm.thp.screen_status").split(",")
-        assert word == mirrored[::-1]
+        _, token, mirrored = device.getprop("odm.thp.screen_status").split(",")
+        assert token == mirrored[::-1]
 
     before = {each: resources(each) for each in device.processes()}
     run_clients(commands, check)

@@ -105,8 +105,8 @@ def test_has_a_shell(device):
 def test_works_from_anywhere(device, tmp_path):
     (tmp_path / "link").symlink_to(SOURCE / "scripts/device")
     environment = device.env | {"CDPATH": f"{SOURCE}:/"}
-    printed = device.output(tmp_path / "link", "root", env=environment, cwd="/")
-    assert printed == f"{device.root}\n"
+    stdout = device.output(tmp_path / "link", "root", env=environment, cwd="/")
+    assert stdout == f"{device.root}\n"
 
 
 def test_works_without_standard_descriptors(device):
