@@ -145,9 +145,9 @@ TEST(VndBinderTest, LimitsTheSizeOfRequests) {
         SCOPED_TRACE(flags);
         const size_t largest = flags == 0 ? 1040384 : 520192;
         Parcel request, reply;
-        request.resizeForOverwrite(largest);
+        request.resize(largest);
         EXPECT_EQ(proxy->transact(0, request, &reply, flags), android::OK);
-        request.resizeForOverwrite(largest + 4);
+        request.resize(largest + 4);
         EXPECT_EQ(proxy->transact(0, request, &reply, flags), android::FAILED_TRANSACTION);
     }
 }
