@@ -1,15 +1,14 @@
 #include "common.h"
 
-#include <dirent.h>
-#include <fcntl.h>
-#include <limits.h>
 #include <sys/system_properties.h>
-#include <unistd.h>
 
 #include <cstdlib>
+#include <filesystem>
 
 #include "platform/device_root.h"
 #include "platform/files.h"
+
+namespace fs = std::filesystem;
 
 namespace device {
 
@@ -32,36 +31,28 @@ bool IsDaemonEnabled() {
     return enable == "1" || enable == "true";
 }
 
-std::string SelinuxMode() {
-    char mode[32];
-    const ssize_t length = host::ReadFile("selinux", mode, sizeof(mode));
-    if (length < 0) {
-        return "Enforcing";
-    }
-    const std::string text(mode, static_cast<size_t>(length));
-    return text.substr(0, text.find('\n'));
+std::string ReadText(const std::string& path, const std::string& missing) {
+    constexpr size_t kMaxArgumentBytes = 131072;
+    std::string text(kMaxArgumentBytes, '\0');
+    const ssize_t length = host::ReadFile(path, text.data(), text.size());
+    return length < 0 ? missing : text.substr(0, static_cast<size_t>(length));
 }
+
+std::string SelinuxMode() { return ReadText("selinux", "Enforcing"); }
 
 std::set<std::string> FilesIn(const std::string& folder) {
     std::set<std::string> names;
-    DIR* const files = fdopendir(openat(host::DeviceRoot(), folder.c_str(),
-                                        O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-    while (const dirent* const file = files != nullptr ? readdir(files) : nullptr) {
-        names.insert(file->d_name);
+    std::error_code error;
+    fs::directory_iterator file(fs::path(host::DeviceRootPath()) / folder, error);
+    for (; file != fs::directory_iterator(); file.increment(error)) {
+        names.insert(file->path().filename());
     }
-    if (files != nullptr) {
-        closedir(files);
-    }
-    names.erase(".");
-    names.erase("..");
     return names;
 }
 
 std::string PathBesideProgram(const std::string& name) {
-    char path[PATH_MAX];
-    const ssize_t length = readlink("/proc/self/exe", path, sizeof(path));
-    const std::string self(path, length > 0 ? static_cast<size_t>(length) : 0);
-    return self.substr(0, self.rfind('/') + 1) + name;
+    std::error_code error;
+    return fs::read_symlink("/proc/self/exe", error).replace_filename(name);
 }
 
 }  // namespace device

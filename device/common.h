@@ -12,6 +12,7 @@ constexpr char kInitLock[] = "init.lock";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
+constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 
 // The property's value; empty when it is not set.
 std::string GetProperty(const char* key);
@@ -24,6 +25,10 @@ bool IsDaemonAlive();
 
 // Whether init is to keep the daemon running.
 bool IsDaemonEnabled();
+
+// The content of a file of the device root, which is not larger than an argument of a program can
+// be; `missing` when it cannot be read.
+std::string ReadText(const std::string& path, const std::string& missing);
 
 // What `getenforce` prints: Enforcing, Permissive or Disabled.
 std::string SelinuxMode();
