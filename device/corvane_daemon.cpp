@@ -101,13 +101,6 @@ std::string Answer(const std::string& command, const std::string& params) {
     abort();
 }
 
-void DieAfterReply() {
-    std::thread([] {
-        std::this_thread::sleep_for(kDieAfterReplyDelay);
-        Die();
-    }).detach();
-}
-
 // The fault that a call of this command has, counted down.
 const Fault* TakeFault(const std::string& command) {
     static std::mutex counting;
@@ -116,8 +109,7 @@ const Fault* TakeFault(const std::string& command) {
     if (fault == nullptr || (fault == &device::kRestart && command != "captest")) {
         return &device::kNoFault;
     }
-    const std::string count = GetProperty("sim.fault_count");
-    if (!count.empty()) {
+    if (const std::string count = GetProperty("sim.fault_count"); !count.empty()) {
         const int64_t left = strtoll(count.c_str(), nullptr, 10);
         if (left <= 0) {
             return &device::kNoFault;
@@ -168,7 +160,10 @@ class DaemonService : public android::BBinder {
             Die();
         }
         if (fault == &device::kDieAfter || fault == &device::kRestart) {
-            DieAfterReply();
+            std::thread([] {
+                std::this_thread::sleep_for(kDieAfterReplyDelay);
+                Die();
+            }).detach();
         } else if (fault == &device::kHang) {
             std::this_thread::sleep_for(milliseconds(argument));
         } else if (fault == &device::kStatus) {

@@ -78,8 +78,8 @@ def is_at_rest(events):
     """Whether nothing happens any more and no daemon is on its way up"""
     life = [event["what"] for event in events
             if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")]
-    return (not (life and life[-1] in ("restart_pause", "daemon_start"))
-            and time.monotonic() - max(event["time"] for event in events) > QUIET_S)
+    return (life[-1:] not in (["restart_pause"], ["daemon_start"])
+            and time.monotonic() - events[-1]["time"] > QUIET_S)
 
 
 def record(arguments):
@@ -130,14 +130,12 @@ def main():
         TRACE.unlink(missing_ok=True)
     signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     if options.json:
-        for event in events:
-            print(json.dumps(event))
-        return
-    if options.mermaid:
+        print(*map(json.dumps, events), sep="\n")
+    elif options.mermaid:
         print_diagram(events)
-        return
-    print_timeline(events, start, options.bytes)
-    print("result:", result, end="")
+    else:
+        print_timeline(events, start, options.bytes)
+        print("result:", result, end="")
 
 
 if __name__ == "__main__":
