@@ -47,10 +47,9 @@ inline bool IsDaemonEnabled() {
 // The content of a file of the device root; `missing` when it cannot be read. No file is larger
 // than an argument of a program can be.
 inline std::string ReadText(const std::string& path, const char* missing) {
-    constexpr size_t kMaxArgumentBytes = 131072;
-    std::string text(kMaxArgumentBytes, '\0');
-    const ssize_t length = host::ReadFile(path, text.data(), text.size());
-    return length < 0 ? missing : text.substr(0, static_cast<size_t>(length));
+    char text[131072];
+    const ssize_t length = host::ReadFile(path, text, sizeof(text));
+    return length < 0 ? missing : std::string(text, static_cast<size_t>(length));
 }
 
 // What `getenforce` prints: Enforcing, Permissive or Disabled.

@@ -18,7 +18,7 @@ inline constexpr Fault kNoFault = {"none", "behaves"};
 inline constexpr Fault kDieBefore = {"die_before", "dies before it works on the command"};
 inline constexpr Fault kDieDuring = {"die_during", "works, then dies before it replies"};
 inline constexpr Fault kDieAfter = {"die_after", "replies, then dies"};
-inline constexpr Fault kRestart = {"captest_restart", "die_after, for captest only"};
+inline constexpr Fault kRestart = {"captest_restart", "replies, then dies, for captest only"};
 inline constexpr Fault kHang = {"hang", "replies late", "MILLISECONDS", 0, 1'000'000'000};
 inline constexpr Fault kStatus = {"status", "replies with a status", "STATUS", INT32_MIN,
                                   INT32_MAX};

@@ -58,13 +58,14 @@ void Remove(const std::string& path) {
 }
 
 // Whether a boot, which removes files, destroys nothing of anybody else's: the folder was booted
-// before, or has only what the tool and the device's commands make, who leave nothing in tmp.
+// before, or has only what the tool and the device's commands make. These leave nothing in tmp and
+// no log without properties.
 bool IsDeviceRoot() {
     const std::set<std::string> files = device::FilesIn(".");
     const std::set<std::string> own = {"dev",     "log",      "proc", "properties",
                                        "selinux", "settings", "tmp",  "trace"};
     return files.count(device::kInitLock) > 0 ||
-           (device::FilesIn("tmp").empty() &&
+           (device::FilesIn("tmp").empty() && files.count("log") <= files.count("properties") &&
             std::includes(own.begin(), own.end(), files.begin(), files.end()));
 }
 
@@ -104,9 +105,9 @@ bool TakeWrites(int watch) {
     for (ssize_t at = 0; at < size;) {
         const auto* const event = reinterpret_cast<const inotify_event*>(events + at);
         at += static_cast<ssize_t>(sizeof(inotify_event) + event->len);
-        isWritten |= (event->mask & IN_Q_OVERFLOW) != 0 ||
-                     strcmp(event->name, device::kServiceEnableKey) == 0 ||
-                     strcmp(event->name, device::kUpdatingFirmwareKey) == 0;
+        const std::string name = event->len > 0 ? event->name : "";
+        isWritten |= (event->mask & IN_Q_OVERFLOW) != 0 || name == device::kServiceEnableKey ||
+                     name == device::kUpdatingFirmwareKey;
     }
     return isWritten;
 }
