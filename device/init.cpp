@@ -114,8 +114,8 @@ bool TakeWrites(int watch) {
 
 class DaemonMinder {
   public:
-    // After a write: each but the last may have been overtaken by the next, so "1" for a running
-    // daemon means that a "0" was. What is written until the daemon has ended is followed with it.
+    // Follows a write. Of several quick writes only the last value can be read: "1" for a running
+    // daemon means that "0" came before it. Writes until the daemon has ended are followed at once.
     void Restart(int watch) {
         Stop();
         TakeWrites(watch);
@@ -194,7 +194,7 @@ class DaemonMinder {
 
     pid_t mDaemon = -1;
     bool mIsEnabled = false;
-    int mPauseMs = 0;  // that the daemon waits before it runs
+    int mPauseMs = 0;  // before the next daemon runs; its process waits
 };
 
 // Signal handling, descriptors, session and folder as they are for no caller in particular.
