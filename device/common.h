@@ -1,9 +1,16 @@
 // What the programs of the virtual device share.
 #pragma once
 
+#include <sys/system_properties.h>
+
 #include <cstdint>
+#include <cstdlib>
+#include <filesystem>
 #include <set>
 #include <string>
+
+#include "platform/device_root.h"
+#include "platform/files.h"
 
 namespace device {
 
@@ -12,26 +19,57 @@ constexpr char kInitLock[] = "init.lock";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
+constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 
 // The property's value; empty when it is not set.
-std::string GetProperty(const char* key);
+inline std::string GetProperty(const char* key) {
+    char value[PROP_VALUE_MAX];
+    __system_property_get(key, value);
+    return value;
+}
 
 // The property's value as a decimal number; 0 when it is none.
-int64_t GetPropertyNumber(const char* key);
+inline int64_t GetPropertyNumber(const char* key) {
+    return strtoll(GetProperty(key).c_str(), nullptr, 10);
+}
 
 // Whether the daemon says that it lives and that its service is published.
-bool IsDaemonAlive();
+inline bool IsDaemonAlive() {
+    return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";
+}
 
 // Whether init is to keep the daemon running.
-bool IsDaemonEnabled();
+inline bool IsDaemonEnabled() {
+    const std::string enable = GetProperty(kServiceEnableKey);
+    return enable == "1" || enable == "true";
+}
+
+// The content of a file of the device root; `missing` when it cannot be read. No file is larger
+// than an argument of a program can be.
+inline std::string ReadText(const std::string& path, const char* missing) {
+    char text[131072];
+    const ssize_t length = host::ReadFile(path, text, sizeof(text));
+    return length < 0 ? missing : std::string(text, static_cast<size_t>(length));
+}
 
 // What `getenforce` prints: Enforcing, Permissive or Disabled.
-std::string SelinuxMode();
+inline std::string SelinuxMode() { return ReadText("selinux", "Enforcing"); }
 
 // The names in a folder of the device root, sorted. Empty when there is no such folder.
-std::set<std::string> FilesIn(const std::string& folder);
+inline std::set<std::string> FilesIn(const std::string& folder) {
+    std::set<std::string> names;
+    std::error_code error;
+    std::filesystem::directory_iterator file(host::DeviceRootPath() + "/" + folder, error);
+    for (; file != std::filesystem::directory_iterator(); file.increment(error)) {
+        names.insert(file->path().filename());
+    }
+    return names;
+}
 
 // The path of a file in the folder of the program that runs, links to which are resolved.
-std::string PathBesideProgram(const std::string& name);
+inline std::string PathBesideProgram(const char* name) {
+    std::error_code error;
+    return std::filesystem::read_symlink("/proc/self/exe", error).replace_filename(name);
+}
 
 }  // namespace device

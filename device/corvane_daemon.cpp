@@ -2,16 +2,19 @@
 // misbehaves on request. Its faults are properties, read for every call:
 //
 //   sim.boot_delay_ms  time it takes to come up
-//   sim.updating_fw    "true": it updates its firmware and publishes nothing until that changes
+//   sim.updating_fw    "true": it updates its firmware, until init restarts it for a new value
 //   sim.fault          the name of a fault; anything else is none
 //   sim.fault_arg      the fault's argument
 //   sim.fault_count    how many more calls have the fault; unset: all of them
 #include <android/log.h>
 #include <sys/system_properties.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
 #include <csignal>
 #include <cstdlib>
+#include <cstring>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -22,53 +25,94 @@
 #include <binder/Parcel.h>
 #include <binder/ProcessState.h>
 
-#include "answers.h"
 #include "common.h"
 #include "faults.h"
 #include "platform/trace.h"
 
 namespace {
 
-using device::FaultKind;
+using device::Fault;
 using device::GetProperty;
 using device::GetPropertyNumber;
 using std::chrono::milliseconds;
 
-constexpr char kDriver[] = "/dev/vndbinder";
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr uint32_t kExecuteCommandCode = 0;
-constexpr milliseconds kFirmwarePollPause(20);
 // Long enough for a reply to be on its way, far too short for anything else.
 constexpr milliseconds kDieAfterReplyDelay(2);
+// The names of a phone's commands, each between spaces.
+constexpr char kCommands[] = " " TPD_DAEMON_COMMANDS " ";
 
 const android::StaticString16 kDescriptor(
         u"android.CorvaneInterfaceServer.ICorvaneInterfaceService");
+
+std::string GetOrUnset(const char* key) {
+    const std::string value = GetProperty(key);
+    return value.empty() ? "unset" : value;
+}
+
+std::string Help() {
+    std::string commands = kCommands;
+    std::replace(commands.begin(), commands.end(), ' ', '\n');
+    return "corvane_daemon commands:" + commands +
+           "THP_GetScreenState (virtual device only)\n"
+           "THP_GetStatus (virtual device only)\n"
+           "THP_GetVersion (virtual device only)";
+}
+
+// What the daemon answers to a command. The commands that act have nothing to tell.
+std::string Answer(const std::string& command, const std::string& params) {
+    if (command == "help") {
+        return Help();
+    }
+    if (command == "captest") {
+        return "captest " + (params.empty() ? "idle_test" : params) + ": PASS";
+    }
+    if (command == "TSA_ExecuteCommand") {
+        // The parameters are a command of their own: its name, then a space and its parameters.
+        const size_t space = std::min(params.find(' '), params.length());
+        const std::string name = params.substr(0, space);
+        return name.empty() || name == command
+                       ? command + ": which command?"
+                       : Answer(name, space < params.length() ? params.substr(space + 1) : "");
+    }
+    if (command == "THP_GetScreenState") {
+        return "screen state: " + GetOrUnset("odm.thp.screen_status");
+    }
+    if (command == "THP_GetStatus") {
+        return "thplog: " + GetOrUnset("persist.odm.thp.thplog_enabled") +
+               "\nafelog: " + GetOrUnset("odm.thp.debug.afelog") +
+               "\nraw data: " + GetOrUnset("thp.debug.raw") +
+               "\nrestarts: " + GetOrUnset("odm.thp.dae_reboot_times");
+    }
+    if (command == "THP_GetVersion") {
+        return "corvane_daemon of " + GetOrUnset("ro.build.display.id") + ", firmware " +
+               GetOrUnset("odm.thp.ver_firmware");
+    }
+    const bool isName = !command.empty() && command.find(' ') == std::string::npos;
+    if (isName && strstr(kCommands, (" " + command + " ").c_str()) != nullptr) {
+        return command + ": done" + (params.empty() ? "" : " (" + params + ")");
+    }
+    return "unknown command: " + command;
+}
 
 [[noreturn]] void Die() {
     raise(SIGKILL);
     abort();
 }
 
-void DieAfterReply() {
-    std::thread([] {
-        std::this_thread::sleep_for(kDieAfterReplyDelay);
-        Die();
-    }).detach();
-}
-
-// The fault that a call of this command has, counted down; null when it has none.
-const device::Fault* TakeFault(const std::string& command) {
+// The fault that a call of this command has, counted down.
+const Fault* TakeFault(const std::string& command) {
     static std::mutex counting;
     const std::lock_guard<std::mutex> lock(counting);
-    const device::Fault* const fault = device::FindFault(GetProperty("sim.fault"));
-    if (fault == nullptr || (fault->kind == FaultKind::kRestart && command != "captest")) {
-        return nullptr;
+    const Fault* const fault = device::FindFault(GetProperty("sim.fault"));
+    if (fault == nullptr || (fault == &device::kRestart && command != "captest")) {
+        return &device::kNoFault;
     }
-    const std::string count = GetProperty("sim.fault_count");
-    if (!count.empty()) {
+    if (const std::string count = GetProperty("sim.fault_count"); !count.empty()) {
         const int64_t left = strtoll(count.c_str(), nullptr, 10);
         if (left <= 0) {
-            return nullptr;
+            return &device::kNoFault;
         }
         __system_property_set("sim.fault_count", std::to_string(left - 1).c_str());
     }
@@ -105,55 +149,43 @@ class DaemonService : public android::BBinder {
   private:
     static android::status_t Execute(const std::string& command, const std::string& params,
                                      android::Parcel* reply) {
-        const device::Fault* const fault = TakeFault(command);
-        if (fault == nullptr) {
-            return reply->writeCString(device::Answer(command, params).c_str());
-        }
-        const int64_t argument = GetPropertyNumber("sim.fault_arg");
-        if (fault->kind == FaultKind::kDieBefore) {
+        const Fault* const fault = TakeFault(command);
+        const int64_t argument =
+                fault->argument != nullptr ? GetPropertyNumber("sim.fault_arg") : 0;
+        if (fault == &device::kDieBefore) {
             Die();
         }
-        std::string text = device::Answer(command, params);
-        switch (fault->kind) {
-            case FaultKind::kDieBefore:
-            case FaultKind::kDieDuring:
+        std::string text = Answer(command, params);
+        if (fault == &device::kDieDuring) {
+            Die();
+        }
+        if (fault == &device::kDieAfter || fault == &device::kRestart) {
+            std::thread([] {
+                std::this_thread::sleep_for(kDieAfterReplyDelay);
                 Die();
-            case FaultKind::kDieAfter:
-            case FaultKind::kRestart:
-                DieAfterReply();
-                break;
-            case FaultKind::kHang:
-                std::this_thread::sleep_for(milliseconds(argument));
-                break;
-            case FaultKind::kStatus:
-                return static_cast<android::status_t>(argument);
-            case FaultKind::kNoText:
-                return android::OK;
-            case FaultKind::kHuge:
-                text.assign(static_cast<size_t>(argument > 0 ? argument : 0), '#');
-                break;
+            }).detach();
+        } else if (fault == &device::kHang) {
+            std::this_thread::sleep_for(milliseconds(argument));
+        } else if (fault == &device::kStatus) {
+            return static_cast<android::status_t>(argument);
+        } else if (fault == &device::kNoText) {
+            return android::OK;
+        } else if (fault == &device::kHuge) {
+            text.assign(static_cast<size_t>(std::max(argument, int64_t{0})), '#');
         }
         return reply->writeCString(text.c_str());
     }
 };
 
-// Stays until the update is over, with the firmware flag up.
-void UpdateFirmware() {
-    __system_property_set("odm.thp.is_updating_fw", "true");
-    while (GetProperty("sim.updating_fw") == "true") {
-        std::this_thread::sleep_for(kFirmwarePollPause);
-    }
-    __system_property_set("odm.thp.is_updating_fw", "false");
-}
-
 }  // namespace
 
 int main() {
     std::this_thread::sleep_for(milliseconds(GetPropertyNumber("sim.boot_delay_ms")));
-    if (GetProperty("sim.updating_fw") == "true") {
-        UpdateFirmware();
+    while (GetProperty(device::kUpdatingFirmwareKey) == "true") {
+        __system_property_set("odm.thp.is_updating_fw", "true");
+        pause();
     }
-    android::ProcessState::initWithDriver(kDriver);
+    android::ProcessState::initWithDriver("/dev/vndbinder");
     const android::sp<android::IServiceManager> manager = android::defaultServiceManager();
     if (manager == nullptr ||
         manager->addService(android::String16(kServiceName), new DaemonService) != android::OK) {

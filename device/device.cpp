@@ -4,7 +4,7 @@
 #include <limits.h>
 #include <poll.h>
 #include <sys/file.h>
-#include <sys/stat.h>
+#include <sys/system_properties.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -13,7 +13,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <fstream>
+#include <filesystem>
 #include <functional>
 #include <string>
 #include <thread>
@@ -80,24 +80,12 @@ pid_t FindInit() {
     return isHeld ? holder.l_pid : 0;
 }
 
-// Whether the process runs another file than the one of that name beside this program. Not so for
-// a process that has just ended.
-bool RunsOtherFile(pid_t process, const char* name) {
-    struct stat running = {};
-    struct stat built = {};
-    return stat(("/proc/" + std::to_string(process) + "/exe").c_str(), &running) == 0 &&
-           stat(device::PathBesideProgram(name).c_str(), &built) == 0 &&
-           (running.st_dev != built.st_dev || running.st_ino != built.st_ino);
-}
-
-// Whether init and its daemon, which is init itself for a moment, run what was built last.
+// Whether the process, unless it has just ended, runs the init that was built last.
 bool IsCurrentBuild(pid_t init) {
-    const std::string number = std::to_string(init);
-    std::ifstream children("/proc/" + number + "/task/" + number + "/children");
-    pid_t daemon = init;
-    children >> daemon;
-    return !RunsOtherFile(init, "init") &&
-           (!RunsOtherFile(daemon, "corvane_daemon") || !RunsOtherFile(daemon, "init"));
+    std::error_code error;
+    const std::string exe = "/proc/" + std::to_string(init) + "/exe";
+    const std::filesystem::path program = std::filesystem::read_symlink(exe, error);
+    return error || program == device::PathBesideProgram("init");
 }
 
 // Asks init to end, and ends it when it does not. The descriptor stands for this one process even
@@ -128,15 +116,10 @@ int AwaitDaemon() {
     WaitUntil(kStartLimitMs, [] {
         return device::IsDaemonAlive() || !device::IsDaemonEnabled() || FindInit() == 0;
     });
-    if (FindInit() == 0) {
-        return Fail("init has ended");
-    }
-    if (!device::IsDaemonEnabled()) {
-        return Fail("the daemon is stopped; `device shell tpd start` starts it");
-    }
-    return device::IsDaemonAlive()
+    return FindInit() != 0 && device::IsDaemonAlive()
                    ? 0
-                   : Fail("the daemon is not alive; `device shell logcat -d` may say why");
+                   : Fail("the daemon is not alive; `device shell logcat -d` may say why, "
+                          "`device shell tpd start` starts one that was stopped");
 }
 
 // Starts init and waits until it has booted the device. What fails there is said by init.
@@ -146,17 +129,14 @@ int Boot(const char* selinuxMode) {
         return Fail(strerror(errno));
     }
     const std::string program = device::PathBesideProgram("init");
-    const pid_t init = fork();
-    if (init == 0) {
+    if (fork() == 0) {
         dup2(report[1], STDOUT_FILENO);
         execl(program.c_str(), program.c_str(), selinuxMode, nullptr);
         _exit(Fail(program + ": " + strerror(errno)));
     }
     close(report[1]);
-    pollfd booted = {report[0], POLLIN, 0};
     char byte = 0;
-    const bool isBooted =
-            init > 0 && poll(&booted, 1, kStartLimitMs) > 0 && read(report[0], &byte, 1) == 1;
+    const bool isBooted = read(report[0], &byte, 1) == 1;
     close(report[0]);
     if (!isBooted) {
         return Fail("did not start");
@@ -245,8 +225,48 @@ int Trace(int argc, char** argv) {
     return FindInit() != 0 ? BecomeBeside("trace.py", argc, argv) : Fail("is stopped");
 }
 
+bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
+    char* end = nullptr;
+    errno = 0;
+    const int64_t number = strtoll(text.c_str(), &end, 10);
+    return errno == 0 && !text.empty() && *end == '\0' && number >= min && number <= max;
+}
+
+int ListFaults() {
+    for (const device::Fault* const fault : device::kFaults) {
+        printf("%-16s the daemon %s", fault->name, fault->effect);
+        if (fault->argument != nullptr) {
+            printf("; %s: %jd to %jd", fault->argument, intmax_t{fault->min}, intmax_t{fault->max});
+        }
+        puts("");
+    }
+    return 0;
+}
+
 int Fault(int argc, char** argv) {
-    return argc == 0 || FindInit() != 0 ? device::FaultCommand(argc, argv) : Fail("is stopped");
+    if (argc == 0) {
+        return ListFaults();
+    }
+    if (FindInit() == 0) {
+        return Fail("is stopped");
+    }
+    const device::Fault* const fault = device::FindFault(argv[0]);
+    const int arguments = fault != nullptr && fault->argument != nullptr ? 2 : 1;
+    const std::string argument = arguments == 2 && argc > 1 ? argv[1] : "";
+    const std::string count = argc > arguments ? argv[arguments] : "";
+    if (fault == nullptr || argc > arguments + 1 ||
+        (arguments == 2 && !IsNumberWithin(argument, fault->min, fault->max)) ||
+        (argc > arguments && !IsNumberWithin(count, 1, INT32_MAX))) {
+        Fail("no such fault, argument or count; `device fault` lists what there is");
+        return kWrongUse;
+    }
+    // The fault comes last, so that no call meets it with another one's argument.
+    const bool isSet =
+            __system_property_set("sim.fault", "") == 0 &&
+            __system_property_set("sim.fault_arg", argument.c_str()) == 0 &&
+            __system_property_set("sim.fault_count", count.c_str()) == 0 &&
+            (fault == &device::kNoFault || __system_property_set("sim.fault", fault->name) == 0);
+    return isSet ? 0 : Fail("fault: the property is refused");
 }
 
 constexpr struct {

@@ -15,25 +15,19 @@ REST_LIMIT_S = 5
 NAMES = {"tpd": "tool", "corvane_daemon": "daemon"}
 
 
-def shown(text):
-    """The bytes, which the trace holds as one code point each, as readable text"""
-    text = text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace")
-    return "".join(c if c.isprintable() else repr(c)[1:-1] for c in text)
-
-
-# `way`, `size` and `end` are made from other fields.
+# `end`, `found`, `size` and `way` are made from what was recorded.
 DESCRIPTIONS = {
     "property_read": 'reads {name}: "{value}"',
     "property_write": 'writes {name}: "{old}" -> "{new}", status {status}',
     "log": "logs {priority} {tag}: {text}",
     "pause": "pauses {us} us",
     "shell": "runs {command}: {end}",
-    "lookup": "looks {service} up: found {found}, after {us} us",
+    "lookup": "looks up {service}: {found} ({us} us)",
     "link_to_death": "links its death recipient: status {status}",
     "unlink_to_death": "unlinks its death recipient: status {status}",
     "binder_died": "learns that the binder died",
     "call": "calls code {code}, {way}, flags {flags}, {size} bytes",
-    "reply": "has its reply: status {status}, {bytes} bytes, after {us} us",
+    "reply": "has its reply: status {status}, {bytes} bytes ({us} us)",
     "publish": "publishes {service}",
     "command": 'receives {command}, parameters "{params}"',
     "fault": "has the fault {name} {argument}",
@@ -47,15 +41,21 @@ ARROWS = {"call": "tool->>daemon", "reply": "daemon-->>tool", "daemon_start": "i
           "daemon_stop": "init-xdaemon", "daemon_exit": "daemon--xinit"}
 
 
+def shown(text):
+    """The bytes, which the trace holds as one code point each, as readable text"""
+    text = text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace")
+    return "".join(c if c.isprintable() else repr(c)[1:-1] for c in text)
+
+
 def describe(event):
-    fields = {name: shown(value) if isinstance(value, str) else value
-              for name, value in event.items()}
-    ended_by, status = event.get("signal"), event.get("status", 0)
+    fields = {name: shown(str(value)) for name, value in event.items()}
+    signaled, status = event.get("signal"), event.get("status", 0)
     if event["what"] == "shell":  # as wait() tells it
-        ended_by, status = status & 0x7F, status >> 8
-    fields["end"] = f"signal {ended_by}" if ended_by else f"status {status}"
-    fields["way"] = "one-way" if event.get("flags", 0) & 1 else "two-way"
+        signaled, status = status & 0x7F, status >> 8
+    fields["end"] = f"signal {signaled}" if signaled else f"status {status}"
+    fields["found"] = "found" if event.get("found") else "not found"
     fields["size"] = len(event.get("request", "")) // 2
+    fields["way"] = "one-way" if event.get("flags", 0) & 1 else "two-way"
     return DESCRIPTIONS.get(event["what"], event["what"]).format_map(fields)
 
 
@@ -78,8 +78,8 @@ def is_at_rest(events):
     """Whether nothing happens any more and no daemon is on its way up"""
     life = [event["what"] for event in events
             if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")]
-    return (not (life and life[-1] in ("restart_pause", "daemon_start"))
-            and time.monotonic() - max(event["time"] for event in events) > QUIET_S)
+    return (life[-1:] not in (["restart_pause"], ["daemon_start"])
+            and time.monotonic() - events[-1]["time"] > QUIET_S)
 
 
 def record(arguments):
@@ -130,14 +130,12 @@ def main():
         TRACE.unlink(missing_ok=True)
     signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     if options.json:
-        for event in events:
-            print(json.dumps(event))
-        return
-    if options.mermaid:
+        print(*map(json.dumps, events), sep="\n")
+    elif options.mermaid:
         print_diagram(events)
-        return
-    print_timeline(events, start, options.bytes)
-    print("result:", result, end="")
+    else:
+        print_timeline(events, start, options.bytes)
+        print("result:", result, end="")
 
 
 if __name__ == "__main__":

@@ -23,7 +23,7 @@ def test_shows_who_did_what(trace):
         trace("captest"),
         "tool runs getenforce",
         'tool writes odm.thp.debug.selinux.permissive: "null" -> "true"',
-        "tool looks service.corvaneinterfaceservice up",
+        "tool looks up service.corvaneinterfaceservice: found",
         "tool calls code 0",
         "daemon receives captest",
         "daemon answers",
