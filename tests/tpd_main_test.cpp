@@ -1,5 +1,6 @@
 #include "main/TpdMain.h"
 
+#include "daemon/TpdCmd.h"
 #include "tests/unit_test.h"
 
 int tpd_main(int argc, char** argv);
@@ -66,32 +67,49 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
     const Call disableAfeLog = Write("odm.thp.debug.afelog", "false");
     const struct {
         const char* command;
+        const char* confirmation;
         std::vector<Call> calls;
     } kRows[] = {
-            {"start", {kSetBootFlag, kStart}},
-            {"stop", {kStop}},
-            {"reboot", {kStop, kSetBootFlag, kStart}},
-            {"log_enable", {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart}},
-            {"log_disable", {Write("persist.sys.zelmor.debug.on", "false")}},
-            {"debugRawEnable", {Write("thp.debug.raw", "true")}},
-            {"debugDifEnable", {Write("thp.debug.raw", "false")}},
-            {"log_afe_enable", {enableAfeLog, kStop, kSetBootFlag, kStart}},
-            {"log_afe_disable", {disableAfeLog, kStop, kSetBootFlag, kStart}},
+            {"start", "start corvane_daemon done\n", {kSetBootFlag, kStart}},
+            {"stop", "stop corvane_daemon done\n", {kStop}},
+            {"reboot", "reboot corvane_daemon done\n", {kStop, kSetBootFlag, kStart}},
+            {"log_enable",
+             "enable thplog\n",
+             {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart}},
+            {"log_disable", "disable thplog\n", {Write("persist.sys.zelmor.debug.on", "false")}},
+            {"debugRawEnable", "set thp.debug.raw as 1\n", {Write("thp.debug.raw", "true")}},
+            {"debugDifEnable", "set thp.debug.raw as 0\n", {Write("thp.debug.raw", "false")}},
+            {"log_afe_enable", "enable afehal log\n", {enableAfeLog, kStop, kSetBootFlag, kStart}},
+            {"log_afe_disable",
+             "disable afehal log\n",
+             {disableAfeLog, kStop, kSetBootFlag, kStart}},
             {"showtouch",
+             "show touch done\n",
              {Shell("settings put system show_touches 1"),
               Shell("settings put system pointer_location 1")}},
             {"showtouch_close",
+             "close touch show done\n",
              {Shell("settings put system show_touches 0"),
               Shell("settings put system pointer_location 0")}},
     };
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.command);
         FakeDevice device;
-        EXPECT_EQ(RunTool({"tpd", row.command}), "\n");
-        EXPECT_THAT(device.calls({kWrite, kShell, kGetService}), ElementsAreArray(row.calls));
-        EXPECT_EQ(device.calls({kLog})[2],
-                  Log(INFO, std::string("ExcuteTpdCmd[145] Get cmd. ") + row.command + "\n"));
+        g_tpdCmd = new TpdCmd;
+        for (const auto addCommands : {AddBasicTpdCmds, AddThplogTpdCmds, AddRawTpdCmds,
+                                       AddAfelogTpdCmds, AddShowtouchTpdCmds}) {
+            addCommands();
+        }
+        EXPECT_EQ(gTpdCmds[row.command].handler(""), row.confirmation);
+        EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(row.calls));
     }
+}
+
+TEST(TpdMainTest, PrintsAnEmptyLineForALocalCommand) {
+    FakeDevice device;
+    EXPECT_EQ(RunTool({"tpd", "stop"}), "\n");
+    EXPECT_THAT(device.calls({kWrite, kGetService}), ElementsAre(kStop));
+    EXPECT_EQ(device.calls({kLog})[2], Log(INFO, "ExcuteTpdCmd[145] Get cmd. stop\n"));
 }
 
 TEST(TpdMainTest, DisablesDebuggingBeforeTheThplog) {
