@@ -97,7 +97,7 @@ TEST_F(PropertyTest, AccessorsUseTheirOwnProperty) {
             {"ro.logsystem.usertype", "", [](Property& p) { p.GetUserType(number); }},
     };
     for (const auto& row : kRows) {
-        SCOPED_TRACE(row.key);
+        SCOPED_TRACE(std::string(row.key) + ", row " + std::to_string(&row - kRows));
         device.properties.clear();
         row.access(property);
         EXPECT_THAT(device.properties, ElementsAre(Pair(row.key, row.value)));
