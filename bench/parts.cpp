@@ -1,0 +1,146 @@
+// The tool's parts inside one process, each beside a baseline that does the same work directly.
+// Wants an empty device root, and one processor for itself and its service's thread: where the
+// scheduler puts the two is not what is measured.
+#include <benchmark/benchmark.h>
+
+#include <android/log.h>
+#include <binder/Binder.h>
+#include <binder/Parcel.h>
+#include <fcntl.h>
+#include <sys/socket.h>
+#include <sys/system_properties.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <string>
+#include <vector>
+
+#include "binder/ICorvaneInterfaceClient.h"
+#include "binder/corvane_sys_binder_client.h"
+#include "log/Log.h"
+#include "platform/device_root.h"
+#include "platform/vndbinder.h"
+#include "platform/vndbinder_wire.h"
+#include "property/Property.h"
+
+namespace {
+
+using benchmark::DoNotOptimize;
+using benchmark::State;
+
+constexpr char kDriver[] = "/dev/vndbinder";
+constexpr char kServiceName[] = "service.corvaneinterfaceservice";
+constexpr char kKey[] = "odm.thp.dae_alive";
+constexpr int kLargestReply =
+        host::kMaxTransactionBytes - 4;  // bytes; the rest is terminator and padding
+
+// The daemon: its answer has as many bytes as the command says.
+class Service : public android::BBinder {
+    android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
+                                 android::Parcel* reply, uint32_t /* flags */) override {
+        data.enforceInterface(ICorvaneInterfaceClient::descriptor);
+        mText.resize(strtoul(data.readCString(), nullptr, 10), '#');
+        return reply->writeCString(mText.c_str());
+    }
+
+    std::string mText;
+};
+
+// What a look at a property costs at least.
+void ReadBaseline(State& state) {
+    char value[PROP_VALUE_MAX];
+    for (auto _ : state) {
+        const int file = openat(host::DeviceRoot(), "properties/odm.thp.dae_alive",
+                                O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
+        DoNotOptimize(read(file, value, PROP_VALUE_MAX - 1));
+        close(file);
+    }
+}
+BENCHMARK(ReadBaseline)->Name("Get/baseline");
+BENCHMARK(ReadBaseline)->Name("Set, no change/baseline");
+
+void GetTpd(State& state) {
+    Property property;
+    std::string value;
+    for (auto _ : state) {
+        DoNotOptimize(property.Get(kKey, value, "false"));
+    }
+}
+BENCHMARK(GetTpd)->Name("Get/tpd");
+
+void SetSameTpd(State& state) {
+    Property property;
+    for (auto _ : state) {
+        property.Set(kKey, "true");
+    }
+}
+BENCHMARK(SetSameTpd)->Name("Set, no change/tpd");
+
+// With the time of the service's thread.
+void EachReply(benchmark::internal::Benchmark* run) {
+    run->MeasureProcessCPUTime()->Arg(16)->Arg(4096)->Arg(kLargestReply);
+}
+
+void RunTpd(State& state) {
+    const std::string command = kTwoWayMarker + std::to_string(state.range(0));
+    for (auto _ : state) {
+        DoNotOptimize(RunCmdParms(command, ""));
+    }
+}
+BENCHMARK(RunTpd)->Name("RunCmdParms/tpd")->Apply(EachReply);
+
+// The socket's own cost: the same bytes there and back, into one buffer.
+void RunBaseline(State& state) {
+    android::Parcel request;
+    request.writeInterfaceToken(ICorvaneInterfaceClient::descriptor);
+    request.writeCString(std::to_string(state.range(0)).c_str());
+    request.writeInt32(0);
+    const host::RequestHeader header = {0, 0x10, static_cast<uint32_t>(request.dataSize())};
+    host::ReplyHeader reply = {};
+    std::vector<char> buffer(host::kMaxTransactionBytes);
+    sockaddr_un address;
+    const int connection = host::NewSocket(kDriver, kServiceName, address);
+    connect(connection, reinterpret_cast<sockaddr*>(&address), sizeof(address));
+    for (auto _ : state) {
+        host::SendMessage(connection, &header, sizeof(header), request);
+        host::Receive(connection, &reply, sizeof(reply));
+        host::Receive(connection, buffer.data(), reply.size);
+    }
+    close(connection);
+    if (reply.size <= state.range(0)) {
+        state.SkipWithError("no reply");
+    }
+}
+BENCHMARK(RunBaseline)->Name("RunCmdParms/baseline")->Apply(EachReply);
+
+void PrintfTpd(State& state) {
+    for (auto _ : state) {
+        gSysLog.Printf(LOG_INFO, "std::string TpdClient::RunCmd(const char*, const char*)", 120,
+                       "%s %d", "failed", 7);
+    }
+}
+BENCHMARK(PrintfTpd)->Name("Printf, written/tpd");
+
+void PrintfBaseline(State& state) {
+    for (auto _ : state) {
+        __android_log_print(ANDROID_LOG_INFO, "corvane_daemon", "%s[%d] %s %d", "TpdClient::RunCmd",
+                            120, "failed", 7);
+    }
+}
+BENCHMARK(PrintfBaseline)->Name("Printf, written/baseline");
+
+void PrintfFiltered(State& state) {
+    for (auto _ : state) {
+        gSysLog.Printf(LOG_DEBUG, "RunCmd", 120, "failed");
+    }
+}
+BENCHMARK(PrintfFiltered)->Name("Printf, filtered/tpd");
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    host::PublishService(kDriver, kServiceName, new Service);
+    __system_property_set(kKey, "true");
+    benchmark::Initialize(&argc, argv);
+    return benchmark::RunSpecifiedBenchmarks() > 0 ? 0 : 1;
+}

@@ -1,0 +1,70 @@
+"""scripts/device trace: what it shows of a command"""
+import json
+import re
+
+import pytest
+
+from virtual_device import PASS, TIMEOUT
+
+
+@pytest.fixture
+def trace(stopped_device):
+    """Traces a command on a running device that nobody watches, and returns what is shown."""
+    stopped_device.output("device", "start", "--permissive")
+    return lambda *arguments: stopped_device.output("device", "trace", *arguments)
+
+
+def assert_in_order(shown, *parts):
+    assert re.search(".*".join(map(re.escape, parts)), shown, re.S), shown
+
+
+def test_shows_who_did_what(trace):
+    assert_in_order(
+        trace("captest"),
+        "tool runs getenforce",
+        'tool writes odm.thp.debug.selinux.permissive: "null" -> "true"',
+        "tool looks service.corvaneinterfaceservice up",
+        "tool calls code 0",
+        "daemon receives captest",
+        "daemon answers",
+        "tool has its reply",
+        f"result: {PASS}",
+    )
+
+
+def test_follows_the_daemon_through_its_death(trace, stopped_device):
+    stopped_device.output("device", "fault", "die_during", "1")
+    assert_in_order(
+        trace("captest"),
+        "daemon has the fault die_during",
+        "init sees the daemon end",
+        "init starts the daemon",
+        "daemon publishes",
+        f"result: {PASS}",
+    )
+
+
+def test_waits_for_the_daemon_to_be_back(trace, stopped_device):
+    stopped_device.output("device", "fault", "die_during")
+    assert f"result: {TIMEOUT}" in trace("captest")
+    assert stopped_device.is_up()
+
+
+def test_shows_the_bytes_of_the_request(trace):
+    assert "00000080: 6361 7074 6573 7400 0000 0000" in trace("--bytes", "captest")
+
+
+def test_prints_the_events_as_they_were_recorded(trace):
+    events = [json.loads(line) for line in trace("--json", "captest").splitlines()]
+    calls = [event for event in events if event["what"] == "call"]
+    assert [(call["who"], call["code"]) for call in calls] == [("tpd", 0)]
+
+
+def test_draws_a_sequence_diagram(trace):
+    assert_in_order(trace("--mermaid", "captest"), "sequenceDiagram\n", "tool->>", "daemon-->>")
+
+
+def test_refuses_a_second_watcher(device):
+    done = device.run("device", "trace", "captest")
+    assert (done.returncode, done.stdout) == (1, "")
+    assert "trace" in done.stderr
