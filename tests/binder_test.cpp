@@ -130,7 +130,7 @@ TEST_F(BinderTest, StoresAScreenStateBeforeTheLookup) {
 }
 
 TEST_F(BinderTest, GivesUpAScreenStateAfterSixRejectedWrites) {
-    device.readOnly = {"odm.thp.screen_status"};
+    device.rejectedWrites = {"odm.thp.screen_status"};
     StoreScreenState("version:3+main");
     EXPECT_THAT(device.calls({kRead, kWrite}), SizeIs(12));
     EXPECT_EQ(device.calls().back(), Pause(100us));

@@ -157,7 +157,7 @@ int __system_property_get(const char* name, char* value) {
 
 int __system_property_set(const char* name, const char* value) {
     gDevice->Record(test::Write(name, value));
-    if (gDevice->readOnly.count(name) != 0 || strlen(value) >= PROP_VALUE_MAX) {
+    if (gDevice->rejectedWrites.count(name) != 0 || strlen(value) >= PROP_VALUE_MAX) {
         return -1;
     }
     gDevice->properties[name] = value;

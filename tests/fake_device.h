@@ -90,7 +90,7 @@ class FakeDevice {
     std::map<std::string, std::string> properties = {{"odm.thp.dae_alive", "true"},
                                                      {"odm.thp.binder", "1"}};
     std::map<std::string, DelayedValue> delayedValues;
-    std::set<std::string> readOnly;                     // writes to these properties are rejected
+    std::set<std::string> rejectedWrites;               // writes to these properties are rejected
     std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
     int getenforceStatus = 0;                               // what closing its output returns

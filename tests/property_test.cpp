@@ -46,7 +46,7 @@ TEST_F(PropertyTest, WritesOnlyAnotherValue) {
 }
 
 TEST_F(PropertyTest, GivesUpAfterSixRejectedWrites) {
-    device.readOnly = {"k"};
+    device.rejectedWrites = {"k"};
     property.Set("k", "v");
     EXPECT_THAT(device.calls({kRead, kWrite}), SizeIs(12));
     EXPECT_EQ(device.calls({kLog}).back(), Log(ERROR, "retry:1, i = 5, k, [new]v, [old]"));

@@ -87,7 +87,7 @@ TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerTellsAFailure) {
 }
 
 TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
-    device.readOnly = {"odm.thp.service_enable"};
+    device.rejectedWrites = {"odm.thp.service_enable"};
     for (const std::string enabled : {"0", "1"}) {
         device.properties["odm.thp.service_enable"] = enabled;
         device.lookups = {false, false};
