@@ -14,7 +14,11 @@ class PropertyTest : public DeviceTest {
 };
 
 TEST_F(PropertyTest, ReadsAnEmptyPropertyASecondTime) {
-    device.delayedValues["k"] = {2, "y"};
+    device.duringCall = [&](const Call& call) {
+        if (call == Pause(100us)) {
+            device.properties["k"] = "y";
+        }
+    };
     EXPECT_EQ(property.Get("k", value, "default"), 1);
     EXPECT_EQ(value, "y");
     EXPECT_THAT(device.calls(), ElementsAre(Read("k"), Pause(100us), Read("k"),

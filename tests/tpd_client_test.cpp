@@ -38,7 +38,11 @@ TEST_F(TpdClientTest, ChecksALivingDaemonOnceForAllCommands) {
 
 TEST_F(TpdClientTest, WaitsForADaemonThatStarts) {
     device.properties[kBinderKey] = "0";
-    device.delayedValues[kBinderKey] = {4, "1"};
+    device.duringCall = [&](const Call& call) {
+        if (call == Log(INFO, "CheckAlive 2")) {
+            device.properties[kBinderKey] = "1";
+        }
+    };
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 3.thp.dae_alive : 1. thp.binder: 1");
     EXPECT_THAT(device.calls({kLog, kPause}),
                 ElementsAre(Log(INFO, "CheckAlive 0"), Log(INFO, "CheckAlive 1"), Pause(200ms),
@@ -121,10 +125,12 @@ TEST_F(TpdClientTest, JudgesACapacityTestByTheDaemonAfterwards) {
         SCOPED_TRACE(std::string(row.command) + " " + row.parameters);
         StartDaemon();
         device.properties[kRebootTimesKey] = "0";
-        device.answers = {{android::OK, "answer", [&] {
-                               device.properties[kAliveKey] = row.alive;
-                               device.properties[kRebootTimesKey] = row.rebootTimes;
-                           }}};
+        device.duringCall = [&](const Call& call) {
+            if (call.first == kTransact) {
+                device.properties[kAliveKey] = row.alive;
+                device.properties[kRebootTimesKey] = row.rebootTimes;
+            }
+        };
         client.daemonUnavailable = 1;
         EXPECT_EQ(client.RunCmd(row.command, row.parameters), "answer" + row.failure);
         EXPECT_EQ(client.daemonUnavailable, 0);

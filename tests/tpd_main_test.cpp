@@ -29,14 +29,12 @@ TEST(TpdMainTest, ForwardsCommands) {
         Call call;
         const char* help;
     } kRows[] = {
-            {{"tpd"}, Transact(1, kTwoWay, "help"), kHelpText},
-            {{"tpd", "help"}, Transact(1, kTwoWay, "help"), kHelpText},
-            {{"tpd", "help", ""}, Transact(1, kTwoWay, "help"), ""},
-            {{"tpd", "Start"}, Transact(1, kTwoWay, "Start"), ""},
-            {{"tpd", "start", "x"}, Transact(1, kTwoWay, "start", "x"), ""},
-            {{"tpd", "TSA_ExecuteCommand", "a", "b"},
-             Transact(1, kTwoWay, "TSA_ExecuteCommand", "a b"),
-             ""},
+            {{"tpd"}, Transact("help"), kHelpText},
+            {{"tpd", "help"}, Transact("help"), kHelpText},
+            {{"tpd", "help", ""}, Transact("help"), ""},
+            {{"tpd", "Start"}, Transact("Start"), ""},
+            {{"tpd", "start", "x"}, Transact("start, x"), ""},
+            {{"tpd", "TSA_ExecuteCommand", "a", "b"}, Transact("TSA_ExecuteCommand, a b"), ""},
     };
     for (const auto& row : kRows) {
         SCOPED_TRACE(testing::PrintToString(row.arguments));
