@@ -68,8 +68,12 @@ class FakeDevice {
     FakeDevice();
     ~FakeDevice();
 
-    std::map<std::string, std::string> properties = {{"odm.thp.dae_alive", "true"},
-                                                     {"odm.thp.binder", "1"}};
+    std::map<std::string, std::string> properties = {
+            {"odm.thp.dae_alive", "true"},
+            {"odm.thp.binder", "1"},
+            {"odm.thp.dae_reboot_times", "0"},
+            {"odm.thp.is_updating_fw", "false"},
+    };
     std::set<std::string> rejectedWrites;               // writes to these properties are rejected
     std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run

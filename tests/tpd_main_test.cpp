@@ -12,6 +12,14 @@ constexpr char kHelpText[] =
         "debugDifEnable\ndebugRawEnable\nlog_afe_disable\nlog_afe_enable\nlog_disable\n"
         "log_enable\nreboot\nshowtouch\nshowtouch_close\nstart\nstop\n";
 
+Call ShowTouches(const char* value) {
+    return Shell(std::string("settings put system show_touches ") + value);
+}
+
+Call ShowPointer(const char* value) {
+    return Shell(std::string("settings put system pointer_location ") + value);
+}
+
 // What the tool prints when it is called with these arguments.
 std::string RunTool(std::vector<std::string> arguments) {
     std::vector<char*> argv;
@@ -45,24 +53,10 @@ TEST(TpdMainTest, ForwardsCommands) {
     }
 }
 
-TEST(TpdMainTest, IgnoresOtherArguments) {
-    const std::vector<std::string> kRows[] = {
-            {},
-            {"tpd", "TSA_ExecuteCommand", "", "b"},
-            {"tpd", "TSA_ExecuteCommands", "a", "b"},
-            {"tpd", "TSA_ExecuteCommand", "a", "b", "c"},
-    };
-    for (const auto& arguments : kRows) {
-        SCOPED_TRACE(testing::PrintToString(arguments));
-        FakeDevice device;
-        EXPECT_EQ(RunTool(arguments), "\n");
-        EXPECT_THAT(device.calls({kRead}), IsEmpty());
-    }
-}
-
 TEST(TpdMainTest, CarriesOutLocalCommands) {
-    const Call enableAfeLog = Write("odm.thp.debug.afelog", "true");
-    const Call disableAfeLog = Write("odm.thp.debug.afelog", "false");
+    const Call logOn = Write(kThplogKey, "true");
+    const Call afeOn = Write("odm.thp.debug.afelog", "true");
+    const Call afeOff = Write("odm.thp.debug.afelog", "false");
     const struct {
         const char* command;
         const char* confirmation;
@@ -71,24 +65,14 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
             {"start", "start corvane_daemon done\n", {kSetBootFlag, kStart}},
             {"stop", "stop corvane_daemon done\n", {kStop}},
             {"reboot", "reboot corvane_daemon done\n", {kStop, kSetBootFlag, kStart}},
-            {"log_enable",
-             "enable thplog\n",
-             {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart}},
+            {"log_enable", "enable thplog\n", {logOn, kStop, kSetBootFlag, kStart}},
             {"log_disable", "disable thplog\n", {Write("persist.sys.zelmor.debug.on", "false")}},
             {"debugRawEnable", "set thp.debug.raw as 1\n", {Write("thp.debug.raw", "true")}},
             {"debugDifEnable", "set thp.debug.raw as 0\n", {Write("thp.debug.raw", "false")}},
-            {"log_afe_enable", "enable afehal log\n", {enableAfeLog, kStop, kSetBootFlag, kStart}},
-            {"log_afe_disable",
-             "disable afehal log\n",
-             {disableAfeLog, kStop, kSetBootFlag, kStart}},
-            {"showtouch",
-             "show touch done\n",
-             {Shell("settings put system show_touches 1"),
-              Shell("settings put system pointer_location 1")}},
-            {"showtouch_close",
-             "close touch show done\n",
-             {Shell("settings put system show_touches 0"),
-              Shell("settings put system pointer_location 0")}},
+            {"log_afe_enable", "enable afehal log\n", {afeOn, kStop, kSetBootFlag, kStart}},
+            {"log_afe_disable", "disable afehal log\n", {afeOff, kStop, kSetBootFlag, kStart}},
+            {"showtouch", "show touch done\n", {ShowTouches("1"), ShowPointer("1")}},
+            {"showtouch_close", "close touch show done\n", {ShowTouches("0"), ShowPointer("0")}},
     };
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.command);
@@ -108,14 +92,6 @@ TEST(TpdMainTest, PrintsAnEmptyLineForALocalCommand) {
     EXPECT_EQ(RunTool({"tpd", "stop"}), "\n");
     EXPECT_THAT(device.calls({kWrite, kGetService}), ElementsAre(kStop));
     EXPECT_EQ(device.calls({kLog})[2], Log(INFO, "ExcuteTpdCmd[145] Get cmd. stop\n"));
-}
-
-TEST(TpdMainTest, DisablesDebuggingBeforeTheThplog) {
-    FakeDevice device;
-    device.properties[kThplogKey] = "true";
-    RunTool({"tpd", "log_disable"});
-    EXPECT_EQ(device.calls({kWrite}).front(), Write("persist.sys.zelmor.debug.on", "false"));
-    EXPECT_EQ(device.properties[kThplogKey], "false");
 }
 
 TEST(TpdMainTest, LogsAForwardedCommand) {

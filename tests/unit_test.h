@@ -13,7 +13,6 @@ using testing::ElementsAre;
 using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::IsSupersetOf;
-using testing::Not;
 using testing::Pair;
 using testing::SizeIs;
 
