@@ -56,7 +56,7 @@ class FakeService : public IBinder {
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
                          uint32_t flags) override {
         gDevice->Record(LinkToDeath(IsTools(recipient, cookie, flags) ? mNumber : -1));
-        return gDevice->linkStatus;
+        return OK;
     }
 
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie, uint32_t flags,
@@ -112,8 +112,9 @@ std::vector<Call> FakeDevice::calls(const std::set<std::string>& functions) cons
 
 void FakeDevice::Record(const Call& call) {
     mCalls.push_back(call);
-    if (duringCall) {
-        duringCall(call);
+    const auto change = changes.find(call);
+    if (change != changes.end()) {
+        properties[change->second.first] = change->second.second;
     }
 }
 
@@ -160,18 +161,18 @@ extern "C" {
 FILE* __real_fopen(const char* path, const char* mode);
 int __real_clock_gettime(clockid_t clock, timespec* time);
 
-static FILE* OpenText(std::optional<std::string>& text) {
-    return text ? fmemopen(text->data(), text->size(), "r") : nullptr;
-}
-
 FILE* __wrap_fopen(const char* path, const char* mode) {
-    const bool ofDevice = strcmp(path, "/proc/cmdline") == 0;
-    return ofDevice ? OpenText(gDevice->kernelCommandLine) : __real_fopen(path, mode);
+    if (strcmp(path, "/proc/cmdline") != 0) {
+        return __real_fopen(path, mode);
+    }
+    std::string& line = gDevice->kernelCommandLine;
+    return fmemopen(line.data(), line.size(), mode);
 }
 
 FILE* __wrap_popen(const char* command, const char* mode) {
     gDevice->Record(test::Shell(command));
-    return strcmp(mode, "r") == 0 ? OpenText(gDevice->getenforce) : nullptr;
+    std::optional<std::string>& output = gDevice->getenforce;
+    return output ? fmemopen(output->data(), output->size(), mode) : nullptr;
 }
 
 int __wrap_pclose(FILE* stream) {

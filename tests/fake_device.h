@@ -8,7 +8,6 @@
 
 #include <chrono>
 #include <deque>
-#include <functional>
 #include <map>
 #include <optional>
 #include <set>
@@ -74,16 +73,16 @@ class FakeDevice {
             {"odm.thp.dae_reboot_times", "0"},
             {"odm.thp.is_updating_fw", "false"},
     };
-    std::set<std::string> rejectedWrites;               // writes to these properties are rejected
-    std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened
+    std::set<std::string> rejectedWrites;  // writes to these properties are rejected
+    std::string kernelCommandLine;
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
     int getenforceStatus = 0;                               // what closing its output returns
     std::optional<timespec> monotonicClock = timespec{};    // none: it cannot be read
-    int failingAllocation = 0;  // of those that may fail, counted from 1
-    std::deque<bool> lookups;   // whether each finds the service; all later ones do
-    android::status_t linkStatus = android::OK;
+    int failingAllocation = 0;   // of those that may fail, counted from 1
+    std::deque<bool> lookups;    // whether each finds the service; all later ones do
     std::deque<Answer> answers;  // to the calls, in order; all later ones get the default
-    std::function<void(const Call&)> duringCall;  // what else happens, in any of the calls
+    // The property that changes during a call, and its new value.
+    std::map<Call, std::pair<std::string, std::string>> changes;
 
     // The recorded calls of these functions, or of all when none is named.
     std::vector<Call> calls(const std::set<std::string>& functions = {}) const;

@@ -14,11 +14,7 @@ class PropertyTest : public DeviceTest {
 };
 
 TEST_F(PropertyTest, ReadsAnEmptyPropertyASecondTime) {
-    device.duringCall = [&](const Call& call) {
-        if (call == Pause(100us)) {
-            device.properties["k"] = "y";
-        }
-    };
+    device.changes[Pause(100us)] = {"k", "y"};
     EXPECT_EQ(property.Get("k", value, "default"), 1);
     EXPECT_EQ(value, "y");
     EXPECT_THAT(device.calls(), ElementsAre(Read("k"), Pause(100us), Read("k"),
@@ -32,15 +28,6 @@ TEST_F(PropertyTest, StoresTheDefaultOfAnEmptyProperty) {
             device.calls(),
             ElementsAre(Read("k"), Pause(100us), Read("k"), Read("k"), Write("k", "no"),
                         Log(ERROR, "retry:1, i = 0, k, [new]no, [old]"), Pause(100us), Read("k")));
-}
-
-TEST_F(PropertyTest, WritesOnlyAnotherValue) {
-    device.properties["k"] = "old";
-    property.Set("k", "new");
-    property.Set("k", "new");
-    EXPECT_THAT(device.calls(), ElementsAre(Read("k"), Write("k", "new"),
-                                            Log(ERROR, "retry:1, i = 0, k, [new]new, [old]old"),
-                                            Pause(100us), Read("k"), Read("k")));
 }
 
 TEST_F(PropertyTest, GivesUpAfterSixRejectedWrites) {

@@ -31,11 +31,7 @@ TEST_F(TpdClientTest, ChecksALivingDaemonOnceForAllCommands) {
 
 TEST_F(TpdClientTest, WaitsForADaemonThatStarts) {
     device.properties[kBinderKey] = "0";
-    device.duringCall = [&](const Call& call) {
-        if (call == Log(INFO, "CheckAlive 2")) {
-            device.properties[kBinderKey] = "1";
-        }
-    };
+    device.changes[Log(INFO, "CheckAlive 2")] = {kBinderKey, "1"};
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 3.thp.dae_alive : 1. thp.binder: 1");
     EXPECT_THAT(device.calls({kLog, kPause}),
                 ElementsAre(Log(INFO, "CheckAlive 0"), Log(INFO, "CheckAlive 1"), Pause(200ms),
@@ -111,11 +107,7 @@ TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonDied) {
 }
 
 TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonRestarted) {
-    device.duringCall = [&](const Call& call) {
-        if (call.first == kTransact) {
-            device.properties[kRebootTimesKey] = "1";
-        }
-    };
+    device.changes[Transact("captest, running_test")] = {kRebootTimesKey, "1"};
     EXPECT_EQ(client.RunCmd("captest", "running_test"), "answerthp.dae_alive : 1. thp.binder: 1" +
                                                                 std::string(kCaptestFailure) +
                                                                 "before: 0, after: 1");

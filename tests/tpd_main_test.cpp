@@ -12,14 +12,6 @@ constexpr char kHelpText[] =
         "debugDifEnable\ndebugRawEnable\nlog_afe_disable\nlog_afe_enable\nlog_disable\n"
         "log_enable\nreboot\nshowtouch\nshowtouch_close\nstart\nstop\n";
 
-Call ShowTouches(const char* value) {
-    return Shell(std::string("settings put system show_touches ") + value);
-}
-
-Call ShowPointer(const char* value) {
-    return Shell(std::string("settings put system pointer_location ") + value);
-}
-
 // What the tool prints when it is called with these arguments.
 std::string RunTool(std::vector<std::string> arguments) {
     std::vector<char*> argv;
@@ -54,6 +46,8 @@ TEST(TpdMainTest, ForwardsCommands) {
 }
 
 TEST(TpdMainTest, CarriesOutLocalCommands) {
+    const std::string show = "settings put system show_touches ";
+    const std::string point = "settings put system pointer_location ";
     const Call logOn = Write(kThplogKey, "true");
     const Call afeOn = Write("odm.thp.debug.afelog", "true");
     const Call afeOff = Write("odm.thp.debug.afelog", "false");
@@ -71,8 +65,8 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
             {"debugDifEnable", "set thp.debug.raw as 0\n", {Write("thp.debug.raw", "false")}},
             {"log_afe_enable", "enable afehal log\n", {afeOn, kStop, kSetBootFlag, kStart}},
             {"log_afe_disable", "disable afehal log\n", {afeOff, kStop, kSetBootFlag, kStart}},
-            {"showtouch", "show touch done\n", {ShowTouches("1"), ShowPointer("1")}},
-            {"showtouch_close", "close touch show done\n", {ShowTouches("0"), ShowPointer("0")}},
+            {"showtouch", "show touch done\n", {Shell(show + "1"), Shell(point + "1")}},
+            {"showtouch_close", "close touch show done\n", {Shell(show + "0"), Shell(point + "0")}},
     };
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.command);
