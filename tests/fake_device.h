@@ -58,7 +58,7 @@ inline Call TransactOneWay(const std::string& request) { return {kTransactOneWay
 // What the daemon answers to a call.
 struct Answer {
     android::status_t status = android::OK;
-    const char* text = "answer";  // null for a reply without a text
+    const char* text = "answer";
 };
 
 // A device whose daemon is alive, and the tool's process as it is before main. One at a time.
