@@ -26,7 +26,7 @@ status_t Parcel::setData(const uint8_t* buffer, size_t size) {
     return OK;
 }
 
-uint8_t* Parcel::resizeForOverwrite(size_t size) {
+uint8_t* Parcel::resize(size_t size) {
     mData.resize(size);
     mPosition = 0;
     return mData.data();

@@ -98,12 +98,12 @@ class RemoteBinder : public IBinder {
             OwnerDied();
             return android::FAILED_TRANSACTION;
         }
-        if (!Receive(mConnection, reply.resizeForOverwrite(header.size), header.size)) {
-            reply.resizeForOverwrite(0);
+        if (!Receive(mConnection, reply.resize(header.size), header.size)) {
+            reply.resize(0);
             return OwnerDied();
         }
         if (header.status != android::OK) {
-            reply.resizeForOverwrite(0);
+            reply.resize(0);
         }
         // A positive status is no failure, as on a device.
         return std::min<status_t>(header.status, android::OK);

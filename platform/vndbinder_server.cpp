@@ -134,7 +134,7 @@ void ServeClient(int connection, const sp<IBinder>& service) {
     while (Receive(connection, &header, sizeof(header)) && header.size <= kMaxTransactionBytes) {
         Parcel request;
         Parcel reply;
-        if (!Receive(connection, request.resizeForOverwrite(header.size), header.size)) {
+        if (!Receive(connection, request.resize(header.size), header.size)) {
             break;
         }
         LookForTrace();
@@ -146,7 +146,7 @@ void ServeClient(int connection, const sp<IBinder>& service) {
             status = android::FAILED_TRANSACTION;
         }
         if (status != android::OK) {
-            reply.resizeForOverwrite(0);
+            reply.resize(0);
         }
         const ReplyHeader answer = {status, static_cast<uint32_t>(reply.dataSize())};
         if (!SendMessage(connection, &answer, sizeof(answer), reply)) {

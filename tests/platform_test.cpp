@@ -119,9 +119,9 @@ TEST(VndBinderTest, LimitsTheSizeOfOneWayRequests) {
     EXPECT_EQ(host::PublishService(kDriver, "limits", new TestService), android::OK);
     const sp<IBinder> proxy = host::ConnectService(kDriver, "limits");
     Parcel request;
-    request.resizeForOverwrite(520192);
+    request.resize(520192);
     EXPECT_EQ(proxy->transact(0, request, nullptr, IBinder::FLAG_ONEWAY), android::OK);
-    request.resizeForOverwrite(520196);
+    request.resize(520196);
     EXPECT_EQ(proxy->transact(0, request, nullptr, IBinder::FLAG_ONEWAY),
               android::FAILED_TRANSACTION);
 }

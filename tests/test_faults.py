@@ -43,11 +43,6 @@ def test_prints_an_answer_as_it_is(stopped_device, service, body, text):
     assert stopped_device.written() == []
 
 
-def test_calls_again_after_a_failed_call(stopped_device, service):
-    service.answer(Service.UNREAD, reply())
-    assert stopped_device.tpd("x") == "done\n"
-
-
 def test_reports_a_service_that_ends_in_the_call(stopped_device, service):
     service.answer(Service.GONE)
     assert stopped_device.tpd("x") == NO_SERVICE
@@ -56,8 +51,8 @@ def test_reports_a_service_that_ends_in_the_call(stopped_device, service):
 
 def test_finds_a_service_that_comes_during_the_lookup(stopped_device, service):
     threading.Timer(0.5, service.answer, [reply()]).start()
-    patient = stopped_device.env | {"TPD_GET_SERVICE_MS": "20000"}
-    assert stopped_device.tpd("x", env=patient) == "done\n"
+    environment = stopped_device.env | {"TPD_GET_SERVICE_MS": "20000"}
+    assert stopped_device.tpd("x", env=environment) == "done\n"
     assert len(stopped_device.events("lookup")) == 1
 
 
@@ -101,20 +96,12 @@ def test_forwards_any_argument(device, tmp_path, argument):
     assert os.listdir(tmp_path) == []
 
 
-GETENFORCE = {
-    "killed": ("kill -9 $$", REFUSED),
-    "slow": ("sleep 0.5; echo Permissive", PASS),
-    "longer than the buffer": ("printf 'Permissive%200s' | tr ' ' x", REFUSED),
-}
-
-
-@pytest.mark.parametrize("script, text", GETENFORCE.values(), ids=GETENFORCE)
-def test_asks_getenforce(device, script, text):
+def test_waits_for_a_slow_getenforce(device):
     program = device.programs / "getenforce"
-    program.write_text(f"#!/bin/sh\n{script}\n")
+    program.write_text("#!/bin/sh\nsleep 0.5; echo Permissive\n")
     program.chmod(0o755)
     device.setprop(PERMISSIVE, "null")
-    assert device.tpd("captest") == text
+    assert device.tpd("captest") == PASS
 
 
 def test_does_without_shell_commands(device):
@@ -124,49 +111,22 @@ def test_does_without_shell_commands(device):
     assert device.tpd("showtouch", env=environment) == "\n"
 
 
-def test_takes_a_folder_for_an_empty_kernel_command_line(device):
-    device.setprop(PERMISSIVE, "null")
-    (device.root / "proc/cmdline").mkdir(parents=True)
-    assert device.tpd("captest") == REFUSED
-
-
-def test_gives_up_on_a_property_that_is_a_folder(device):
-    (device.root / "properties/thp.debug.raw").mkdir()
-    assert device.tpd("debugRawEnable") == "\n"
-    assert device.written() == [("thp.debug.raw", "true")] * 6
-
-
 def test_takes_a_pipe_for_no_log(device):
     (device.root / "log").unlink()
     os.mkfifo(device.root / "log")
-    os.close(os.open(device.root / "log", os.O_RDONLY | os.O_NONBLOCK))
+    reader = os.open(device.root / "log", os.O_RDONLY | os.O_NONBLOCK)
     assert device.tpd("captest") == PASS
+    assert os.read(reader, 1) == b""
+    os.close(reader)
 
 
-@pytest.fixture
-def with_own_mounts(device):
-    """Runs a script that may mount; $1 is the tool."""
-
-    def run(script):
-        return device.output("unshare", "-rm", "sh", "-ec", script, "sh", *device.tool)
-
+def test_keeps_a_property_when_the_disk_is_full(device):
     if device.run("unshare", "-rm", "true").returncode != 0:
         pytest.skip("this machine allows no user namespaces")
-    return run
-
-
-def test_works_on_a_read_only_device(with_own_mounts):
-    printed = with_own_mounts(
-        "cd $TPD_DEVICE_ROOT; mount --bind . .; mount -o remount,bind,ro $PWD; cd $PWD;"
-        '"$@" debugRawEnable; "$@" captest; ! touch file 2>/dev/null'
-    )
-    assert printed == "\n" + PASS
-
-
-def test_keeps_a_property_when_the_disk_is_full(with_own_mounts):
-    printed = with_own_mounts(
+    script = (
         "export TPD_DEVICE_ROOT=/mnt/root; mount -t tmpfs -o size=64k none /mnt;"
         'mkdir -m 700 /mnt/root; "$@" debugRawEnable; ! head -c 99999 /dev/zero >/mnt/full;'
         '"$@" debugDifEnable; getprop thp.debug.raw; ls /mnt/root/tmp'
     )
-    assert printed == "\n\ntrue\n"
+    stdout = device.output("unshare", "-rm", "sh", "-ec", script, "sh", *device.tool)
+    assert stdout == "\n\ntrue\n"

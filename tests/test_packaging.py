@@ -132,12 +132,18 @@ def fenced(text):
     return re.search(r"^```\w*\n(.*?)^```", text, re.S | re.M)[1]
 
 
+def is_at_rest(device):
+    is_enabled = device.getprop("odm.thp.service_enable") == "1"
+    return device.is_up() == is_enabled or not device.processes("/init")
+
+
 def test_replays_the_session_of_the_readme(stopped_device):
     session = fenced(source("README.md"))
     for step in session.removeprefix("$ ").split("\n$ "):
-        command, _, printed = step.partition("\n")
-        shown = stopped_device.output("bash", "-c", command, cwd=SOURCE)
-        assert shown.rstrip("\n") == printed.rstrip("\n"), command
+        command, _, expected = step.partition("\n")
+        stdout = stopped_device.output("bash", "-c", command, cwd=SOURCE)
+        assert stdout.rstrip("\n") == expected.rstrip("\n"), command
+        wait_until(lambda: is_at_rest(stopped_device))
 
 
 def test_runs_the_ci_example(stopped_device):

@@ -18,17 +18,13 @@ def test_takes_a_property_for_no_option(device):
     assert device.getprop("-e") == "value"
 
 
-REFUSED_PROPERTIES = {
-    "read-only": ("ro.build.display.id", "2"),
-    "path": ("../selinux", "Permissive"),
-    "value too long": ("a.b", "x" * 92),
-    "folder": ("a.folder", "2"),
-}
-
-
-@pytest.mark.parametrize("key, value", REFUSED_PROPERTIES.values(), ids=REFUSED_PROPERTIES)
+@pytest.mark.parametrize(
+    "key, value",
+    [("ro.build.display.id", "2"), ("../selinux", "1"), ("long", "x" * 92), ("folder", "2")],
+    ids=["read-only", "path", "value too long", "folder"],
+)
 def test_refuses_a_property(device, key, value):
-    (device.root / "properties/a.folder").mkdir()
+    (device.root / "properties/folder").mkdir()
     before = device.output("getprop")
     done = device.run("setprop", key, value)
     failure = f"Failed to set property '{key}' to '{value}'.\n"
@@ -74,20 +70,20 @@ def test_follows_the_log(device):
         logcat.kill()
 
 
-WRONG_USE = {
-    "unknown option": ["logcat", "-d", "-x"],
-    "unknown format": ["logcat", "-d", "-v", "long"],
-    "no value": ["setprop", "a"],
-    "unknown mode": ["setenforce", "2"],
-    "unknown verb": ["device", "restart"],
-    "mistyped fault": ["device", "fault", "die_befor"],
-    "mistyped number": ["device", "fault", "hang", "1O0"],
-}
-
-
-@pytest.mark.parametrize("command", WRONG_USE.values(), ids=WRONG_USE)
+@pytest.mark.parametrize(
+    "command",
+    [
+        "logcat -d -x",
+        "logcat -d -v long",
+        "setprop a",
+        "setenforce 2",
+        "device restart",
+        "device fault die_befor",
+        "device fault hang 1O0",
+    ],
+)
 def test_refuses_wrong_use(device, command):
-    done = device.run(*command)
+    done = device.run(*command.split())
     assert done.returncode in (1, 2)
     assert done.stdout == ""
     assert done.stderr != ""
@@ -109,8 +105,8 @@ def test_has_a_shell(device):
 def test_works_from_anywhere(device, tmp_path):
     (tmp_path / "link").symlink_to(SOURCE / "scripts/device")
     environment = device.env | {"CDPATH": f"{SOURCE}:/"}
-    printed = device.output(tmp_path / "link", "root", env=environment, cwd="/")
-    assert printed == f"{device.root}\n"
+    stdout = device.output(tmp_path / "link", "root", env=environment, cwd="/")
+    assert stdout == f"{device.root}\n"
 
 
 def test_works_without_standard_descriptors(device):

@@ -40,7 +40,7 @@ class Device:
         self.tool = tool
         self.programs = folder / "bin"  # found before those of the device
         self.programs.mkdir()
-        path = f"{self.programs}:{build}/device/bin:{SOURCE}/scripts:{os.environ['PATH']}"
+        path = f"{self.programs}:{build}/device/bin:{build}/device:{os.environ['PATH']}"
         self.env = os.environ | {
             "PATH": path,
             "TPD_BUILD_DIR": str(build),

@@ -25,9 +25,9 @@ class Parcel {
     // Replaces the content and starts reading at its beginning.
     status_t setData(const uint8_t* buffer, size_t size);
 
-    // Gives the content this size, for the caller to fill.
+    // Gives the content this size and returns it, for the caller to fill.
     // Of this implementation only: a transport reads into it without another copy.
-    uint8_t* resizeForOverwrite(size_t size);
+    uint8_t* resize(size_t size);
 
     // Writers return 0 or BAD_VALUE.
     status_t writeInterfaceToken(const String16& interface);
