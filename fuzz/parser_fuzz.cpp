@@ -1,23 +1,24 @@
 // Key/value parsing, beside a model that reads byte after byte. The input's first two bytes are the
 // separators, the second of which counts twice.
 #include "cmdline/StringPairParser.h"
+
+#include <algorithm>
+
 #include "fuzz.h"
 
 namespace {
 
 std::vector<std::string> NaiveSplit(const std::string& text, const std::string& delimiter) {
-    std::vector<std::string> fields;
-    std::string field;
-    for (size_t at = 0; at <= text.size();) {
-        const bool ends = text.compare(at, delimiter.size(), delimiter) == 0;
-        if ((ends || at == text.size()) && !field.empty()) {
-            fields.push_back(field);
-            field.clear();
-        } else if (!ends && at < text.size()) {
-            field += text[at];
+    std::vector<std::string> fields = {""};
+    for (size_t at = 0; at < text.size();) {
+        if (text.compare(at, delimiter.size(), delimiter) == 0) {
+            fields.emplace_back();
+            at += delimiter.size();
+        } else {
+            fields.back() += text[at++];
         }
-        at += ends ? delimiter.size() : 1;
     }
+    fields.erase(std::remove(fields.begin(), fields.end(), ""), fields.end());
     return fields;
 }
 

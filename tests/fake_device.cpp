@@ -40,11 +40,14 @@ class FakeService : public IBinder {
 
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
         gDevice->request.assign(reinterpret_cast<const char*>(data.data()), data.dataSize());
-        gDevice->Record(ReadRequest(code, data, flags));
-        const Answer answer = TakeFirst(gDevice->answers, {});
-        if (answer.duringCall) {
-            answer.duringCall();
+        data.setDataPosition(0);
+        const bool known = data.enforceInterface(ICorvaneInterfaceClient::descriptor) && code == 0;
+        std::string request = known ? data.readCString() : "not of this interface";
+        if (data.readInt32() != 0) {
+            request += std::string(", ") + data.readCString();
         }
+        gDevice->Record({flags == FLAG_ONEWAY ? kTransactOneWay : kTransact, request});
+        const Answer answer = TakeFirst(gDevice->answers, {});
         reply->writeCString(answer.text);
         reply->setDataPosition(0);
         return answer.status;
@@ -52,31 +55,19 @@ class FakeService : public IBinder {
 
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
                          uint32_t flags) override {
-        const bool expected = recipient == g_deathRecipient && cookie == nullptr && flags == 0;
-        gDevice->Record(LinkToDeath(expected ? mNumber : -1));
-        return gDevice->linkStatus;
+        gDevice->Record(LinkToDeath(IsTools(recipient, cookie, flags) ? mNumber : -1));
+        return OK;
     }
 
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie, uint32_t flags,
-                           wp<DeathRecipient>* out) override {
-        const bool expected =
-                recipient == wp<DeathRecipient>(g_deathRecipient) && cookie == nullptr;
-        gDevice->Record(UnlinkToDeath(expected && flags == 0 && out == nullptr ? mNumber : -1));
+                           wp<DeathRecipient>* /* out */) override {
+        gDevice->Record(UnlinkToDeath(IsTools(recipient, cookie, flags) ? mNumber : -1));
         return OK;
     }
 
   private:
-    Call ReadRequest(uint32_t code, const Parcel& data, uint32_t flags) {
-        data.setDataPosition(0);
-        if (!data.enforceInterface(ICorvaneInterfaceClient::descriptor) || code != 0) {
-            return {kTransact, "not of this interface"};
-        }
-        const std::string command = data.readCString();
-        const char* const way = flags == IBinder::FLAG_ONEWAY ? kOneWay : kTwoWay;
-        if (data.readInt32() == 0) {
-            return Transact(mNumber, way, command);
-        }
-        return Transact(mNumber, way, command, data.readCString());
+    static bool IsTools(const wp<DeathRecipient>& recipient, const void* cookie, uint32_t flags) {
+        return recipient == wp<DeathRecipient>(g_deathRecipient) && cookie == nullptr && flags == 0;
     }
 
     const int mNumber;
@@ -95,8 +86,10 @@ class FakeServiceManager : public IServiceManager {
     IBinder* onAsBinder() override { return nullptr; }
 };
 
-// Sets the tool's process-wide variables to what they are before main.
-void ForgetToolState() {
+}  // namespace
+
+FakeDevice::FakeDevice() {
+    gDevice = this;
     aliveConfirmed = false;
     failedWaitCount = 0;
     g_thpBinder = nullptr;
@@ -104,39 +97,25 @@ void ForgetToolState() {
     delete g_tpdCmd;
     g_tpdCmd = nullptr;
     gTpdCmds.clear();
-}
-
-}  // namespace
-
-Call LogWithTag(const char* tag, int priority, const std::string& text) {
-    constexpr const char* kNames[] = {"?", "?", "VERBOSE", "DEBUG", "INFO", "WARN", "ERROR"};
-    return {kLog,
-            std::string(kNames[priority]) + ", " + (tag != nullptr ? tag : "no tag") + ", " + text};
-}
-
-Call Transact(int service, const char* way, const std::string& command,
-              const std::optional<std::string>& parameters) {
-    const std::string end = parameters ? ", " + *parameters : "";
-    return {kTransact, std::to_string(service) + ", " + way + ", " + command + end};
-}
-
-FakeDevice::FakeDevice() {
-    gDevice = this;
-    ForgetToolState();
     setDefaultServiceManager(new FakeServiceManager);
 }
 
-FakeDevice::~FakeDevice() {
-    ForgetToolState();
-    gDevice = nullptr;
-}
+FakeDevice::~FakeDevice() { gDevice = nullptr; }
 
 std::vector<Call> FakeDevice::calls(const std::set<std::string>& functions) const {
     std::vector<Call> selected;
     std::copy_if(mCalls.begin(), mCalls.end(), std::back_inserter(selected), [&](const Call& call) {
-        return functions.empty() || functions.count(call.function) != 0;
+        return functions.empty() || functions.count(call.first) != 0;
     });
     return selected;
+}
+
+void FakeDevice::Record(const Call& call) {
+    mCalls.push_back(call);
+    const auto change = changes.find(call);
+    if (change != changes.end()) {
+        properties[change->second.first] = change->second.second;
+    }
 }
 
 }  // namespace test
@@ -148,16 +127,12 @@ int host::DeviceRoot() { return -1; }
 
 int __system_property_get(const char* name, char* value) {
     gDevice->Record(test::Read(name));
-    const auto delayed = gDevice->delayedValues.find(name);
-    if (delayed != gDevice->delayedValues.end() && --delayed->second.read == 0) {
-        gDevice->properties[name] = delayed->second.value;
-    }
     return snprintf(value, PROP_VALUE_MAX, "%s", gDevice->properties[name].c_str());
 }
 
 int __system_property_set(const char* name, const char* value) {
     gDevice->Record(test::Write(name, value));
-    if (gDevice->readOnly.count(name) != 0 || strlen(value) >= PROP_VALUE_MAX) {
+    if (gDevice->rejectedWrites.count(name) != 0) {
         return -1;
     }
     gDevice->properties[name] = value;
@@ -165,13 +140,12 @@ int __system_property_set(const char* name, const char* value) {
 }
 
 int __android_log_print(int priority, const char* tag, const char* format, ...) {
-    char* text = nullptr;
+    char text[4096];
     va_list args;
     va_start(args, format);
-    const int length = vasprintf(&text, format, args);
+    const int length = vsnprintf(text, sizeof(text), format, args);
     va_end(args);
-    gDevice->Record(test::LogWithTag(tag, priority, text));
-    free(text);
+    gDevice->Record(test::Log(priority, text, tag));
     return length;
 }
 
@@ -187,22 +161,21 @@ extern "C" {
 FILE* __real_fopen(const char* path, const char* mode);
 int __real_clock_gettime(clockid_t clock, timespec* time);
 
-static FILE* OpenText(std::optional<std::string>& text) {
-    return text ? fmemopen(text->data(), text->size(), "r") : nullptr;
-}
-
 FILE* __wrap_fopen(const char* path, const char* mode) {
-    const bool ofDevice = strcmp(path, "/proc/cmdline") == 0;
-    return ofDevice ? OpenText(gDevice->kernelCommandLine) : __real_fopen(path, mode);
+    if (strcmp(path, "/proc/cmdline") != 0) {
+        return __real_fopen(path, mode);
+    }
+    std::string& line = gDevice->kernelCommandLine;
+    return fmemopen(line.data(), line.size(), mode);
 }
 
 FILE* __wrap_popen(const char* command, const char* mode) {
     gDevice->Record(test::Shell(command));
-    return strcmp(mode, "r") == 0 ? OpenText(gDevice->getenforce) : nullptr;
+    std::optional<std::string>& output = gDevice->getenforce;
+    return output ? fmemopen(output->data(), output->size(), mode) : nullptr;
 }
 
 int __wrap_pclose(FILE* stream) {
-    gDevice->Record(test::CloseShell());
     fclose(stream);
     return gDevice->getenforceStatus;
 }

@@ -8,46 +8,35 @@
 
 #include <chrono>
 #include <deque>
-#include <functional>
 #include <map>
 #include <optional>
-#include <ostream>
 #include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace test {
 
-// A recorded call. The functions below make those that a test expects.
-struct Call {
-    std::string function;
-    std::string arguments;
-    bool operator==(const Call& other) const {
-        return function == other.function && arguments == other.arguments;
-    }
-};
-
-inline std::ostream& operator<<(std::ostream& out, const Call& call) {
-    return out << call.function << "(" << call.arguments << ")";
-}
+// A recorded call: the function and its arguments. The functions below make those that a test
+// expects.
+using Call = std::pair<std::string, std::string>;
 
 constexpr char kRead[] = "Read", kWrite[] = "Write", kLog[] = "Log", kPause[] = "Pause",
-               kShell[] = "Shell", kCloseShell[] = "CloseShell", kGetService[] = "GetService",
-               kLinkToDeath[] = "LinkToDeath", kUnlinkToDeath[] = "UnlinkToDeath",
-               kTransact[] = "Transact";
+               kShell[] = "Shell", kGetService[] = "GetService", kLinkToDeath[] = "LinkToDeath",
+               kUnlinkToDeath[] = "UnlinkToDeath", kTransact[] = "Transact",
+               kTransactOneWay[] = "TransactOneWay";
 
 constexpr int INFO = ANDROID_LOG_INFO;
 constexpr int WARN = ANDROID_LOG_WARN;
 constexpr int ERROR = ANDROID_LOG_ERROR;
 
-Call LogWithTag(const char* tag, int priority, const std::string& text);
-inline Call Log(int priority, const std::string& text) {
-    return LogWithTag("corvane_daemon", priority, text);
+inline Call Log(int priority, const std::string& text, const char* tag = "corvane_daemon") {
+    const std::string letter(1, "??VDIWE"[priority]);
+    return {kLog, letter + ", " + (tag != nullptr ? tag : "no tag") + ", " + text};
 }
 inline Call UntaggedLog(int priority, const std::string& text) {
-    return LogWithTag(nullptr, priority, text);
+    return Log(priority, text, nullptr);
 }
-
 inline Call Read(const std::string& key) { return {kRead, key}; }
 inline Call Write(const std::string& key, const std::string& value) {
     return {kWrite, key + ", " + value};
@@ -56,29 +45,20 @@ inline Call Pause(std::chrono::microseconds time) {
     return {kPause, std::to_string(time.count()) + " us"};
 }
 inline Call Shell(const std::string& command) { return {kShell, command}; }
-inline Call CloseShell() { return {kCloseShell, ""}; }
 
 // The daemon's service is numbered by the lookups that found it.
 inline Call GetService() { return {kGetService, "service.corvaneinterfaceservice"}; }
 inline Call LinkToDeath(int service) { return {kLinkToDeath, std::to_string(service)}; }
 inline Call UnlinkToDeath(int service) { return {kUnlinkToDeath, std::to_string(service)}; }
 
-constexpr char kTwoWay[] = "two-way";
-constexpr char kOneWay[] = "one-way";
-// `parameters` are absent when none are sent.
-Call Transact(int service, const char* way, const std::string& command,
-              const std::optional<std::string>& parameters = std::nullopt);
+// `request` is the command; when parameters are sent, a comma, a space and they follow.
+inline Call Transact(const std::string& request) { return {kTransact, request}; }
+inline Call TransactOneWay(const std::string& request) { return {kTransactOneWay, request}; }
 
-// What the daemon makes of a call.
+// What the daemon answers to a call.
 struct Answer {
     android::status_t status = android::OK;
-    const char* text = "answer";                 // null for a reply without a text
-    std::function<void()> duringCall = nullptr;  // what happens on the device meanwhile
-};
-
-struct DelayedValue {
-    int read;  // the property has the value from this read on, counted from 1
-    std::string value;
+    const char* text = "answer";
 };
 
 // A device whose daemon is alive, and the tool's process as it is before main. One at a time.
@@ -87,25 +67,29 @@ class FakeDevice {
     FakeDevice();
     ~FakeDevice();
 
-    std::map<std::string, std::string> properties = {{"odm.thp.dae_alive", "true"},
-                                                     {"odm.thp.binder", "1"}};
-    std::map<std::string, DelayedValue> delayedValues;
-    std::set<std::string> readOnly;                     // writes to these properties are rejected
-    std::optional<std::string> kernelCommandLine = "";  // none: the file cannot be opened
+    std::map<std::string, std::string> properties = {
+            {"odm.thp.dae_alive", "true"},
+            {"odm.thp.binder", "1"},
+            {"odm.thp.dae_reboot_times", "0"},
+            {"odm.thp.is_updating_fw", "false"},
+    };
+    std::set<std::string> rejectedWrites;  // writes to these properties are rejected
+    std::string kernelCommandLine;
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
     int getenforceStatus = 0;                               // what closing its output returns
     std::optional<timespec> monotonicClock = timespec{};    // none: it cannot be read
-    int failingAllocation = 0;  // of those that may fail, counted from 1
-    std::deque<bool> lookups;   // whether each finds the service; all later ones do
-    android::status_t linkStatus = android::OK;
+    int failingAllocation = 0;   // of those that may fail, counted from 1
+    std::deque<bool> lookups;    // whether each finds the service; all later ones do
     std::deque<Answer> answers;  // to the calls, in order; all later ones get the default
+    // The property that changes during a call, and its new value.
+    std::map<Call, std::pair<std::string, std::string>> changes;
 
     // The recorded calls of these functions, or of all when none is named.
     std::vector<Call> calls(const std::set<std::string>& functions = {}) const;
     std::string request;  // the bytes of the last call's parcel
 
     // For the functions that end here.
-    void Record(Call call) { mCalls.push_back(std::move(call)); }
+    void Record(const Call& call);
     int servicesFound = 0;
 
   private:

@@ -13,17 +13,14 @@
 #include <thread>
 
 #include "platform/device_root.h"
-#include "platform/files.h"
 #include "platform/log_entry.h"
 #include "platform/vndbinder.h"
-#include "platform/vndbinder_wire.h"
 
 namespace {
 
 using android::IBinder;
 using android::Parcel;
 using android::sp;
-using android::status_t;
 
 constexpr char kDriver[] = "/dev/vndbinder";
 
@@ -37,7 +34,7 @@ const struct TemporaryRoot {
 // Ends a child of the test with 0 when this root is refused.
 void ExpectRefusal(const std::string& root) {
     setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
-    _exit(host::DeviceRoot() == -1 && __system_property_set("k", "v") == -1 ? 0 : 1);
+    _exit(host::DeviceRoot() == -1 ? 0 : 1);
 }
 
 TEST(DeviceRootDeathTest, RefusesFoldersThatAreNotThisUsersAlone) {
@@ -49,17 +46,10 @@ TEST(DeviceRootDeathTest, RefusesFoldersThatAreNotThisUsersAlone) {
     const auto refused = testing::ExitedWithCode(0);
     EXPECT_EXIT(ExpectRefusal(folder), refused, "is open to other users; its mode must be 0700");
     EXPECT_EXIT(ExpectRefusal(link + "/"), refused, "link: Not a directory");
-    EXPECT_EXIT(ExpectRefusal("folder"), refused, "folder: is not an absolute path");
 }
 
 bool SetProperty(const std::string& name, const std::string& value) {
     return __system_property_set(name.c_str(), value.c_str()) == 0;
-}
-
-std::string GetProperty(const char* name) {
-    char value[PROP_VALUE_MAX];
-    __system_property_get(name, value);
-    return value;
 }
 
 TEST(PropertiesTest, HaveLegalNames) {
@@ -67,23 +57,15 @@ TEST(PropertiesTest, HaveLegalNames) {
         EXPECT_FALSE(SetProperty(name, "1")) << name;
     }
     EXPECT_TRUE(SetProperty("a.B_9@:-", "1"));
-    EXPECT_EQ(GetProperty("a.B_9@:-"), "1");
 }
 
 TEST(PropertiesTest, HoldAtMost91Bytes) {
     const std::string longest(91, 'v');
     EXPECT_TRUE(SetProperty("limited", longest));
-    EXPECT_EQ(GetProperty("limited"), longest);
     EXPECT_FALSE(SetProperty("limited", longest + "v"));
-}
-
-TEST(PropertiesTest, AreWrittenOnceWhenReadOnlyAndNeverWhenProtected) {
-    EXPECT_TRUE(SetProperty("ro.once", std::string(92, 'w')));
-    EXPECT_FALSE(SetProperty("ro.once", "2"));
-    EXPECT_EQ(GetProperty("ro.once"), std::string(91, 'w'));
-    EXPECT_TRUE(SetProperty("protected", "1"));
-    chmod((kRoot.path + "/properties/protected").c_str(), 0400);
-    EXPECT_FALSE(SetProperty("protected", "2"));
+    char value[PROP_VALUE_MAX];
+    EXPECT_EQ(__system_property_get("limited", value), 91);
+    EXPECT_EQ(value, longest);
 }
 
 // What follows the header of the next record.
@@ -107,49 +89,41 @@ TEST(LogTest, AppendsARecord) {
     EXPECT_EQ(ReadLogRecord(log), "\4platform_test" + zero + std::string(1023, 'x') + zero);
 }
 
-// Answers with the flags of the call; code 1 ends with a positive status. One-way calls take their
-// time.
+// Its status is the call's code. Each call takes some time.
 class TestService : public android::BBinder {
   public:
     std::atomic<int> running = 0;
     std::atomic<int> overlaps = 0;
-    std::atomic<int> oneWayCalls = 0;
+    std::atomic<int> calls = 0;
 
   private:
-    status_t onTransact(uint32_t code, const Parcel&, Parcel* reply, uint32_t flags) override {
-        if ((flags & FLAG_ONEWAY) != 0) {
-            overlaps += ++running > 1 ? 1 : 0;
-            std::this_thread::sleep_for(std::chrono::microseconds(100));
-            --running;
-            ++oneWayCalls;
-        }
-        reply->writeInt32(static_cast<int32_t>(flags));
-        return static_cast<status_t>(code);
+    android::status_t onTransact(uint32_t code, const Parcel&, Parcel* reply, uint32_t) override {
+        overlaps += ++running > 1 ? 1 : 0;
+        std::this_thread::sleep_for(std::chrono::microseconds(100));
+        --running;
+        ++calls;
+        reply->writeCString("answer");
+        return static_cast<android::status_t>(code);
     }
 };
 
-TEST(VndBinderTest, AnswersTwoWayCalls) {
+TEST(VndBinderTest, TakesAPositiveStatusForSuccessWithoutAReply) {
     Parcel request, reply;
-    EXPECT_EQ(host::PublishService(kDriver, "answers", new TestService), android::OK);
-    const sp<IBinder> proxy = host::ConnectService(kDriver, "answers");
-    EXPECT_EQ(proxy->transact(0, request, &reply), android::OK);
-    EXPECT_EQ(reply.readInt32(), 0x10);  // the client's library accepts file descriptors
+    EXPECT_EQ(host::PublishService(kDriver, "status", new TestService), android::OK);
+    const sp<IBinder> proxy = host::ConnectService(kDriver, "status");
     EXPECT_EQ(proxy->transact(1, request, &reply), android::OK);
     EXPECT_EQ(reply.dataSize(), 0U);
 }
 
-TEST(VndBinderTest, LimitsTheSizeOfRequests) {
+TEST(VndBinderTest, LimitsTheSizeOfOneWayRequests) {
     EXPECT_EQ(host::PublishService(kDriver, "limits", new TestService), android::OK);
     const sp<IBinder> proxy = host::ConnectService(kDriver, "limits");
-    for (const uint32_t flags : {0U, uint32_t{IBinder::FLAG_ONEWAY}}) {
-        SCOPED_TRACE(flags);
-        const size_t largest = flags == 0 ? 1040384 : 520192;
-        Parcel request, reply;
-        request.resize(largest);
-        EXPECT_EQ(proxy->transact(0, request, &reply, flags), android::OK);
-        request.resize(largest + 4);
-        EXPECT_EQ(proxy->transact(0, request, &reply, flags), android::FAILED_TRANSACTION);
-    }
+    Parcel request;
+    request.resize(520192);
+    EXPECT_EQ(proxy->transact(0, request, nullptr, IBinder::FLAG_ONEWAY), android::OK);
+    request.resize(520196);
+    EXPECT_EQ(proxy->transact(0, request, nullptr, IBinder::FLAG_ONEWAY),
+              android::FAILED_TRANSACTION);
 }
 
 TEST(VndBinderTest, CarriesOutOneWayCallsOfAllClientsOneAfterAnother) {
@@ -162,21 +136,10 @@ TEST(VndBinderTest, CarriesOutOneWayCallsOfAllClientsOneAfterAnother) {
         EXPECT_EQ(first->transact(0, request, nullptr, IBinder::FLAG_ONEWAY), android::OK);
         EXPECT_EQ(second->transact(0, request, nullptr, IBinder::FLAG_ONEWAY), android::OK);
     }
-    while (service->oneWayCalls < 100) {
+    while (service->calls < 100) {
         std::this_thread::sleep_for(std::chrono::milliseconds(1));
     }
     EXPECT_EQ(service->overlaps, 0);
-}
-
-TEST(VndBinderTest, DoesNotWaitForAServiceThatAcceptsNobody) {
-    sockaddr_un address;
-    host::MakeFolders(host::DeviceRoot(), kDriver + 1);
-    const int listener = host::NewSocket(kDriver, "busy", address);
-    ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), sizeof(address)), 0);
-    ASSERT_EQ(listen(listener, 0), 0);
-    EXPECT_NE(host::ConnectService(kDriver, "busy"), nullptr);
-    EXPECT_EQ(host::ConnectService(kDriver, "busy"), nullptr);
-    close(listener);
 }
 
 class DeathCounter : public IBinder::DeathRecipient {
@@ -190,16 +153,12 @@ TEST(VndBinderTest, TellsTheLinkedRecipientOnceThatTheOwnerDied) {
     ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
     const sp<IBinder> proxy = host::NewProxy(ends[0]);
     const sp<DeathCounter> linked = new DeathCounter;
-    const sp<DeathCounter> unlinked = new DeathCounter;
     EXPECT_EQ(proxy->linkToDeath(linked), android::OK);
-    EXPECT_EQ(proxy->linkToDeath(unlinked), android::OK);
-    EXPECT_EQ(proxy->unlinkToDeath(unlinked), android::OK);
     close(ends[1]);
     Parcel request, reply;
     EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
     EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
     EXPECT_EQ(linked->deaths, 1);
-    EXPECT_EQ(unlinked->deaths, 0);
 }
 
 }  // namespace

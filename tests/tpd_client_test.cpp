@@ -6,19 +6,12 @@ namespace test {
 
 constexpr char kAliveKey[] = "odm.thp.dae_alive";
 constexpr char kBinderKey[] = "odm.thp.binder";
-constexpr char kUpdatingKey[] = "odm.thp.is_updating_fw";
 constexpr char kRebootTimesKey[] = "odm.thp.dae_reboot_times";
 
 class TpdClientTest : public DeviceTest {
   protected:
-    TpdClientTest() {
-        device.properties[kUpdatingKey] = "false";
-        device.properties[kRebootTimesKey] = "0";
-    }
-    void StopDaemon() { device.properties[kAliveKey] = "false"; }
-    void StartDaemon() { device.properties[kAliveKey] = "true"; }
     size_t ChecksWhileDaemonIsDown() {
-        StopDaemon();
+        device.properties[kAliveKey] = "false";
         const size_t before = device.calls({kLog}).size();
         client.ThpExecuteCmdParams("[TPD]c", "");
         return device.calls({kLog}).size() - before;
@@ -38,7 +31,7 @@ TEST_F(TpdClientTest, ChecksALivingDaemonOnceForAllCommands) {
 
 TEST_F(TpdClientTest, WaitsForADaemonThatStarts) {
     device.properties[kBinderKey] = "0";
-    device.delayedValues[kBinderKey] = {4, "1"};
+    device.changes[Log(INFO, "CheckAlive 2")] = {kBinderKey, "1"};
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 3.thp.dae_alive : 1. thp.binder: 1");
     EXPECT_THAT(device.calls({kLog, kPause}),
                 ElementsAre(Log(INFO, "CheckAlive 0"), Log(INFO, "CheckAlive 1"), Pause(200ms),
@@ -46,7 +39,7 @@ TEST_F(TpdClientTest, WaitsForADaemonThatStarts) {
 }
 
 TEST_F(TpdClientTest, ReportsADaemonThatStaysDown) {
-    StopDaemon();
+    device.properties[kAliveKey] = "false";
     device.properties[kRebootTimesKey] = "1";
     client.daemonUnavailable = 0;
     EXPECT_EQ(client.WaitDaemonAlive(2),
@@ -55,8 +48,8 @@ TEST_F(TpdClientTest, ReportsADaemonThatStaysDown) {
 }
 
 TEST_F(TpdClientTest, DoesNotWaitForAFirmwareUpdate) {
-    StopDaemon();
-    device.properties[kUpdatingKey] = "true";
+    device.properties[kAliveKey] = "false";
+    device.properties["odm.thp.is_updating_fw"] = "true";
     EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", "p"),
               "0P_1P; bypass-when-fw-updatingcheck_time: 0.thp.dae_alive : 0. thp.binder: 1");
     EXPECT_THAT(device.calls({kLog, kPause, kTransact}), IsEmpty());
@@ -66,8 +59,7 @@ TEST_F(TpdClientTest, ChecksOnlyOnceAfterTwoFailedWaits) {
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 1U);
-    EXPECT_EQ(ChecksWhileDaemonIsDown(), 1U);
-    StartDaemon();
+    device.properties[kAliveKey] = "true";
     device.answers = {{android::OK, "an ERROR"}};
     EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", ""), "an ERROR");
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
@@ -87,7 +79,7 @@ TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerTellsAFailure) {
 }
 
 TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
-    device.readOnly = {"odm.thp.service_enable"};
+    device.rejectedWrites = {"odm.thp.service_enable"};
     for (const std::string enabled : {"0", "1"}) {
         device.properties["odm.thp.service_enable"] = enabled;
         device.lookups = {false, false};
@@ -99,36 +91,28 @@ TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
     }
 }
 
-TEST_F(TpdClientTest, JudgesACapacityTestByTheDaemonAfterwards) {
-    const std::string failure =
-            "captest fail due to corvane_daemon is not alive or unexpected reboot. ";
-    const std::string died = "thp.dae_alive : 0. thp.binder: 1" + failure;
-    const std::string restarted = "thp.dae_alive : 1. thp.binder: 1" + failure;
-    const struct {
-        const char* command;
-        const char* parameters;
-        const char* alive;
-        const char* rebootTimes;
-        std::string failure;
-    } kRows[] = {
-            {"captest", "running_test", "true", "2", ""},
-            {"captest", "running_testrunning", "false", "0", died + "before: 0, after: 0"},
-            {"captest", "running_test_lasttime", "true", "1", restarted + "before: 0, after: 1"},
-            {"captest", "lasttimerunning", "false", "1", ""},
-            {"captest", "", "false", "1", ""},
-            {"[TPD]captest", "running_test", "false", "1", ""}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(std::string(row.command) + " " + row.parameters);
-        StartDaemon();
-        device.properties[kRebootTimesKey] = "0";
-        device.answers = {{android::OK, "answer", [&] {
-                               device.properties[kAliveKey] = row.alive;
-                               device.properties[kRebootTimesKey] = row.rebootTimes;
-                           }}};
-        client.daemonUnavailable = 1;
-        EXPECT_EQ(client.RunCmd(row.command, row.parameters), "answer" + row.failure);
-        EXPECT_EQ(client.daemonUnavailable, 0);
+constexpr char kCaptestFailure[] =
+        "captest fail due to corvane_daemon is not alive or unexpected reboot. ";
+
+TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonDied) {
+    device.properties[kAliveKey] = "false";
+    const std::string failed = "answerthp.dae_alive : 0. thp.binder: 1" +
+                               std::string(kCaptestFailure) + "before: 0, after: 0";
+    for (const char* fragment : {"running_testrunning", "running_test_lasttime"}) {
+        EXPECT_EQ(client.RunCmd("captest", fragment), failed);
     }
+    EXPECT_EQ(client.RunCmd("captest", "lasttimerunning"), "answer");
+    EXPECT_EQ(client.RunCmd("captest", ""), "answer");
+    EXPECT_EQ(client.RunCmd("[TPD]captest", "running_test"), "answer");
+}
+
+TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonRestarted) {
+    device.changes[Transact("captest, running_test")] = {kRebootTimesKey, "1"};
+    EXPECT_EQ(client.RunCmd("captest", "running_test"), "answerthp.dae_alive : 1. thp.binder: 1" +
+                                                                std::string(kCaptestFailure) +
+                                                                "before: 0, after: 1");
+    EXPECT_EQ(client.RunCmd("captest", "running_test"), "answer");
+    EXPECT_EQ(client.daemonUnavailable, 0);
 }
 
 }  // namespace test

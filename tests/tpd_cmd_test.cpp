@@ -56,20 +56,15 @@ TEST_F(TpdCmdTest, StoresThatSelinuxIsPermissive) {
     device.getenforce = " \nPermissively so";
     EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
     EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
-    EXPECT_THAT(device.calls({kShell, kCloseShell, kWrite}),
-                ElementsAre(Write(kPermissiveKey, "null"), Shell("getenforce"), CloseShell(),
+    EXPECT_THAT(device.calls({kShell, kWrite}),
+                ElementsAre(Write(kPermissiveKey, "null"), Shell("getenforce"),
                             Write(kPermissiveKey, "true")));
 }
 
-TEST_F(TpdCmdTest, AllowsCommandsWithoutAskingSelinux) {
-    device.properties[kPermissiveKey] = "1";
+TEST_F(TpdCmdTest, AsksNobodyInAFactoryVersion) {
+    device.kernelCommandLine = "androidboot.swtype=factory";
     EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
-    device.properties[kPermissiveKey] = "null";
-    for (const char* line : {"enter_recovery=1", "androidboot.swtype=factory"}) {
-        device.kernelCommandLine = line;
-        EXPECT_TRUE(TpdCmd().IsSelinuxPermissive()) << line;
-    }
-    EXPECT_THAT(device.calls({kWrite, kShell}), IsEmpty());
+    EXPECT_THAT(device.calls({kShell}), IsEmpty());
 }
 
 TEST_F(TpdCmdTest, AllowsCommandsOnlyWhenGetenforceSaysPermissive) {
@@ -77,24 +72,23 @@ TEST_F(TpdCmdTest, AllowsCommandsOnlyWhenGetenforceSaysPermissive) {
     const struct {
         const char* name;
         std::optional<std::string> output;
+        int status;
         bool allowed;
-    } kRows[] = {{"enforcing", "Enforcing\n", false}, {"within a word", "xPermissive\n", false},
-                 {"no output", " \n", false},         {"cannot be run", std::nullopt, false},
-                 {"longest word", longest, true},     {"word too long", longest + "x", false}};
+    } kRows[] = {{"enforcing", "Enforcing\n", 0, false},
+                 {"within a word", "xPermissive\n", 0, false},
+                 {"no output", " \n", 0, false},
+                 {"cannot be run", std::nullopt, 0, false},
+                 {"cannot be closed", "Permissive\n", -1, false},
+                 {"fails afterwards", "Permissive\n", 256, true},
+                 {"longest word", longest, 0, true},
+                 {"word too long", longest + "x", 0, false}};
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.name);
         device.properties.clear();
         device.getenforce = row.output;
+        device.getenforceStatus = row.status;
         EXPECT_EQ(TpdCmd().IsSelinuxPermissive(), row.allowed);
     }
-}
-
-TEST_F(TpdCmdTest, MindsOnlyAnOutputThatCannotBeClosed) {
-    device.getenforce = "Permissive\n";
-    device.getenforceStatus = -1;
-    EXPECT_FALSE(TpdCmd().IsSelinuxPermissive());
-    device.getenforceStatus = 256;
-    EXPECT_TRUE(TpdCmd().IsSelinuxPermissive());
 }
 
 }  // namespace test

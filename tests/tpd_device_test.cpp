@@ -5,19 +5,24 @@
 
 #include "binder/ICorvaneInterfaceClient.h"
 
+// Answers with the command and its parameters.
 class EchoService : public android::BBinder {
-    android::status_t onTransact(uint32_t, const android::Parcel& data, android::Parcel* reply,
-                                 uint32_t) override {
-        const bool isOurs = data.enforceInterface(ICorvaneInterfaceClient::descriptor);
+    android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
+                                 android::Parcel* reply, uint32_t /* flags */) override {
+        if (!data.enforceInterface(ICorvaneInterfaceClient::descriptor)) {
+            return android::PERMISSION_DENIED;
+        }
         std::string text = data.readCString();
-        text += data.readInt32() == 1 ? data.readCString() : "";
-        return isOurs ? reply->writeCString(text.c_str()) : android::PERMISSION_DENIED;
+        if (data.readInt32() == 1) {
+            text += std::string(" ") + data.readCString();
+        }
+        return reply->writeCString(text.c_str());
     }
 };
 
-TEST(OwnProcess, CarriesACommandAndItsAnswer) {
-    std::string reply;
+TEST(TpdDeviceTest, CarriesACommandAndItsAnswer) {
     const auto daemon = ICorvaneInterfaceClient::asInterface(new EchoService);
-    EXPECT_EQ(daemon->ExecuteCommand(reply, "[TPD]captest ", "x"), android::OK);
+    std::string reply;
+    EXPECT_EQ(daemon->ExecuteCommand(reply, "[TPD]captest", "x"), android::OK);
     EXPECT_EQ(reply, "captest x");
 }

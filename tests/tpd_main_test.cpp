@@ -1,5 +1,6 @@
 #include "main/TpdMain.h"
 
+#include "daemon/TpdCmd.h"
 #include "tests/unit_test.h"
 
 int tpd_main(int argc, char** argv);
@@ -28,14 +29,12 @@ TEST(TpdMainTest, ForwardsCommands) {
         Call call;
         const char* help;
     } kRows[] = {
-            {{"tpd"}, Transact(1, kTwoWay, "help"), kHelpText},
-            {{"tpd", "help"}, Transact(1, kTwoWay, "help"), kHelpText},
-            {{"tpd", "help", ""}, Transact(1, kTwoWay, "help"), ""},
-            {{"tpd", "Start"}, Transact(1, kTwoWay, "Start"), ""},
-            {{"tpd", "start", "x"}, Transact(1, kTwoWay, "start", "x"), ""},
-            {{"tpd", "TSA_ExecuteCommand", "a", "b"},
-             Transact(1, kTwoWay, "TSA_ExecuteCommand", "a b"),
-             ""},
+            {{"tpd"}, Transact("help"), kHelpText},
+            {{"tpd", "help"}, Transact("help"), kHelpText},
+            {{"tpd", "help", ""}, Transact("help"), ""},
+            {{"tpd", "Start"}, Transact("Start"), ""},
+            {{"tpd", "start", "x"}, Transact("start, x"), ""},
+            {{"tpd", "TSA_ExecuteCommand", "a", "b"}, Transact("TSA_ExecuteCommand, a b"), ""},
     };
     for (const auto& row : kRows) {
         SCOPED_TRACE(testing::PrintToString(row.arguments));
@@ -46,60 +45,47 @@ TEST(TpdMainTest, ForwardsCommands) {
     }
 }
 
-TEST(TpdMainTest, IgnoresOtherArguments) {
-    const std::vector<std::string> kRows[] = {
-            {},
-            {"tpd", "TSA_ExecuteCommand", "", "b"},
-            {"tpd", "TSA_ExecuteCommands", "a", "b"},
-            {"tpd", "TSA_ExecuteCommand", "a", "b", "c"},
-    };
-    for (const auto& arguments : kRows) {
-        SCOPED_TRACE(testing::PrintToString(arguments));
-        FakeDevice device;
-        EXPECT_EQ(RunTool(arguments), "\n");
-        EXPECT_THAT(device.calls({kRead}), IsEmpty());
-    }
-}
-
 TEST(TpdMainTest, CarriesOutLocalCommands) {
-    const Call enableAfeLog = Write("odm.thp.debug.afelog", "true");
-    const Call disableAfeLog = Write("odm.thp.debug.afelog", "false");
+    const std::string show = "settings put system show_touches ";
+    const std::string point = "settings put system pointer_location ";
+    const Call logOn = Write(kThplogKey, "true");
+    const Call afeOn = Write("odm.thp.debug.afelog", "true");
+    const Call afeOff = Write("odm.thp.debug.afelog", "false");
     const struct {
         const char* command;
+        const char* confirmation;
         std::vector<Call> calls;
     } kRows[] = {
-            {"start", {kSetBootFlag, kStart}},
-            {"stop", {kStop}},
-            {"reboot", {kStop, kSetBootFlag, kStart}},
-            {"log_enable", {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart}},
-            {"log_disable", {Write("persist.sys.zelmor.debug.on", "false")}},
-            {"debugRawEnable", {Write("thp.debug.raw", "true")}},
-            {"debugDifEnable", {Write("thp.debug.raw", "false")}},
-            {"log_afe_enable", {enableAfeLog, kStop, kSetBootFlag, kStart}},
-            {"log_afe_disable", {disableAfeLog, kStop, kSetBootFlag, kStart}},
-            {"showtouch",
-             {Shell("settings put system show_touches 1"),
-              Shell("settings put system pointer_location 1")}},
-            {"showtouch_close",
-             {Shell("settings put system show_touches 0"),
-              Shell("settings put system pointer_location 0")}},
+            {"start", "start corvane_daemon done\n", {kSetBootFlag, kStart}},
+            {"stop", "stop corvane_daemon done\n", {kStop}},
+            {"reboot", "reboot corvane_daemon done\n", {kStop, kSetBootFlag, kStart}},
+            {"log_enable", "enable thplog\n", {logOn, kStop, kSetBootFlag, kStart}},
+            {"log_disable", "disable thplog\n", {Write("persist.sys.zelmor.debug.on", "false")}},
+            {"debugRawEnable", "set thp.debug.raw as 1\n", {Write("thp.debug.raw", "true")}},
+            {"debugDifEnable", "set thp.debug.raw as 0\n", {Write("thp.debug.raw", "false")}},
+            {"log_afe_enable", "enable afehal log\n", {afeOn, kStop, kSetBootFlag, kStart}},
+            {"log_afe_disable", "disable afehal log\n", {afeOff, kStop, kSetBootFlag, kStart}},
+            {"showtouch", "show touch done\n", {Shell(show + "1"), Shell(point + "1")}},
+            {"showtouch_close", "close touch show done\n", {Shell(show + "0"), Shell(point + "0")}},
     };
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.command);
         FakeDevice device;
-        EXPECT_EQ(RunTool({"tpd", row.command}), "\n");
-        EXPECT_THAT(device.calls({kWrite, kShell, kGetService}), ElementsAreArray(row.calls));
-        EXPECT_EQ(device.calls({kLog})[2],
-                  Log(INFO, std::string("ExcuteTpdCmd[145] Get cmd. ") + row.command + "\n"));
+        g_tpdCmd = new TpdCmd;
+        for (const auto addCommands : {AddBasicTpdCmds, AddThplogTpdCmds, AddRawTpdCmds,
+                                       AddAfelogTpdCmds, AddShowtouchTpdCmds}) {
+            addCommands();
+        }
+        EXPECT_EQ(gTpdCmds[row.command].handler(""), row.confirmation);
+        EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(row.calls));
     }
 }
 
-TEST(TpdMainTest, DisablesDebuggingBeforeTheThplog) {
+TEST(TpdMainTest, PrintsAnEmptyLineForALocalCommand) {
     FakeDevice device;
-    device.properties[kThplogKey] = "true";
-    RunTool({"tpd", "log_disable"});
-    EXPECT_EQ(device.calls({kWrite}).front(), Write("persist.sys.zelmor.debug.on", "false"));
-    EXPECT_EQ(device.properties[kThplogKey], "false");
+    EXPECT_EQ(RunTool({"tpd", "stop"}), "\n");
+    EXPECT_THAT(device.calls({kWrite, kGetService}), ElementsAre(kStop));
+    EXPECT_EQ(device.calls({kLog})[2], Log(INFO, "ExcuteTpdCmd[145] Get cmd. stop\n"));
 }
 
 TEST(TpdMainTest, LogsAForwardedCommand) {
