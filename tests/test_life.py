@@ -9,20 +9,21 @@ import pytest
 from virtual_device import LIMIT_S, PASS, wait_until
 
 
-def in_parallel(device, *commands):
-    """Runs `device COMMAND...` for all of the commands at once."""
+def in_parallel(device, commands):
+    """Runs `device COMMAND` for all of the commands at once."""
     with concurrent.futures.ThreadPoolExecutor(len(commands)) as pool:
-        return list(pool.map(lambda command: device.run("device", *command), commands))
+        run = lambda command: device.run("device", *command.split())
+        return list(pool.map(run, commands))
 
 
 def test_is_up_when_start_returns(stopped_device):
-    stopped_device.output("device", "start")
+    stopped_device.start()
     assert stopped_device.is_up()
     assert "running" in stopped_device.output("device", "status")
 
 
 def test_is_stopped_for_all_who_ask_at_once(stopped_device):
-    asked = in_parallel(stopped_device, *[["status"]] * 16)
+    asked = in_parallel(stopped_device, ["status"] * 16)
     assert {(done.returncode, done.stdout) for done in asked} == {(3, "stopped\n")}
 
 
@@ -30,23 +31,22 @@ def test_stops_no_stranger(device):
     device.output("device", "stop")
     with subprocess.Popen(["sleep", str(LIMIT_S)]) as stranger:
         (device.root / "init.lock").write_text(f"{stranger.pid}\n")
-        in_parallel(device, *[["status"], ["stop"]] * 8)
+        in_parallel(device, ["status", "stop"] * 8)
         assert stranger.poll() is None
         stranger.kill()
 
 
-@pytest.mark.parametrize("count", [60, pytest.param(2000, marks=pytest.mark.soak)])
-def test_is_one_device_or_none_whatever_is_asked(stopped_device, count):
-    for _ in range(count // 20):
-        verbs = random.choices(["start", "stop", "status"], k=20)
-        in_parallel(stopped_device, *[[verb] for verb in verbs])
+@pytest.mark.parametrize("rounds", [3, pytest.param(100, marks=pytest.mark.soak)])
+def test_is_one_device_or_none_whatever_is_asked(stopped_device, rounds):
+    for _ in range(rounds):
+        in_parallel(stopped_device, random.choices(["start", "stop", "status"], k=20))
         assert len(stopped_device.processes("/init")) <= 1
-    stopped_device.output("device", "start")
+    stopped_device.start()
     assert stopped_device.is_up()
 
 
 def test_runs_the_commands_of_all_who_start_it_at_once(stopped_device):
-    ran = in_parallel(stopped_device, *[["run", "captest"]] * 4)
+    ran = in_parallel(stopped_device, ["run captest"] * 4)
     assert [done.stdout for done in ran] == [PASS] * 4
 
 
@@ -71,7 +71,7 @@ def test_starts_again_after_a_crash(device):
     device.kill("/init")
     wait_until(lambda: not device.processes())
     (device.root / "tmp/left").write_text("")
-    device.output("device", "start")
+    device.start()
     assert os.listdir(device.root / "tmp") == []
 
 
@@ -93,10 +93,3 @@ def test_boots_in_no_folder_of_somebody_else(stopped_device):
     assert stopped_device.run("device", "start").returncode == 1
     assert letter.read_text() == "Dear"
     letter.unlink()
-
-
-def test_refuses_a_relative_root(stopped_device, tmp_path):
-    relative = stopped_device.env | {"TPD_DEVICE_ROOT": "root"}
-    done = stopped_device.run("device", "start", env=relative, cwd=tmp_path)
-    assert (done.returncode, os.listdir(tmp_path)) == (1, [])
-    assert "absolute" in done.stderr
