@@ -56,9 +56,3 @@ def test_prints_the_events_as_they_were_recorded(trace):
 
 def test_draws_a_sequence_diagram(trace):
     assert_in_order(trace("--mermaid", "captest"), "sequenceDiagram\n", "tool->>", "daemon-->>")
-
-
-def test_refuses_a_second_watcher(device):
-    done = device.run("device", "trace", "captest")
-    assert (done.returncode, done.stdout) == (1, "")
-    assert "trace" in done.stderr

@@ -33,8 +33,9 @@ class Device:
     def __init__(self, folder, build, tool):
         self.root = folder / "device"
         self.tool = tool
+        programs = f"{build}/device/bin", f"{build}/device", f"{SOURCE}/device/host"
         self.env = os.environ | {
-            "PATH": f"{build}/device/bin:{build}/device:{os.environ['PATH']}",
+            "PATH": ":".join([*programs, os.environ["PATH"]]),
             "TPD_BUILD_DIR": str(build),
             "TPD_DEVICE_ROOT": str(self.root),
             "TPD_GET_SERVICE_MS": "300",
@@ -42,8 +43,7 @@ class Device:
 
     def run(self, *command, **options):
         """Runs a program on the device to its end. Each byte is read as one character."""
-        pipes = {"stdout": subprocess.PIPE, "stderr": subprocess.PIPE}
-        options = {"env": self.env, "encoding": "latin-1", **pipes, **options}
+        options = {"env": self.env, "encoding": "latin-1", "capture_output": True} | options
         return subprocess.run(command, check=False, timeout=LIMIT_S, **options)
 
     def output(self, *command, **options):
