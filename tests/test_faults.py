@@ -80,16 +80,6 @@ def test_sends_the_command_whatever_its_output(device, redirection):
     assert len(device.events("command")) == 1
 
 
-ARGUMENTS = {"no UTF-8": "\udcff", "shell syntax": "`touch x`|&", "longest": "x" * 131071}
-
-
-@pytest.mark.parametrize("argument", ARGUMENTS.values(), ids=ARGUMENTS)
-def test_forwards_any_argument(device, tmp_path, argument):
-    text = os.fsencode(argument).decode("latin-1")
-    assert device.tpd(argument, cwd=tmp_path) == f"unknown command: {text}\n"
-    assert os.listdir(tmp_path) == []
-
-
 def test_takes_a_pipe_for_no_log(device):
     (device.root / "log").unlink()
     os.mkfifo(device.root / "log")

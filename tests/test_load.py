@@ -2,7 +2,7 @@
 import concurrent.futures
 import os
 import random
-import threading
+import time
 
 import pytest
 
@@ -52,18 +52,12 @@ def test_fails_only_in_known_ways(device, commands):
         known = f"captest {state}: PASS\n", TIMEOUT, NO_SERVICE
         assert text in known or text.startswith("0P_1P; check_time: ")
 
-    def make_trouble():
-        while not over.wait(0.2):
-            random.choice(TROUBLES)(device)
-
-    over = threading.Event()
     with concurrent.futures.ThreadPoolExecutor() as pool:
-        trouble = pool.submit(make_trouble)
-        try:
-            run_clients(commands, check)
-        finally:
-            over.set()
-    trouble.result()
+        clients = pool.submit(run_clients, commands, check)
+        while not clients.done():
+            random.choice(TROUBLES)(device)
+            time.sleep(0.2)
+    clients.result()
     device.output("device", "fault", "none")
     device.tpd("reboot")
     wait_until(lambda: device.tpd("captest") == PASS)

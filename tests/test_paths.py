@@ -1,13 +1,11 @@
 """Each path that a command can take through the tool, with the simulated daemon"""
-import pytest
-
 from virtual_device import NO_SERVICE, PASS, PERMISSIVE, RESTART, SERVICE, TIMEOUT
 from virtual_device import wait_until
 
 
-@pytest.mark.parametrize("command", ["captest x", "TSA_ExecuteCommand captest x"])
-def test_forwards_a_command(device, command):
-    assert device.tpd(*command.split()) == "captest x: PASS\n"
+def test_forwards_a_command(device):
+    answer = device.tpd("TSA_ExecuteCommand", "captest", "x")
+    assert answer == "captest x: PASS\n"
     assert device.written() == []
 
 
@@ -25,8 +23,8 @@ def test_sets_a_property(device):
 
 def test_switches_the_touch_display(device):
     device.tpd("showtouch")
-    shown = device.output("settings", "list", "system")
-    assert shown == "pointer_location=1\nshow_touches=1\n"
+    listed = device.output("settings", "list", "system")
+    assert listed == "pointer_location=1\nshow_touches=1\n"
 
 
 def test_stops_and_starts_the_daemon(device):
@@ -46,12 +44,11 @@ def test_stores_the_screen_state(device):
 
 def test_refuses_while_selinux_enforces(device):
     device.setprop(PERMISSIVE, "null")
-    refusal = "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
-    assert device.tpd("captest") == refusal
+    assert device.tpd("captest").startswith("please exe 'adb shell setenforce 0'")
     assert device.events("lookup") == []
 
 
-def test_remembers_that_selinux_was_permissive(device):
+def test_forwards_while_selinux_permits(device):
     device.setprop(PERMISSIVE, "null")
     device.output("setenforce", "0")
     assert device.tpd("captest") == PASS
@@ -77,7 +74,7 @@ def test_reports_a_firmware_update(device):
     assert device.tpd("captest").startswith("0P_1P; bypass-when-fw-updating")
 
 
-def test_waits_for_a_daemon_that_is_starting(device):
+def test_waits_for_a_starting_daemon(device):
     device.setprop("sim.boot_delay_ms", "700")
     device.tpd("reboot")
     wait_until(lambda: device.getprop("odm.thp.binder") == "0")
@@ -97,7 +94,7 @@ def test_calls_again_when_the_daemon_dies(device):
     assert device.written() == []
 
 
-def test_restarts_a_daemon_that_dies_in_every_call(device):
+def test_restarts_a_daemon_that_always_dies(device):
     device.output("device", "fault", "die_during")
     assert device.tpd("captest") == TIMEOUT
     assert device.written() == RESTART

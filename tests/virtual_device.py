@@ -51,8 +51,8 @@ class Device:
         assert done.returncode == 0, f"{command}: {done.returncode}, {done.stderr}"
         return done.stdout
 
-    def start(self):
-        self.output("device", "start")
+    def start(self, **options):
+        self.output("device", "start", **options)
 
     def tpd(self, *arguments, **options):
         return self.output(*self.tool, *arguments, **options)
