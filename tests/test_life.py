@@ -11,6 +11,7 @@ from virtual_device import LIMIT_S, PASS, wait_until
 
 @pytest.fixture
 def device(stopped_device):
+    """Never started: each test here does that itself."""
     return stopped_device
 
 
@@ -36,9 +37,9 @@ def test_stops_no_stranger(device):
         stranger.kill()
 
 
-@pytest.mark.parametrize("rounds", [3, pytest.param(100, marks=pytest.mark.soak)])
-def test_is_one_device_or_none_whatever_is_asked(device, rounds):
-    for _ in range(rounds):
+@pytest.mark.parametrize("repeats", [3, pytest.param(100, marks=pytest.mark.soak)])
+def test_is_one_device_or_none_whatever_is_asked(device, repeats):
+    for _ in range(repeats):
         in_parallel(device, random.choices(["start", "stop", "status"], k=20))
         assert len(device.processes("/init")) <= 1
     device.start()

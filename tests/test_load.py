@@ -36,7 +36,7 @@ def test_answers_all_clients(device, commands):
     wait_until(lambda: descriptors(device) == before)
 
 
-TROUBLES = [
+FAULTS = [
     lambda device: device.run("timeout", "-s", "KILL", "0.005", *device.tool, "captest"),
     lambda device: device.kill("corvane_daemon"),
     lambda device: device.tpd("reboot"),
@@ -55,7 +55,7 @@ def test_fails_only_in_known_ways(device, commands):
     with concurrent.futures.ThreadPoolExecutor() as pool:
         clients = pool.submit(run_clients, commands, check)
         while not clients.done():
-            random.choice(TROUBLES)(device)
+            random.choice(FAULTS)(device)
             time.sleep(0.2)
     clients.result()
     device.output("device", "fault", "none")
