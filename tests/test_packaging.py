@@ -1,5 +1,4 @@
 """What is shipped beside the program, and what must agree with it"""
-import json
 import re
 import subprocess
 
@@ -7,50 +6,51 @@ import pytest
 
 from virtual_device import PERMISSIVE, SERVICE, SOURCE, wait_until
 
-
-def output(*command):
-    return subprocess.run(command, check=True, capture_output=True, text=True).stdout
+COMPLETIONS = {
+    "bash": """
+. ./tpd.bash
+COMP_WORDS=(tpd "$@") COMP_CWORD=$#
+_tpd
+echo "${COMPREPLY[@]}"
+""",
+    "zsh": """
+_describe() { echo ${${(P)4}%%:*} }
+compadd() { echo $@ }
+fpath=(.) words=(tpd "$@") CURRENT=$#words
+autoload -U _tpd
+_tpd
+""",
+}
 
 
 def source(path):
     return (SOURCE / path).read_text()
 
 
-def bash_completions(build, *words):
-    script = (
-        '. "$0"; COMP_WORDS=(tpd "$@"); COMP_CWORD=$#; _tpd;'
-        'printf "%s\\n" "${COMPREPLY[@]}"'
-    )
-    return output("bash", "-c", script, f"{build}/completions/tpd.bash", *words).split()
+def output(*command, cwd=SOURCE):
+    return subprocess.check_output(command, cwd=cwd, text=True)
 
 
-def zsh_completions(build, *words):
-    script = (
-        "_describe() { print -l ${${(P)4}%%:*} }; compadd() { print -l $@ };"
-        'fpath=($0); autoload -U _tpd; words=(tpd "$@"); CURRENT=$#words; _tpd'
-    )
-    offered = output("zsh", "-f", "-c", script, f"{build}/completions", *words).split()
-    return [word for word in offered if word.startswith(words[-1])]
+@pytest.fixture(params=COMPLETIONS)
+def complete(request, build):
+    """What a shell offers for the last of some arguments, which is empty."""
+    script = COMPLETIONS[request.param]
+    shell = [request.param, "-f", "-c", script, "complete"]
+    folder = build / "completions"
+    return lambda *words: output(*shell, *words, cwd=folder).split()
 
 
-SHELLS = pytest.mark.parametrize(
-    "completions", [bash_completions, zsh_completions], ids=["bash", "zsh"]
-)
-
-
-@SHELLS
-def test_completes_the_commands_of_the_help(device, build, completions):
+def test_completes_the_commands_of_the_help(device, complete):
     commands = re.findall(r"^\w+$", device.tpd("help"), re.M)
-    assert sorted(completions(build, "")) == sorted(commands)
+    assert sorted(complete("")) == sorted(commands)
 
 
-@SHELLS
-def test_completes_parameters(build, completions):
+def test_completes_parameters(complete):
     modes = ["running_test", "running_test_lasttime"]
-    assert completions(build, "captest", "r") == modes
-    assert completions(build, "TSA_ExecuteCommand", "captest", "r") == modes
-    assert completions(build, "TSA_ExecuteCommand", "THP_SetA") == ["THP_SetAccData"]
-    assert completions(build, "stop", "") == []
+    assert complete("captest", "") == modes
+    assert complete("TSA_ExecuteCommand", "captest", "") == modes
+    assert "THP_SetAccData" in complete("TSA_ExecuteCommand", "")
+    assert complete("stop", "") == []
 
 
 def test_completes_all_that_the_tool_sends_one_way():
@@ -67,8 +67,10 @@ def test_renders_the_manual_page(build):
     assert "debug and control" in done.stdout
 
 
-def page_section(title):
-    return re.search(rf"^\.SH {title}\n(.*?)^\.SH", source("docs/tpd.1"), re.S | re.M)[1]
+def names_in_page(section, pattern):
+    page = source("docs/tpd.1")
+    text = re.search(rf"^{section}\n(.*?)^(\.SH|Written)", page, re.S | re.M)[1]
+    return sorted(re.findall(pattern, text, re.M))
 
 
 def local_commands(device):
@@ -76,55 +78,35 @@ def local_commands(device):
 
 
 def test_describes_all_local_commands(device):
-    described = re.findall(r"^\.TP\n\.B (\w+)$", page_section("LOCAL COMMANDS"), re.M)
-    assert sorted(described) == local_commands(device)
-
-
-def use_all_properties(device):
-    device.setprop(PERMISSIVE, "")
-    device.output("setenforce", "0")
-    device.tpd("captest", "version:3+main")
-    (device.root / SERVICE).unlink()
-    device.tpd("captest")
-    device.setprop("odm.thp.dae_bootflag", "false")
-    for command in [*local_commands(device), "log_enable", "log_disable", "stop"]:
-        device.tpd(command)
-    wait_until(lambda: not device.is_up())
-    device.tpd("captest")
+    described = names_in_page(".SH LOCAL COMMANDS", r"^\.TP\n\.B (\w+)$")
+    assert described == local_commands(device)
 
 
 def test_names_all_properties(device):
-    use_all_properties(device)
-    read = {event["name"] for event in device.events("property_read", who="tpd")}
+    device.setprop(PERMISSIVE, "")
+    device.setprop("odm.thp.dae_bootflag", "false")
+    device.output("setenforce", "0")
+    commands = local_commands(device)
+    (device.root / SERVICE).unlink()
+    device.tpd("captest", "version:3+main")
+    for command in ["log_enable", *commands, "stop"]:
+        device.tpd(command)
+    wait_until(lambda: device.getprop("odm.thp.binder") == "0")
+    device.tpd("captest")
+    reads = device.events("property_read", who="tpd")
+    read = {event["name"] for event in reads}
     written = {key for key, _ in device.written()}
-    named_read, named_written = (
-        set(re.findall(r"^(?:\.B |\\fB)([a-z_]+\.[a-z_.]+)", part, re.M))
-        for part in page_section("PROPERTIES").split("Written, by")
-    )
-    assert written == named_written
-    assert read == named_read | named_written
+    named_read = names_in_page("Read:", r"^\.B ([\w.]+)")
+    named_written = names_in_page("Written, by.*?", r"^\\fB([\w.]+)")
+    assert set(named_written) == written
+    assert {*named_read, *named_written} == read
 
 
-def test_builds_the_same_sources_for_a_device(build):
-    for_device = set(re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp")))
-    product = re.compile(r" -o (bounded_libc/)?CMakeFiles/(tpd\w*|bounded_libc)\.dir/")
-    here = {
-        each["file"].removeprefix(f"{SOURCE}/")
-        for each in json.loads((build / "compile_commands.json").read_text())
-        if product.search(each["command"])
-    }
-    assert here == for_device
-
-
-def test_installs(build, tmp_path):
-    output("cmake", "--install", build, "--prefix", tmp_path)
-    files = [str(file.relative_to(tmp_path)) for file in tmp_path.rglob("*") if file.is_file()]
-    assert sorted(files) == [
-        "bin/tpd",
-        "share/bash-completion/completions/tpd",
-        "share/man/man1/tpd.1",
-        "share/zsh/vendor-completions/_tpd",
-    ]
+def test_builds_the_same_sources_for_a_device():
+    folders = "binder bounded_libc cmdline daemon log main property".split()
+    for_device = re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp"))
+    here = output("find", *folders, "-name", "*.cpp").split()
+    assert sorted(for_device) == sorted(here)
 
 
 def fenced(text):
@@ -137,15 +119,20 @@ def is_at_rest(device):
     return device.is_up() == is_enabled or not device.processes("/init")
 
 
+def run_in_source(device, script):
+    return device.output("bash", "-c", script, cwd=SOURCE)
+
+
 def test_replays_the_session_of_the_readme(stopped_device):
     session = fenced(source("README.md"))
     for step in session.removeprefix("$ ").split("\n$ "):
         command, _, expected = step.partition("\n")
-        stdout = stopped_device.output("bash", "-c", command, cwd=SOURCE)
+        stdout = run_in_source(stopped_device, command)
         assert stdout.rstrip("\n") == expected.rstrip("\n"), command
         wait_until(lambda: is_at_rest(stopped_device))
 
 
 def test_runs_the_ci_example(stopped_device):
-    example = fenced(source("docs/automation.md").split("<!-- ci-example -->\n")[1])
-    stopped_device.output("bash", "-c", example, cwd=SOURCE)
+    page = source("docs/automation.md")
+    example = page.partition("<!-- ci-example -->\n")[2]
+    run_in_source(stopped_device, fenced(example))

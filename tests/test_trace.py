@@ -4,7 +4,7 @@ import re
 
 import pytest
 
-from virtual_device import PASS, TIMEOUT
+from virtual_device import PASS
 
 
 @pytest.fixture
@@ -44,12 +44,6 @@ def test_follows_the_daemon_through_its_death(trace, stopped_device):
     )
 
 
-def test_waits_for_the_daemon_to_be_back(trace, stopped_device):
-    stopped_device.output("device", "fault", "die_during")
-    assert f"result: {TIMEOUT}" in trace("captest")
-    assert stopped_device.is_up()
-
-
 def test_shows_the_bytes_of_the_request(trace):
     assert "00000080: 6361 7074 6573 7400 0000 0000" in trace("--bytes", "captest")
 
@@ -62,9 +56,3 @@ def test_prints_the_events_as_they_were_recorded(trace):
 
 def test_draws_a_sequence_diagram(trace):
     assert_in_order(trace("--mermaid", "captest"), "sequenceDiagram\n", "tool->>", "daemon-->>")
-
-
-def test_refuses_a_second_watcher(device):
-    done = device.run("device", "trace", "captest")
-    assert (done.returncode, done.stdout) == (1, "")
-    assert "trace" in done.stderr
