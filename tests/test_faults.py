@@ -39,7 +39,7 @@ def reply(body=b"", status=0, size=None):
 FAILED_CALLS = {
     "header cut short": b"\0\0\0",
     "body shorter than announced": reply(b"ab\0", size=8),
-    "size beyond the receive buffer": reply(b"x\0", size=2**32 - 1),
+    "larger than the receive buffer": reply(b"r" * 1040384 + b"\0"),
     "status of a failure": reply(status=-22),
 }
 
