@@ -1,5 +1,5 @@
-// The tool with any arguments. The input's first byte chooses the state of the device; the
-// arguments follow, each with a terminating zero.
+// The tool with any arguments, on a device with any kernel command line. The input's first byte
+// chooses the state of the device; the arguments follow, each with a terminating zero.
 #include <cstdio>
 #include <vector>
 
@@ -15,6 +15,7 @@ int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     device.properties["odm.thp.dae_alive"] = state % 3 != 0 ? "true" : "";
     device.properties["odm.thp.is_updating_fw"] = state % 5 == 0 ? "1" : "";
     device.properties["odm.thp.debug.selinux.permissive"] = state % 7 != 0 ? "1" : "";
+    device.kernelCommandLine = ToString(data, size);
     device.lookups = {state % 11 != 0};
     device.answers = {{state % 2 != 0 ? android::OK : android::DEAD_OBJECT}};
 

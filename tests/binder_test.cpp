@@ -58,6 +58,11 @@ TEST_F(BinderTest, LooksTheServiceUpOnce) {
     EXPECT_EQ(android::ProcessState::self()->getDriverName(), "/dev/vndbinder");
 }
 
+TEST_F(BinderTest, TakesAReplyWithoutATextForEmpty) {
+    device.answers = {{android::OK, nullptr}};
+    EXPECT_EQ(RunCmdParms("[TPD]c", ""), "");
+}
+
 TEST_F(BinderTest, TriesAFailedCallOnceMoreOnAFreshLookup) {
     device.lookups = {true, false, true};
     device.answers = {{DEAD_OBJECT}};

@@ -87,6 +87,8 @@ TEST_F(CmdLineTest, ReadsTheFirstLineUpToItsLimit) {
     EXPECT_EQ(CmdLine::GetCmdLine(), "first");
     device.kernelCommandLine = std::string(9000, 'x');
     EXPECT_EQ(CmdLine::GetCmdLine(), std::string(8191, 'x'));
+    device.kernelCommandLine = std::nullopt;
+    EXPECT_EQ(CmdLine::GetCmdLine(), "");
 }
 
 }  // namespace test

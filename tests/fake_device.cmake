@@ -9,6 +9,6 @@ target_link_libraries(tpd_front_end PUBLIC tpd_daemon PRIVATE tpd_build_options)
 # An object library: it comes whole and, unlike platform_device, before the product's archives.
 add_library(fake_device OBJECT ${CMAKE_CURRENT_LIST_DIR}/fake_device.cpp)
 target_link_libraries(fake_device PUBLIC tpd_front_end tpd_log PRIVATE tpd_build_options)
-foreach(function clock_gettime fopen pclose popen system usleep)
+foreach(function fopen pclose popen system usleep)
     target_link_options(fake_device INTERFACE -Wl,--wrap=${function})
 endforeach()

@@ -122,6 +122,10 @@ void FakeDevice::Record(const Call& call) {
 
 using test::gDevice;
 
+static FILE* OpenString(std::optional<std::string>& content, const char* mode) {
+    return content ? fmemopen(content->data(), content->size(), mode) : nullptr;
+}
+
 // No test reaches a device on disk.
 int host::DeviceRoot() { return -1; }
 
@@ -159,20 +163,17 @@ void* operator new(size_t size, const std::nothrow_t& /* tag */) noexcept {
 extern "C" {
 
 FILE* __real_fopen(const char* path, const char* mode);
-int __real_clock_gettime(clockid_t clock, timespec* time);
 
 FILE* __wrap_fopen(const char* path, const char* mode) {
     if (strcmp(path, "/proc/cmdline") != 0) {
         return __real_fopen(path, mode);
     }
-    std::string& line = gDevice->kernelCommandLine;
-    return fmemopen(line.data(), line.size(), mode);
+    return OpenString(gDevice->kernelCommandLine, mode);
 }
 
 FILE* __wrap_popen(const char* command, const char* mode) {
     gDevice->Record(test::Shell(command));
-    std::optional<std::string>& output = gDevice->getenforce;
-    return output ? fmemopen(output->data(), output->size(), mode) : nullptr;
+    return OpenString(gDevice->getenforce, mode);
 }
 
 int __wrap_pclose(FILE* stream) {
@@ -188,13 +189,5 @@ int __wrap_system(const char* command) {
 int __wrap_usleep(useconds_t time) {
     gDevice->Record(test::Pause(std::chrono::microseconds(time)));
     return 0;
-}
-
-int __wrap_clock_gettime(clockid_t clock, timespec* time) {
-    if (gDevice == nullptr || clock != CLOCK_MONOTONIC) {
-        return __real_clock_gettime(clock, time);
-    }
-    *time = gDevice->monotonicClock.value_or(timespec{1, 0});
-    return gDevice->monotonicClock ? 0 : -1;
 }
 }

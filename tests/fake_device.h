@@ -3,7 +3,6 @@
 #pragma once
 
 #include <android/log.h>
-#include <time.h>
 #include <utils/Errors.h>
 
 #include <chrono>
@@ -58,7 +57,7 @@ inline Call TransactOneWay(const std::string& request) { return {kTransactOneWay
 // What the daemon answers to a call.
 struct Answer {
     android::status_t status = android::OK;
-    const char* text = "answer";
+    const char* text = "answer";  // null: the reply has no text
 };
 
 // A device whose daemon is alive, and the tool's process as it is before main. One at a time.
@@ -73,11 +72,10 @@ class FakeDevice {
             {"odm.thp.dae_reboot_times", "0"},
             {"odm.thp.is_updating_fw", "false"},
     };
-    std::set<std::string> rejectedWrites;  // writes to these properties are rejected
-    std::string kernelCommandLine;
+    std::set<std::string> rejectedWrites;               // writes to these properties are rejected
+    std::optional<std::string> kernelCommandLine = "";  // none: it cannot be opened
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
     int getenforceStatus = 0;                               // what closing its output returns
-    std::optional<timespec> monotonicClock = timespec{};    // none: it cannot be read
     int failingAllocation = 0;   // of those that may fail, counted from 1
     std::deque<bool> lookups;    // whether each finds the service; all later ones do
     std::deque<Answer> answers;  // to the calls, in order; all later ones get the default

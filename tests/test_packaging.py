@@ -4,7 +4,7 @@ import subprocess
 
 import pytest
 
-from virtual_device import PERMISSIVE, SERVICE, SOURCE, wait_until
+from virtual_device import SOURCE, wait_until
 
 COMPLETIONS = {
     "bash": """
@@ -82,24 +82,15 @@ def test_describes_all_local_commands(device):
     assert described == local_commands(device)
 
 
-def test_names_all_properties(device):
-    device.setprop(PERMISSIVE, "")
-    device.setprop("odm.thp.dae_bootflag", "false")
-    device.output("setenforce", "0")
-    commands = local_commands(device)
-    (device.root / SERVICE).unlink()
-    device.tpd("captest", "version:3+main")
-    for command in ["log_enable", *commands, "stop"]:
-        device.tpd(command)
-    wait_until(lambda: device.getprop("odm.thp.binder") == "0")
-    device.tpd("captest")
-    reads = device.events("property_read", who="tpd")
-    read = {event["name"] for event in reads}
-    written = {key for key, _ in device.written()}
-    named_read = names_in_page("Read:", r"^\.B ([\w.]+)")
-    named_written = names_in_page("Written, by.*?", r"^\\fB([\w.]+)")
-    assert set(named_written) == written
-    assert {*named_read, *named_written} == read
+def test_names_all_properties_that_the_tool_uses():
+    store = source("property/Property.cpp")
+    client = source("binder/corvane_sys_binder_client.cpp")
+    keys = dict(re.findall(r'{"(\w+)", "([\w.]+)", ".*?"}', store))
+    aliases = set(re.findall(r'(?:Text|Flag|Item)\("(\w+)"', store))
+    used = {keys[alias] for alias in aliases} | set(re.findall(r'"(odm\.\w+\.\w+)"', client))
+    read = names_in_page("Read:", r"^\.B ([\w.]+)")
+    written = names_in_page("Written, by.*?", r"^\\fB([\w.]+)")
+    assert {*read, *written} == used
 
 
 def test_builds_the_same_sources_for_a_device():

@@ -9,12 +9,6 @@ def test_forwards_a_command(device):
     assert device.written() == []
 
 
-def test_lists_commands_of_daemon_and_tool(device):
-    daemon, local = device.tpd("help").split("\n\n//aaa special gTpdCmds\n")
-    assert "THP_SetFoldState" in daemon
-    assert local.startswith("debugDifEnable\n")
-
-
 def test_sets_a_property(device):
     assert device.tpd("debugRawEnable") == "\n"
     assert device.written() == [("thp.debug.raw", "true")]
@@ -25,21 +19,6 @@ def test_switches_the_touch_display(device):
     device.tpd("showtouch")
     listed = device.output("settings", "list", "system")
     assert listed == "pointer_location=1\nshow_touches=1\n"
-
-
-def test_stops_and_starts_the_daemon(device):
-    device.tpd("stop")
-    wait_until(lambda: device.getprop("odm.thp.binder") == "0")
-    device.tpd("start")
-    wait_until(device.is_up)
-    assert device.written() == RESTART
-    assert device.restarts() == 0
-
-
-def test_stores_the_screen_state(device):
-    state = "version:3+main,1"
-    assert device.tpd("captest", state) == f"captest {state}: PASS\n"
-    assert device.written() == [("odm.thp.screen_status", state)]
 
 
 def test_refuses_while_selinux_enforces(device):
@@ -74,13 +53,6 @@ def test_reports_a_firmware_update(device):
     wait_until(lambda: device.getprop("odm.thp.is_updating_fw") == "true")
     answer = device.tpd("captest")
     assert answer.startswith("0P_1P; bypass-when-fw-updating")
-
-
-def test_waits_for_a_starting_daemon(device):
-    device.setprop("sim.boot_delay_ms", "700")
-    device.tpd("reboot")
-    wait_until(lambda: device.getprop("odm.thp.binder") == "0")
-    assert device.tpd("captest") == PASS
 
 
 def test_restarts_a_daemon_without_a_service(device):

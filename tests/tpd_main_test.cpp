@@ -45,6 +45,21 @@ TEST(TpdMainTest, ForwardsCommands) {
     }
 }
 
+TEST(TpdMainTest, DoesNothingWithOtherArguments) {
+    const std::vector<std::string> kRows[] = {
+            {},
+            {"tpd", "TSA_ExecuteCommand", "", "b"},
+            {"tpd", "TSA_ExecuteCommands", "a", "b"},
+            {"tpd", "TSA_ExecuteCommand", "a", "b", "c"},
+    };
+    for (const auto& arguments : kRows) {
+        SCOPED_TRACE(testing::PrintToString(arguments));
+        FakeDevice device;
+        EXPECT_EQ(RunTool(arguments), "\n");
+        EXPECT_THAT(device.calls({kRead, kWrite, kGetService}), IsEmpty());
+    }
+}
+
 TEST(TpdMainTest, CarriesOutLocalCommands) {
     const std::string show = "settings put system show_touches ";
     const std::string point = "settings put system pointer_location ";
@@ -79,6 +94,14 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
         EXPECT_EQ(gTpdCmds[row.command].handler(""), row.confirmation);
         EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(row.calls));
     }
+}
+
+TEST(TpdMainTest, DisablesDebuggingBeforeTheThplog) {
+    FakeDevice device;
+    device.properties[kThplogKey] = "true";
+    RunTool({"tpd", "log_disable"});
+    EXPECT_THAT(device.calls({kWrite}), SizeIs(7));
+    EXPECT_EQ(device.calls({kWrite})[0], Write("persist.sys.zelmor.debug.on", "false"));
 }
 
 TEST(TpdMainTest, PrintsAnEmptyLineForALocalCommand) {
