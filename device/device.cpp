@@ -207,7 +207,7 @@ int Shell(int argc, char** argv) {
     for (int i = 1; i < argc; ++i) {
         command.append(" ").append(argv[i]);
     }
-    return Become("/bin/sh", {"sh", "-c", command.c_str()});
+    return Become("/bin/sh", {"sh", "-c", "--", command.c_str()});
 }
 
 int BecomeBeside(const char* name, int argc, char** argv) {
@@ -223,13 +223,6 @@ int Run(int argc, char** argv) {
 
 int Trace(int argc, char** argv) {
     return FindInit() != 0 ? BecomeBeside("trace.py", argc, argv) : Fail("is stopped");
-}
-
-bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
-    char* end = nullptr;
-    errno = 0;
-    const int64_t number = strtoll(text.c_str(), &end, 10);
-    return errno == 0 && !text.empty() && *end == '\0' && number >= min && number <= max;
 }
 
 int ListFaults() {
@@ -254,9 +247,9 @@ int Fault(int argc, char** argv) {
     const int arguments = fault != nullptr && fault->argument != nullptr ? 2 : 1;
     const std::string argument = arguments == 2 && argc > 1 ? argv[1] : "";
     const std::string count = argc > arguments ? argv[arguments] : "";
-    if (fault == nullptr || argc > arguments + 1 ||
-        (arguments == 2 && !IsNumberWithin(argument, fault->min, fault->max)) ||
-        (argc > arguments && !IsNumberWithin(count, 1, INT32_MAX))) {
+    if (fault == nullptr || argc > arguments + (fault == &device::kNoFault ? 0 : 1) ||
+        (arguments == 2 && !device::IsNumberWithin(argument, fault->min, fault->max)) ||
+        (argc > arguments && !device::IsNumberWithin(count, 1, INT32_MAX))) {
         Fail("no such fault, argument or count; `device fault` lists what there is");
         return kWrongUse;
     }
@@ -282,7 +275,9 @@ constexpr struct {
 int main(int argc, char** argv) {
     for (const auto& verb : kVerbs) {
         if (argc > 1 && argv[1] == std::string(verb.name) && argc - 2 <= verb.maxArguments) {
-            return host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
+            const int status = host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
+            const bool isWritten = fflush(stdout) == 0 && ferror(stdout) == 0;
+            return isWritten ? status : Fail(std::string("cannot write: ") + strerror(errno));
         }
     }
     return Usage();

@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -34,6 +35,8 @@ void FillStandardDescriptors() {
 
 int OpenRoot() {
     FillStandardDescriptors();
+    // A device's log and properties know no limit of file size: writes fail as on a full disk.
+    signal(SIGXFSZ, SIG_IGN);
     const std::string path = DeviceRootPath();
     if (path.empty()) {
         return Refuse("", "neither TPD_DEVICE_ROOT, XDG_STATE_HOME nor HOME names a place for it");

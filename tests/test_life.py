@@ -100,3 +100,13 @@ def test_refuses_a_relative_root(stopped_device, tmp_path):
     done = stopped_device.run("device", "start", env=relative, cwd=tmp_path)
     assert (done.returncode, os.listdir(tmp_path)) == (1, [])
     assert "absolute" in done.stderr
+
+
+def test_boots_through_no_link(stopped_device, tmp_path):
+    letter = tmp_path / "letter"
+    letter.write_text("Dear")
+    stopped_device.root.mkdir(mode=0o700)
+    (stopped_device.root / "init.lock").write_text("")
+    (stopped_device.root / "properties").symlink_to(tmp_path)
+    assert stopped_device.run("device", "start").returncode == 1
+    assert os.listdir(tmp_path) == ["letter"]

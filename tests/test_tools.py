@@ -134,3 +134,10 @@ def test_refuses_other_uses_of_adb(adb):
     done = adb("push", "a", "b")
     assert done.returncode == 1
     assert "push" in done.stderr
+
+
+def test_leaves_no_trace_when_it_is_ended(stopped_device):
+    stopped_device.output("device", "start", "--permissive")
+    stopped_device.output("device", "fault", "hang", "60000")
+    stopped_device.run("timeout", "1", "device", "trace", "captest")
+    assert not (stopped_device.root / "trace").exists()
