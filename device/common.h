@@ -3,6 +3,7 @@
 
 #include <sys/system_properties.h>
 
+#include <cerrno>
 #include <cstdint>
 #include <cstdlib>
 #include <filesystem>
@@ -33,6 +34,14 @@ inline int64_t GetPropertyNumber(const char* key) {
     return strtoll(GetProperty(key).c_str(), nullptr, 10);
 }
 
+// Whether the text is a whole decimal number from `min` to `max`.
+inline bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
+    char* end = nullptr;
+    errno = 0;
+    const int64_t number = strtoll(text.c_str(), &end, 10);
+    return errno == 0 && !text.empty() && *end == '\0' && number >= min && number <= max;
+}
+
 // Whether the daemon says that it lives and that its service is published.
 inline bool IsDaemonAlive() {
     return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";
@@ -47,9 +56,9 @@ inline bool IsDaemonEnabled() {
 // The content of a file of the device root; `missing` when it cannot be read. No file is larger
 // than an argument of a program can be.
 inline std::string ReadText(const std::string& path, const char* missing) {
-    char text[131072];
-    const ssize_t length = host::ReadFile(path, text, sizeof(text));
-    return length < 0 ? missing : std::string(text, static_cast<size_t>(length));
+    std::string text(131072, '\0');
+    const ssize_t length = host::ReadFile(path, text.data(), text.size());
+    return length < 0 ? missing : text.substr(0, static_cast<size_t>(length));
 }
 
 // What `getenforce` prints: Enforcing, Permissive or Disabled.

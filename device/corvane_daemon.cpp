@@ -151,7 +151,7 @@ class DaemonService : public android::BBinder {
                                      android::Parcel* reply) {
         const Fault* const fault = TakeFault(command);
         const int64_t argument =
-                fault->argument != nullptr ? GetPropertyNumber("sim.fault_arg") : 0;
+                std::clamp(GetPropertyNumber("sim.fault_arg"), fault->min, fault->max);
         if (fault == &device::kDieBefore) {
             Die();
         }
@@ -171,7 +171,7 @@ class DaemonService : public android::BBinder {
         } else if (fault == &device::kNoText) {
             return android::OK;
         } else if (fault == &device::kHuge) {
-            text.assign(static_cast<size_t>(std::max(argument, int64_t{0})), '#');
+            text.assign(static_cast<size_t>(argument), '#');
         }
         return reply->writeCString(text.c_str());
     }

@@ -68,6 +68,12 @@ bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
     return true;
 }
 
+// What the process runs; empty when it has ended. The name of a replaced file grows by a word.
+std::filesystem::path ProgramOf(pid_t process) {
+    std::error_code error;
+    return std::filesystem::read_symlink("/proc/" + std::to_string(process) + "/exe", error);
+}
+
 // The process that runs the device, or 0.
 pid_t FindInit() {
     const int file = openat(host::DeviceRoot(), device::kInitLock,
@@ -77,15 +83,15 @@ pid_t FindInit() {
     const bool isHeld = file >= 0 && fcntl(file, F_GETLK, &holder) == 0 &&
                         holder.l_type != F_UNLCK && holder.l_pid > 0;
     close(file);
-    return isHeld ? holder.l_pid : 0;
+    // A stranger may hold a lock, too.
+    const bool isInit = isHeld && ProgramOf(holder.l_pid).filename().string().rfind("init", 0) == 0;
+    return isInit ? holder.l_pid : 0;
 }
 
 // Whether the process, unless it has just ended, runs the init that was built last.
 bool IsCurrentBuild(pid_t init) {
-    std::error_code error;
-    const std::string exe = "/proc/" + std::to_string(init) + "/exe";
-    const std::filesystem::path program = std::filesystem::read_symlink(exe, error);
-    return error || program == device::PathBesideProgram("init");
+    const std::filesystem::path program = ProgramOf(init);
+    return program.empty() || program == device::PathBesideProgram("init");
 }
 
 // Asks init to end, and ends it when it does not. The descriptor stands for this one process even
@@ -207,7 +213,7 @@ int Shell(int argc, char** argv) {
     for (int i = 1; i < argc; ++i) {
         command.append(" ").append(argv[i]);
     }
-    return Become("/bin/sh", {"sh", "-c", command.c_str()});
+    return Become("/bin/sh", {"sh", "-c", "--", command.c_str()});
 }
 
 int BecomeBeside(const char* name, int argc, char** argv) {
@@ -223,13 +229,6 @@ int Run(int argc, char** argv) {
 
 int Trace(int argc, char** argv) {
     return FindInit() != 0 ? BecomeBeside("trace.py", argc, argv) : Fail("is stopped");
-}
-
-bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
-    char* end = nullptr;
-    errno = 0;
-    const int64_t number = strtoll(text.c_str(), &end, 10);
-    return errno == 0 && !text.empty() && *end == '\0' && number >= min && number <= max;
 }
 
 int ListFaults() {
@@ -254,9 +253,9 @@ int Fault(int argc, char** argv) {
     const int arguments = fault != nullptr && fault->argument != nullptr ? 2 : 1;
     const std::string argument = arguments == 2 && argc > 1 ? argv[1] : "";
     const std::string count = argc > arguments ? argv[arguments] : "";
-    if (fault == nullptr || argc > arguments + 1 ||
-        (arguments == 2 && !IsNumberWithin(argument, fault->min, fault->max)) ||
-        (argc > arguments && !IsNumberWithin(count, 1, INT32_MAX))) {
+    if (fault == nullptr || argc > arguments + (fault == &device::kNoFault ? 0 : 1) ||
+        (arguments == 2 && !device::IsNumberWithin(argument, fault->min, fault->max)) ||
+        (argc > arguments && !device::IsNumberWithin(count, 1, INT32_MAX))) {
         Fail("no such fault, argument or count; `device fault` lists what there is");
         return kWrongUse;
     }
@@ -282,7 +281,9 @@ constexpr struct {
 int main(int argc, char** argv) {
     for (const auto& verb : kVerbs) {
         if (argc > 1 && argv[1] == std::string(verb.name) && argc - 2 <= verb.maxArguments) {
-            return host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
+            const int status = host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
+            const bool isWritten = fflush(stdout) == 0 && ferror(stdout) == 0;
+            return isWritten ? status : Fail(std::string("cannot write: ") + strerror(errno));
         }
     }
     return Usage();

@@ -59,14 +59,19 @@ void Remove(const std::string& path) {
 
 // Whether a boot, which removes files, destroys nothing of anybody else's: the folder was booted
 // before, or has only what the tool and the device's commands make. These leave nothing in tmp and
-// no log without properties.
+// no log without properties. A symbolic link would lead the boot to files elsewhere.
 bool IsDeviceRoot() {
     const std::set<std::string> files = device::FilesIn(".");
     const std::set<std::string> own = {"dev",     "log",      "proc", "properties",
                                        "selinux", "settings", "tmp",  "trace"};
-    return files.count(device::kInitLock) > 0 ||
-           (device::FilesIn("tmp").empty() && files.count("log") <= files.count("properties") &&
-            std::includes(own.begin(), own.end(), files.begin(), files.end()));
+    const bool hasLink = std::any_of(files.begin(), files.end(), [](const std::string& name) {
+        std::error_code error;
+        return std::filesystem::is_symlink(host::DeviceRootPath() + "/" + name, error);
+    });
+    return !hasLink &&
+           (files.count(device::kInitLock) > 0 ||
+            (device::FilesIn("tmp").empty() && files.count("log") <= files.count("properties") &&
+             std::includes(own.begin(), own.end(), files.begin(), files.end())));
 }
 
 // Makes this process the device's one init. The kernel ends a record lock when the process closes
@@ -238,14 +243,17 @@ void ReportBoot() {
 }  // namespace
 
 int main(int argc, char** argv) {
-    if (argc != 2 || !LeaveCaller() || host::DeviceRoot() < 0) {
+    if (argc != 2) {
+        return Fail("usage", "init MODE");
+    }
+    if (!LeaveCaller() || host::DeviceRoot() < 0) {
         return 1;
     }
     if (!IsDeviceRoot()) {
         return Fail(host::DeviceRootPath().c_str(), "has files that are no device's; nothing done");
     }
     if (!LockDevice()) {
-        return Fail("this device runs already", strerror(errno));
+        return Fail("cannot lock init.lock", strerror(errno));
     }
     if (!Boot(argv[1])) {
         return Fail("cannot write to the device root", strerror(errno));

@@ -83,7 +83,7 @@ int Settings(int argc, char** argv) {
     const std::string folder = "settings/" + space + "/";
     const std::string path = folder + key;
     if ((space != "system" && space != "secure" && space != "global") || key[0] == '.' ||
-        key.find('/') != std::string::npos) {
+        (argc > 3 && key.empty()) || key.find('/') != std::string::npos) {
         return kWrongUse;
     }
     if (verb == "list" && argc == 3) {
@@ -206,13 +206,16 @@ int Logcat(int argc, char** argv) {
         follows &= option != 'd' && option != 't';
         file = option == 'f' ? optarg : file;
         format = option == 'v' ? optarg : format;
-        count = option == 't' ? strtoul(optarg, nullptr, 10) : count;
+        if (option == 't') {
+            isRight &= device::IsNumberWithin(optarg, 1, INT64_MAX);
+            count = strtoul(optarg, nullptr, 10);
+        }
         if (option == 's') {
             filters[kOtherTags] = ANDROID_LOG_SILENT;
         }
     }
     const std::set<std::string> formats = {"threadtime", "brief", "epoch", "raw"};
-    isRight &= formats.count(format) > 0 && count > 0;
+    isRight &= formats.count(format) > 0;
     for (; optind < argc; ++optind) {
         isRight &= AddLogFilter(argv[optind], filters);
     }
@@ -222,10 +225,13 @@ int Logcat(int argc, char** argv) {
     if (clears) {
         return host::WriteFile(host::kLogFile, "") ? 0 : Fail("cannot empty the log");
     }
-    std::ifstream log(host::DeviceRootPath() + "/" + host::kLogFile, std::ios::binary);
-    if (!log.is_open()) {
+    // What nobody can log to is no log. A FIFO, for example, would never end.
+    const int writable = host::OpenForAppending(host::kLogFile, 0);
+    if (writable < 0) {
         return Fail("no log");
     }
+    close(writable);
+    std::ifstream log(host::DeviceRootPath() + "/" + host::kLogFile, std::ios::binary);
     if (file != nullptr && freopen(file, "a", stdout) == nullptr) {
         return Fail(file);
     }

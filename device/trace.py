@@ -79,7 +79,7 @@ def is_at_rest(events):
     life = [event["what"] for event in events
             if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")]
     return (life[-1:] not in (["restart_pause"], ["daemon_start"])
-            and time.monotonic() - events[-1]["time"] > QUIET_S)
+            and (not events or time.monotonic() - events[-1]["time"] > QUIET_S))
 
 
 def record(arguments):
@@ -119,6 +119,8 @@ def main():
     form.add_argument("--mermaid", action="store_true", help="print a sequence diagram")
     parser.add_argument("arguments", nargs=argparse.REMAINDER, metavar="ARGUMENT")
     options = parser.parse_args()
+    sys.stdout.reconfigure(errors="backslashreplace")
+    signal.signal(signal.SIGTERM, signal.default_int_handler)
     try:
         os.close(os.open(TRACE, os.O_CREAT | os.O_EXCL, 0o600))
     except FileExistsError:
@@ -139,4 +141,7 @@ def main():
 
 
 if __name__ == "__main__":
-    main()
+    try:
+        main()
+    except OSError as error:
+        sys.exit(f"device: {error}")

@@ -94,3 +94,13 @@ def test_boots_in_no_folder_of_somebody_else(device):
     letter.write_text("Dear")
     assert device.run("device", "start").returncode == 1
     assert letter.read_text() == "Dear"
+
+
+def test_boots_through_no_link(device, tmp_path):
+    letter = tmp_path / "letter"
+    letter.write_text("Dear")
+    device.root.mkdir(mode=0o700)
+    (device.root / "init.lock").write_text("")
+    (device.root / "properties").symlink_to(tmp_path)
+    assert device.run("device", "start").returncode == 1
+    assert os.listdir(tmp_path) == ["letter"]
