@@ -12,12 +12,10 @@ namespace {
 
 // The request says where to read.
 class EchoService : public android::BBinder {
-    android::status_t onTransact(uint32_t code, const android::Parcel& data, android::Parcel* reply,
-                                 uint32_t /* flags */) override {
+    android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
+                                 android::Parcel* reply, uint32_t /* flags */) override {
         data.setDataPosition(static_cast<size_t>(data.readInt32()));
-        if (code == 0) {
-            data.enforceInterface(android::String16("x"));
-        }
+        data.enforceInterface(android::String16("x"));
         const char* const text = data.readCString();
         Check(data.dataPosition() <= data.dataSize());
         return reply->writeCString(text);

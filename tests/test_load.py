@@ -40,7 +40,6 @@ FAULTS = [
     lambda device: device.run("timeout", "-s", "KILL", "0.005", *device.tool, "captest"),
     lambda device: device.kill("corvane_daemon"),
     lambda device: device.tpd("reboot"),
-    lambda device: device.setprop("odm.thp.dae_alive", "0"),
     lambda device: device.output("device", "fault", "die_after", "9"),
 ]
 

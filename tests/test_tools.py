@@ -5,7 +5,7 @@ from subprocess import PIPE, Popen
 
 import pytest
 
-from virtual_device import PASS, SOURCE
+from virtual_device import PASS
 
 
 def test_takes_any_legal_name_for_a_property(device):
