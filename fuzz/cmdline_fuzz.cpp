@@ -1,4 +1,4 @@
-// The reader of the kernel command line, over any bytes.
+// The parser of the kernel command line, with any bytes as that line.
 #include "cmdline/CmdLine.h"
 #include "fuzz.h"
 #include "tests/fake_device.h"

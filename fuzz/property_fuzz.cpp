@@ -1,4 +1,4 @@
-// The properties of a device root whose files hold any bytes, and writes of any name and value.
+// Reads of a property whose file has any bytes, and writes of any name and value.
 #include <sys/system_properties.h>
 #include <unistd.h>
 

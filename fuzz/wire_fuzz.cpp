@@ -1,5 +1,5 @@
-// Both ends of a connection, with a peer that sends the input, never reads and hangs up; and the
-// reading of its parcels, in the order that the call's code gives.
+// Client and service of a connection, with a peer that sends the input, never reads and hangs up.
+// The service reads the values of a request in an order that the call's code chooses.
 #include <binder/Parcel.h>
 #include <sys/socket.h>
 #include <sys/time.h>
@@ -32,14 +32,14 @@ class EchoService : public android::BBinder {
     }
 };
 
-// Our end of a new connection to such a peer, and the peer's.
+// Connects to such a peer. Returns our end of the connection; the peer's is in `peer`.
 int Connect(const uint8_t* data, size_t size, int& peer) {
     int ends[2];
     Check(socketpair(AF_UNIX, SOCK_STREAM, 0, ends) == 0);
     peer = ends[1];
     Check(send(peer, data, size, 0) == static_cast<ssize_t>(size));
     shutdown(peer, SHUT_WR);
-    // A few hundred messages fill the buffer that nobody reads. Then the peer counts as gone.
+    // A few hundred messages fill the peer's buffer, which it never reads. Then it counts as gone.
     const timeval shortest = {0, 1};
     Check(setsockopt(ends[0], SOL_SOCKET, SO_SNDTIMEO, &shortest, sizeof(shortest)) == 0);
     return ends[0];
