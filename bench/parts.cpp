@@ -1,5 +1,5 @@
 // The tool's parts inside one process, each beside a baseline that does the same work directly.
-// Wants an empty device root, and one processor for itself and its service's thread: where the
+// Needs an empty device root, and one processor for itself and its service's thread: where the
 // scheduler puts the two is not what is measured.
 #include <benchmark/benchmark.h>
 
@@ -34,7 +34,7 @@ constexpr char kKey[] = "odm.thp.dae_alive";
 constexpr int kLargestReply =
         host::kMaxTransactionBytes - 4;  // bytes; the rest is terminator and padding
 
-// The daemon: its answer has as many bytes as the command says.
+// The daemon: the command is the number of bytes of its answer.
 class Service : public android::BBinder {
     android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
                                  android::Parcel* reply, uint32_t /* flags */) override {
@@ -46,7 +46,7 @@ class Service : public android::BBinder {
     std::string mText;
 };
 
-// What a look at a property costs at least.
+// The system calls of one read of a property.
 void ReadBaseline(State& state) {
     char value[PROP_VALUE_MAX];
     for (auto _ : state) {
@@ -76,7 +76,7 @@ void SetSameTpd(State& state) {
 }
 BENCHMARK(SetSameTpd)->Name("Set, no change/tpd");
 
-// With the time of the service's thread.
+// The processor time includes that of the service's thread.
 void EachReply(benchmark::internal::Benchmark* run) {
     run->MeasureProcessCPUTime()->Arg(16)->Arg(4096)->Arg(kLargestReply);
 }

@@ -1,5 +1,5 @@
 // The daemon's binder interface as a client sees it: one operation, "execute this command with
-// these parameters and answer with a text".
+// these parameters and answer with a string".
 #pragma once
 
 #include <string>
@@ -28,8 +28,8 @@ class ICorvaneInterfaceClient : public android::IInterface {
     // Has the daemon execute `cmd` with `params`. A command that carries kTwoWayMarker is sent
     // without everything up to and including it, and always two-way; any other goes one-way when
     // the lists below name it. Two-way: returns 0 with the daemon's answer in `reply` (empty when
-    // it answered without a text), or the transport's status with `reply` untouched. One-way:
-    // `reply` is "OK" whatever the status says.
+    // it answered without a string), or the transport's status with `reply` untouched. One-way:
+    // `reply` is "OK" whatever the status is.
     virtual android::status_t ExecuteCommand(std::string& reply, std::string cmd,
                                              std::string params) = 0;
 };
@@ -44,7 +44,7 @@ class BpCorvaneInterfaceClient : public android::BpInterface<ICorvaneInterfaceCl
 };
 
 // Records the daemon's death in the log and ends its own registration. It repairs nothing: the next
-// call on the dead binder fails, and the runner looks the service up afresh.
+// call on the dead binder fails, and the runner looks the service up again.
 class MyDeathRecipient : public android::IBinder::DeathRecipient {
   public:
     explicit MyDeathRecipient(const android::sp<android::IBinder>& binder);
@@ -56,7 +56,7 @@ class MyDeathRecipient : public android::IBinder::DeathRecipient {
     android::sp<android::IBinder> mBinder;
 };
 
-// Whether any entry of `list` occurs in `text`, byte for byte; an empty entry occurs in every text.
+// Whether any entry of `list` occurs in `text`, byte for byte; an empty entry occurs everywhere.
 bool IsAsync(const std::vector<std::string>& list, std::string text);
 
 // What is sent one-way: matched against the command and against the parameters. Read-only.

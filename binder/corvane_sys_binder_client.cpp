@@ -91,8 +91,8 @@ constexpr const char* kNoTag = nullptr;
 const android::StaticString16 kDescriptor(
         u"android.CorvaneInterfaceServer.ICorvaneInterfaceService");
 
-// Writes until the value reads back, a bounded number of times. A write that never takes leaves
-// only its log lines.
+// Writes until the value reads back, a bounded number of times. Of a rejected write only its log
+// lines remain.
 void SetProperty(std::string key, std::string value) {
     char current[kPropertyBufferBytes] = {};
     for (int writes = 0; writes < kPropertyWrites; ++writes) {

@@ -11,8 +11,8 @@ constexpr char kNoServicePrefix[] = "0F_1F; ";
 
 // Has the daemon execute `cmd` with `params` and returns its answer ("OK" for a one-way call). A
 // failed call is tried once more on a fresh service lookup. When the service cannot be obtained the
-// answer begins with kNoServicePrefix, when both calls fail it contains "ERROR"; either way the
-// daemon has then been told to restart. Blocks until the daemon answers: the call has no time-out.
+// answer begins with kNoServicePrefix, when both calls fail it contains "ERROR"; either way a
+// restart of the daemon was requested. Blocks until the daemon answers: the call has no time-out.
 std::string RunCmdParms(std::string cmd, std::string params);
 
 // Restarts the daemon by switching its service property off and on.

@@ -18,7 +18,8 @@ errno_t memset_s(void* dest, size_t destMax, int c, size_t count) {
 
 namespace {
 
-// One word into `word` of `size` bytes; whether there was one and it fitted.
+// Reads up to the next white space into `word` of `size` bytes. False at the end of the input and
+// for a word that does not fit.
 bool ReadWord(FILE* stream, char* word, size_t size) {
     if (word == nullptr || size == 0) {
         return false;

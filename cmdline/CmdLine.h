@@ -1,4 +1,4 @@
-// How the device was booted, as the kernel command line tells it.
+// How the device was booted, from the kernel command line.
 #pragma once
 
 #include <string>

@@ -1,4 +1,4 @@
-// Flat texts of key/value pairs, such as the kernel command line, as a lookup table.
+// Strings of key/value pairs, such as the kernel command line, as a lookup table.
 #pragma once
 
 #include <map>

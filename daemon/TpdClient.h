@@ -15,13 +15,13 @@ class TpdClient {
     std::string ThpExecuteCmdParams(std::string cmd, std::string params);
 
     // Sends one command without waiting. For a capacity test the answer grows by a failure text
-    // when the daemon is not alive afterwards or its reboot indicator changed underneath it.
+    // when the daemon is not alive afterwards or its reboot indicator changed meanwhile.
     std::string RunCmd(const char* cmd, const char* params);
 
     // Whether this is a capacity test in running-test mode.
     static bool IsCaptestInRt(std::string cmd, std::string params);
 
-    // Whether the daemon is up and its binder service published; appends how both stand to `info`.
+    // Whether the daemon is up and its binder service published; appends both states to `info`.
     static bool IsDaemonAlive(std::string& info);
 
     // Checks at most `checks` times, 200 ms apart, whether the daemon is alive, and returns a

@@ -1,4 +1,4 @@
-// The daemon's controller: starts, stops and restarts it, switches its log, and tells whether
+// The daemon's controller: starts, stops and restarts it, switches its log, and checks whether
 // SELinux lets commands through to it. It never handles the process itself; it writes the daemon's
 // control properties and the platform acts on them.
 #pragma once
@@ -21,7 +21,7 @@ class TpdCmd {
     static bool IsThplogEnable();
 
     // Switch the touch-processing log and restart the daemon so that it takes effect. They do
-    // nothing in upgrade mode or when the log already stands as asked.
+    // nothing in upgrade mode or when the log is in that state already.
     void EnableThplog();
     void DisableThplog();
 
@@ -29,11 +29,11 @@ class TpdCmd {
     static uint64_t GetMonotonicTime();
 
     // Whether commands may be forwarded to the daemon: when a stored flag, upgrade mode, a factory
-    // build or a permissive SELinux says so. The last is stored in a property for later runs. Any
-    // failure to find out means no.
+    // build or a permissive SELinux says so. A permissive SELinux is stored in a property for later
+    // runs. Any failure to find out means no.
     bool IsSelinuxPermissive();
 
-    // The client, null before Init() succeeded. It stays the controller's.
+    // The client, null before Init() succeeded. The controller owns it.
     TpdClient* GetTpdclient() const;
 
   private:

@@ -8,9 +8,9 @@
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size);
 
-// Stops the run and keeps the input when something does not hold.
-inline void Check(bool holds) {
-    if (!holds) {
+// Stops the run and keeps the input when the condition is false.
+inline void Check(bool condition) {
+    if (!condition) {
         abort();
     }
 }

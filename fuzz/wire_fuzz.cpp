@@ -1,5 +1,4 @@
-// Both ends of a connection, with a peer that sends the input, never reads and hangs up; and the
-// reading of its parcels.
+// Client and service of a connection, with a peer that sends the input, never reads and hangs up.
 #include <binder/Parcel.h>
 #include <sys/socket.h>
 #include <sys/time.h>
@@ -22,15 +21,15 @@ class EchoService : public android::BBinder {
     }
 };
 
-// Our end of a new connection to such a peer, and the peer's. The socket's buffer takes every input
-// that scripts/fuzz makes.
+// Connects to such a peer. Returns our end of the connection; the peer's is in `peer`. The socket's
+// buffer takes every input that scripts/fuzz makes.
 int Connect(const uint8_t* data, size_t size, int& peer) {
     int ends[2];
     Check(socketpair(AF_UNIX, SOCK_STREAM, 0, ends) == 0);
     peer = ends[1];
     Check(send(peer, data, size, 0) == static_cast<ssize_t>(size));
     shutdown(peer, SHUT_WR);
-    // A few hundred messages fill the buffer that nobody reads. Then the peer counts as gone.
+    // A few hundred messages fill the peer's buffer, which it never reads. Then it counts as gone.
     const timeval shortest = {0, 1};
     Check(setsockopt(ends[0], SOL_SOCKET, SO_SNDTIMEO, &shortest, sizeof(shortest)) == 0);
     return ends[0];

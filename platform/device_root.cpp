@@ -15,15 +15,15 @@ namespace host {
 
 namespace {
 
-bool IsSet(const char* text) { return text != nullptr && *text != '\0'; }
+bool IsSet(const char* value) { return value != nullptr && *value != '\0'; }
 
 int Refuse(const std::string& path, const char* why) {
     fprintf(stderr, "device root %s: %s\n", path.c_str(), why);
     return -1;
 }
 
-// Standard descriptors that were closed must not become files of the device, which the program's
-// output would go to.
+// Opens closed standard descriptors. A file of the device must not get the number of one, since the
+// program's output would go to that file.
 void FillStandardDescriptors() {
     int null = open("/dev/null", O_RDWR);
     while (null >= 0 && null <= STDERR_FILENO) {
@@ -77,7 +77,7 @@ std::string DeviceRootPath() {
     } else if (const char* const home = getenv("HOME"); IsSet(home)) {
         path = std::string(home) + "/.local/state/tpd-device";
     }
-    // A trailing slash would follow a symbolic link in the folder's place.
+    // With a trailing slash open() would follow a symbolic link.
     while (path.length() > 1 && path.back() == '/') {
         path.pop_back();
     }

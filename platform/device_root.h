@@ -9,9 +9,9 @@ namespace host {
 // directory. Empty when the environment names neither.
 std::string DeviceRootPath();
 
-// A descriptor of it for the *at() calls, which the process keeps. The folder is made when it is
-// missing. -1, after one message on standard error, when it cannot be made or is not a folder of
-// this user's own, closed to everybody else and named by an absolute path.
+// A descriptor of that folder for the *at() calls; the process keeps it open. A missing folder is
+// made. -1, after one message on standard error, when the path is not absolute, when the folder
+// cannot be opened, or when it does not belong to this user alone.
 int DeviceRoot();
 
 }  // namespace host

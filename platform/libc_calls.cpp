@@ -1,11 +1,10 @@
-// C library calls that the linker leads here (--wrap): what the device answers itself, and what
-// shows in its trace.
+// C library calls that the linker redirects here (--wrap): those that the device answers itself,
+// and those that its trace records.
 #include <fcntl.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <optional>
 
@@ -49,7 +48,7 @@ int __wrap_system(const char* command) {
     return status;
 }
 
-// From popen() to pclose(), which must be of the same thread. One at a time is enough.
+// The event of the pipe that this thread has open. One at a time is enough.
 static thread_local std::optional<host::TraceEvent> gPipe;
 
 FILE* __wrap_popen(const char* command, const char* mode) {

@@ -28,8 +28,8 @@ int __android_log_print(int priority, const char* tag, const char* format, ...) 
         tag = program_invocation_short_name;
     }
     char text[host::kMaxLogText + 1] = "";
-    // A stream ends when the buffer is full, where vsnprintf() walks through all that does not fit:
-    // 8 us instead of 1.7 ms for a reply of 1 MiB.
+    // A stream stops when the buffer is full; vsnprintf() also formats all that does not fit: 1.7
+    // ms instead of 8 us for a reply of 1 MiB.
     FILE* const stream = fmemopen(text, sizeof(text), "w");
     if (stream == nullptr) {
         return -errno;
@@ -51,7 +51,7 @@ int __android_log_print(int priority, const char* tag, const char* format, ...) 
     const iovec parts[] = {
             {&header, sizeof(header)}, {&level, sizeof(level)}, Bytes(tag), Bytes(text)};
     header.size = static_cast<uint32_t>(parts[1].iov_len + parts[2].iov_len + parts[3].iov_len);
-    // One append, so that the entries of other processes never come in between.
+    // In one write, so that no entry of another process comes in between.
     const ssize_t written = writev(log, parts, std::size(parts));
     return written < 0 ? -errno : static_cast<int>(written);
 }

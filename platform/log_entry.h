@@ -1,4 +1,4 @@
-// An entry of the device's log, as the file `log` in the device root holds it: this header, then
+// An entry of the device's log, which is the file `log` in the device root: this header, then
 // `size` bytes with the priority (one byte), the tag and the text, both with a terminating zero.
 // Writers append each entry in one call.
 #pragma once
@@ -22,7 +22,7 @@ struct LogEntryHeader {
     uint32_t nanoseconds;
 };
 
-// How readers show a priority; '?' for a number that is none.
+// The letter that readers show for a priority; '?' for a number that is none.
 constexpr char LogPriorityLetter(int priority) {
     return priority >= ANDROID_LOG_VERBOSE && priority <= ANDROID_LOG_SILENT
                    ? "VDIWEFS"[priority - ANDROID_LOG_VERBOSE]

@@ -32,7 +32,8 @@ uint8_t* Parcel::resize(size_t size) {
     return mData.data();
 }
 
-// The next `size` bytes and their padding, as far as the content has it; null when it is too short.
+// Moves past the next `size` bytes and their padding, which may be missing at the end. Returns the
+// bytes, or null when fewer are left.
 const uint8_t* Parcel::take(size_t size) const {
     if (size > mData.size() - mPosition) {
         return nullptr;
@@ -56,16 +57,13 @@ status_t Parcel::writeCString(const char* text) {
 }
 
 status_t Parcel::writeString16(const String16& text) {
-    const status_t status = writeInt32(static_cast<int32_t>(text.size()));
-    return status == OK ? write(text.string(), (text.size() + 1) * sizeof(char16_t)) : status;
+    writeInt32(static_cast<int32_t>(text.size()));
+    return write(text.string(), (text.size() + 1) * sizeof(char16_t));
 }
 
 status_t Parcel::writeInterfaceToken(const String16& interface) {
     for (const int32_t field : {kNoStrictModePolicy, kNoWorkSource, kVendorHeader}) {
-        const status_t status = writeInt32(field);
-        if (status != OK) {
-            return status;
-        }
+        writeInt32(field);
     }
     return writeString16(interface);
 }

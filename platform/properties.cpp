@@ -1,4 +1,4 @@
-// One file a property: properties/KEY in the device root holds the value's bytes.
+// One file for each property: properties/KEY in the device root, with the bytes of the value.
 #include <sys/system_properties.h>
 
 #include <fcntl.h>
@@ -32,7 +32,7 @@ bool IsLegalName(const std::string& name) {
 
 std::string PropertyPath(const std::string& name) { return "properties/" + name; }
 
-// A property whose file the owner may not write is refused to every user, root included.
+// Whether the file's owner may not write it. Then nobody writes the property, not even root.
 bool IsWriteProtected(const std::string& path) {
     struct stat status = {};
     return fstatat(host::DeviceRoot(), path.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&

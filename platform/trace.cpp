@@ -50,7 +50,7 @@ TraceEvent::~TraceEvent() {
     }
     const int error = errno;
     mLine += "}\n";
-    // Opened for each event: the watcher may have gone, and threads share no descriptor.
+    // Opened for each event: the file may be gone, and threads share no descriptor.
     const int file = OpenForAppending(kTraceFile, 0);
     if (file < 0 || write(file, mLine.data(), mLine.size()) < 0) {
         gTraced = 0;

@@ -1,10 +1,10 @@
-// What the device's processes do, for somebody who watches. While the file `trace` exists in the
-// device root, every process appends one JSON object a line to it:
+// A record of what the device's processes do. While the file `trace` exists in the device root, the
+// device is watched: every process appends one JSON object a line to the file:
 //
 //   {"time":12.345678,"pid":7,"who":"tpd","what":"pause","us":100}
 //
-// "time" is when the event began, in seconds of CLOCK_MONOTONIC; lines stand in the order in which
-// events ended. Bytes that are not printable ASCII are written \u00XX.
+// "time" is when the event began, in seconds of CLOCK_MONOTONIC; the lines are in the order in
+// which events ended. A byte that is not printable ASCII is written as \u00XX.
 #pragma once
 
 #include <cstdint>
@@ -15,7 +15,7 @@ namespace host {
 
 constexpr char kTraceFile[] = "trace";
 
-// Whether somebody watches, as far as this process has looked: at its first event and at each
+// Whether the device is watched, as this process last saw it: at its first event or at the last
 // LookForTrace().
 bool IsTraced();
 
@@ -25,7 +25,8 @@ void LookForTrace();
 // CLOCK_MONOTONIC in microseconds.
 int64_t MonotonicUs();
 
-// One event, appended when the object goes. Does nothing while nobody watches; keeps errno.
+// One event, appended when the object is destroyed. Does nothing while the device is not watched;
+// keeps errno.
 class TraceEvent {
   public:
     explicit TraceEvent(const char* what);
@@ -39,7 +40,7 @@ class TraceEvent {
     TraceEvent& AddHex(const char* name, const uint8_t* bytes, size_t size);
 
   private:
-    std::string mLine;  // empty while nobody watches
+    std::string mLine;  // empty while the device is not watched
 };
 
 }  // namespace host

@@ -25,7 +25,7 @@ namespace {
 // the reply.
 constexpr uint32_t kAcceptFds = 0x10;
 
-// The client's end of one service. For one thread at a time, like the process that uses it.
+// A client's proxy of one service. For one thread at a time, like the process that uses it.
 class RemoteBinder : public IBinder {
   public:
     explicit RemoteBinder(int connection) : mConnection(connection) {}
@@ -94,7 +94,7 @@ class RemoteBinder : public IBinder {
             return OwnerDied();
         }
         if (header.size > kMaxTransactionBytes) {
-            // Nobody knows where the next reply begins: the connection is of no more use.
+            // Where the next reply begins is unknown: the connection is of no more use.
             OwnerDied();
             return android::FAILED_TRANSACTION;
         }
@@ -138,7 +138,7 @@ class RemoteBinder : public IBinder {
     status_t OwnerDied() {
         const TraceEvent event("binder_died");
         Close();
-        const sp<IBinder> keep(this);
+        const sp<IBinder> keep(this);  // a recipient may drop the last other reference
         const std::vector<Link> links = std::move(mLinks);
         mLinks.clear();
         for (const Link& link : links) {

@@ -27,12 +27,12 @@ namespace {
 
 constexpr int kBacklog = 128;
 constexpr std::chrono::milliseconds kNoDescriptorPause(10);
-// The kernel takes a dying process's descriptors away from the highest down. With the listener
-// above the connections, whoever sees a call die finds nobody listening, as with a real driver.
+// The kernel closes a dying process's descriptors from the highest down. With the listener above
+// the connections, a client whose call fails finds no listener any more, as with a real driver.
 constexpr int kListenerDescriptor = 900;
 
 // Carries out the one-way calls of all clients of a service one after another, in the order in
-// which they were read, while two-way calls pass them. Any number may wait.
+// which they were read. Two-way calls do not wait for them. The queue has no limit.
 class OneWayQueue : public android::BBinder {
   public:
     explicit OneWayQueue(const sp<IBinder>& service) : mService(service) {}
@@ -55,7 +55,7 @@ class OneWayQueue : public android::BBinder {
         Parcel data;
     };
 
-    // Whether the queue was empty, which nobody carries out then.
+    // Returns whether the queue was empty: then no thread is carrying it out.
     bool Append(uint32_t code, const Parcel& data, uint32_t flags) {
         const std::lock_guard<std::mutex> lock(mMutex);
         Call& call = mCalls.emplace_back();
@@ -82,19 +82,19 @@ class OneWayQueue : public android::BBinder {
     std::deque<Call> mCalls;  // the first is the one being carried out
 };
 
-// Takes the place of a socket that another service of that name has left.
+// Replaces a socket that an earlier service of that name left behind.
 bool ListenAt(int socket, const sockaddr_un& address) {
     unlink(address.sun_path);
     return bind(socket, reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0 &&
            listen(socket, kBacklog) == 0;
 }
 
-// Serves each client on a thread of its own, for ever.
+// Serves each client on a thread of its own. Never returns.
 void AcceptClients(int listener, const sp<IBinder>& service) {
     for (;;) {
         const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
         if (connection < 0) {
-            // Out of descriptors, for example: clients get time to give some back.
+            // Out of descriptors, for example: clients get time to close some.
             std::this_thread::sleep_for(kNoDescriptorPause);
         } else {
             std::thread(ServeClient, connection, service).detach();

@@ -2,7 +2,6 @@
 
 #include <sys/socket.h>
 #include <sys/uio.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -29,10 +28,10 @@ bool SendMessage(int connection, const void* header, size_t headerSize,
         }
         auto done = static_cast<size_t>(sent);
         for (iovec& part : parts) {
-            const size_t step = std::min(done, part.iov_len);
-            part.iov_base = static_cast<char*>(part.iov_base) + step;
-            part.iov_len -= step;
-            done -= step;
+            const size_t bytes = std::min(done, part.iov_len);
+            part.iov_base = static_cast<char*>(part.iov_base) + bytes;
+            part.iov_len -= bytes;
+            done -= bytes;
         }
     }
     return true;

@@ -28,12 +28,12 @@ struct ReplyHeader {
 bool SendMessage(int connection, const void* header, size_t headerSize,
                  const android::Parcel& parcel);
 
-// Receives exactly `size` bytes. False when the peer is gone before.
+// Receives exactly `size` bytes. False when the peer hangs up before.
 bool Receive(int connection, void* buffer, size_t size);
 
-// A new socket, which the caller closes, and the address of the service's socket below the driver's
-// folder. -1 when there is no root, the name is no file name or too long, or there is no socket;
-// the reason is in errno.
+// A new socket, which the caller closes; `address` becomes that of the service's socket in the
+// driver's folder. -1, with the reason in errno, when there is no device root, when the name is no
+// file name or too long, or when no socket can be made.
 int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address);
 
 }  // namespace host

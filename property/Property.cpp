@@ -10,7 +10,7 @@
 namespace {
 
 // The interface fixes the log lines: each write is at ERROR with "retry:1", also a first one that
-// takes, and a value found by the second read is at "i = 1".
+// succeeds, and a value found by the second read is at "i = 1".
 constexpr char kTag[] = "corvane_daemon";
 constexpr int kWriteAttempts = 6;
 constexpr useconds_t kPauseUs = 100;

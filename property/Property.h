@@ -11,7 +11,7 @@
 struct PropertyItem {
     std::string alias;         // name the accessors use, unique in the table
     std::string key;           // system property
-    std::string defaultValue;  // stands for an empty property; empty when the row has none
+    std::string defaultValue;  // of an empty property; empty when the row has none
 };
 
 class Property {
@@ -28,8 +28,8 @@ class Property {
     // in the property, and the result is the default's length + 1 (0 when there is no default).
     int Get(std::string key, std::string& out, std::string defaultValue);
 
-    // Writes `value` until the property reads back as it, at most six times. A refused write leaves
-    // only its log lines.
+    // Writes `value` until the property reads back as it, at most six times. Of a rejected write
+    // only its log lines remain.
     void Set(std::string key, std::string value);
 
     // Setters. A flag is stored as "true" or "false", a number in decimal.
@@ -43,7 +43,7 @@ class Property {
     void SetAfeLog(bool on);
     void SetPermissive(bool on);
 
-    // Text getters: `out` and the result are those of Get() with the row's default.
+    // String getters: `out` and the result are those of Get() with the row's default.
     int GetThplogEnable(std::string& out);
     int GetServiceEnable(std::string& out);
     int GetDaeAlive(std::string& out);
@@ -56,7 +56,7 @@ class Property {
     // the property is empty, does not begin with a number or holds one outside the range of int.
     int GetUserType(int& type);
 
-    // Flag getters: whether the text is exactly "true" or "1". GetRebootTimes() thus tells whether
+    // Flag getters: whether the value is exactly "true" or "1". Thus GetRebootTimes() is whether
     // the count reads "1", not how many restarts there were.
     bool GetServiceEnable();
     bool GetDaeAlive();
@@ -73,6 +73,6 @@ class Property {
 
     std::mutex mMutex;    // held by each accessor; Get, Set and GetItem never take it
     char mBuf[128] = {};  // last value read
-    std::string mValue;   // last text read by a flag getter or GetUserType
+    std::string mValue;   // last string read by a flag getter or GetUserType
     std::vector<PropertyItem> mItems;
 };

@@ -1,7 +1,9 @@
 # shellcheck shell=bash disable=SC2034
 # For the other scripts: their usage, the packages they need, and the build.
 tree=$(CDPATH='' cd -- "$(dirname -- "$(readlink -f -- "${BASH_SOURCE[0]}")")/.." && pwd)
-export TPD_BUILD_DIR=${TPD_BUILD_DIR:-$tree/build}
+script=$(readlink -f -- "$0")
+export TPD_BUILD_DIR
+TPD_BUILD_DIR=$(realpath -m -- "${TPD_BUILD_DIR:-$tree/build}")
 
 # What is needed: a command on the PATH or a file, and Debian's package of it when that has another
 # name.
@@ -10,7 +12,21 @@ test_tools=(/usr/include/gmock/gmock.h:libgmock-dev groff:groff-base man:man-db
     pytest-3:python3-pytest /usr/lib/python3/dist-packages/xdist:python3-pytest-xdist zsh)
 
 # Prints the comment that the script begins with.
-usage() { sed -n '2,/^[^#]/s/^# \{0,1\}//p' "$0"; }
+usage() { sed -n '2,/^[^#]/s/^# \{0,1\}//p' "$script"; }
+
+# answer_help ARGUMENT...: prints the usage and ends the script when the first argument asks for it.
+answer_help() {
+    if [[ ${1-} == -h || ${1-} == --help ]]; then
+        usage
+        exit
+    fi
+}
+
+# Ends the script, which was called with wrong arguments.
+wrong_use() {
+    usage >&2
+    exit 2
+}
 
 # need WHAT...: installs what is missing, or says what an administrator has to install.
 need() {

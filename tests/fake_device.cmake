@@ -1,5 +1,5 @@
-# The product's front end and the fake device under it, for the unit tests and the fuzz targets. The
-# front end's main is called like any function; the linker leads the C library's calls to the device.
+# The product's front end on the fake device, for the unit tests and the fuzz targets. Its main is
+# called like any function; the linker redirects the C library's calls to the fake device.
 include_guard(GLOBAL)
 
 add_library(tpd_front_end STATIC ${PROJECT_SOURCE_DIR}/main/TpdMain.cpp)

@@ -20,8 +20,8 @@ errno_t memset_s(void* dest, size_t destMax, int c, size_t count);
 // string) and for any other format.
 int fscanf_s(FILE* stream, const char* format, ...);
 
-// Returns the length of the text, or -1 when it is longer than `count` characters (the buffer then
-// holds its beginning), cannot be formatted or `count` leaves no space for the terminator (the
+// Returns the length of the result, or -1 when it is longer than `count` characters (the buffer
+// then holds its beginning), cannot be formatted or `count` leaves no space for the terminator (the
 // empty string).
 int vsnprintf_s(char* dest, size_t destMax, size_t count, const char* format, va_list args);
 

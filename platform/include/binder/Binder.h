@@ -15,12 +15,12 @@ class BBinder : public IBinder {
                            uint32_t flags = 0, wp<DeathRecipient>* outRecipient = nullptr) override;
 
   protected:
-    // Carries one call out. UNKNOWN_TRANSACTION for a code the service does not know.
+    // Carries out one call. UNKNOWN_TRANSACTION for a code the service does not know.
     virtual status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply,
                                 uint32_t flags = 0);
 };
 
-// Client side: what a proxy holds its binder with.
+// Client side: the base of a proxy, with its reference to the remote binder.
 class BpRefBase : public virtual RefBase {
   protected:
     explicit BpRefBase(const sp<IBinder>& remote) : mRemote(remote) {}

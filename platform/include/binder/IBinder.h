@@ -29,18 +29,18 @@ class IBinder : public virtual RefBase {
     virtual sp<IInterface> queryLocalInterface(const String16& descriptor);
 
     // Delivers the request and waits for the reply; with FLAG_ONEWAY it does not wait and leaves
-    // the reply empty. Returns 0 or a negative status, as its owner or the driver gives it; a
-    // positive one of the owner counts as 0.
+    // the reply empty. Returns 0 or a negative status of the owner or of the driver; a positive
+    // status of the owner counts as 0.
     virtual status_t transact(uint32_t code, const Parcel& data, Parcel* reply,
                               uint32_t flags = 0) = 0;
 
-    // Registers a recipient, of which only a weak reference is kept. DEAD_OBJECT when it is too
-    // late, INVALID_OPERATION on a binder of this process.
+    // Registers a recipient and keeps a weak reference to it. Returns 0, DEAD_OBJECT when the owner
+    // is known to be dead, or INVALID_OPERATION on a binder of this process.
     virtual status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
                                  uint32_t flags = 0) = 0;
 
-    // Ends one registration with the same arguments. NAME_NOT_FOUND when there is none, DEAD_OBJECT
-    // when the recipients have been notified.
+    // Ends one registration with the same arguments. Returns 0, NAME_NOT_FOUND when there is none,
+    // or as linkToDeath().
     virtual status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
                                    uint32_t flags = 0,
                                    wp<DeathRecipient>* outRecipient = nullptr) = 0;

@@ -16,7 +16,8 @@ class IServiceManager : public IInterface {
     // The service's binder, or null when it is not there now.
     virtual sp<IBinder> checkService(const String16& name) const = 0;
 
-    // Publishes a binder of this process, in the place of another of that name.
+    // Publishes a binder of this process, which replaces another of that name. Returns 0 or a
+    // negative status.
     virtual status_t addService(const String16& name, const sp<IBinder>& service,
                                 bool allowIsolated = false,
                                 int dumpsysFlags = DUMP_FLAG_PRIORITY_DEFAULT) = 0;
@@ -25,7 +26,7 @@ class IServiceManager : public IInterface {
 // The process's service manager, null when the device root cannot be used.
 sp<IServiceManager> defaultServiceManager();
 
-// Puts another in its place; for tests.
+// Replaces it; for tests.
 void setDefaultServiceManager(const sp<IServiceManager>& manager);
 
 }  // namespace android

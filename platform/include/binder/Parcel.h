@@ -10,7 +10,7 @@
 
 namespace android {
 
-// Every value starts at a multiple of 4 bytes; what is between is zero.
+// Every value starts at a multiple of 4 bytes; the padding is zero.
 class Parcel {
   public:
     Parcel() = default;
@@ -25,11 +25,11 @@ class Parcel {
     // Replaces the content and starts reading at its beginning.
     status_t setData(const uint8_t* buffer, size_t size);
 
-    // Gives the content this size and returns it, for the caller to fill.
-    // Of this implementation only: a transport reads into it without another copy.
+    // Sets the size of the content and returns the content, for the caller to fill. Only this
+    // implementation has it: a transport reads into it without another copy.
     uint8_t* resize(size_t size);
 
-    // Writers return 0 or BAD_VALUE.
+    // Writers return 0, or BAD_VALUE for a null string.
     status_t writeInterfaceToken(const String16& interface);
     status_t writeInt32(int32_t value);
     status_t writeCString(const char* text);

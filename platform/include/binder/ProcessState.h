@@ -9,11 +9,11 @@ namespace android {
 
 class ProcessState : public virtual RefBase {
   public:
-    // The process's one state, on "/dev/binder" unless initWithDriver() came first.
+    // The one object of the process, on "/dev/binder" unless initWithDriver() came first.
     static sp<ProcessState> self();
 
-    // Chooses the driver, a folder of this path in the device root. Another driver after the first
-    // is fatal.
+    // Chooses the driver: the folder of this path in the device root. A later call with another
+    // path ends the process.
     static sp<ProcessState> initWithDriver(const char* driver);
 
     const std::string& getDriverName() const { return mDriver; }

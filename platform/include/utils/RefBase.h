@@ -44,7 +44,7 @@ class wp {
     template <typename U>
     wp(const sp<U>& object) : wp(object.get()) {}  // NOLINT(google-explicit-constructor)
 
-    // A strong reference, null when nobody holds the object any more.
+    // A strong reference; null when the object has been destroyed.
     sp<T> promote() const {
         int32_t strong = mStrong != nullptr ? mStrong->load() : 0;
         while (strong > 0) {
