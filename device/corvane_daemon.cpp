@@ -60,7 +60,7 @@ std::string Help() {
            "THP_GetVersion (virtual device only)";
 }
 
-// What the daemon answers to a command. The commands that act have nothing to tell.
+// What the daemon answers to a command. Commands that only act answer that they are done.
 std::string Answer(const std::string& command, const std::string& params) {
     if (command == "help") {
         return Help();

@@ -1,5 +1,5 @@
-// The virtual device for people and scripts: its life, and the ways into it. The kernel says who
-// runs it: init holds a record lock, and asking for that lock's holder takes nothing.
+// The virtual device for people and scripts: starts, stops and enters it. The kernel knows which
+// process runs it: init holds a record lock, and to ask for the holder takes no lock.
 #include <fcntl.h>
 #include <limits.h>
 #include <poll.h>
@@ -37,13 +37,13 @@ constexpr int kStopLimitMs = 5000;
 constexpr std::chrono::milliseconds kPollPause(5);
 
 constexpr char kUsage[] =
-        "usage: device start [--permissive]  boots it, SELinux Enforcing unless told otherwise;\n"
+        "usage: device start [--permissive]  boots it, SELinux Enforcing without the option;\n"
         "                                    status 0 once its daemon is alive\n"
         "       device stop | status | root  status 3 when it is stopped\n"
         "       device shell [COMMAND...]    as `adb shell`\n"
         "       device run [ARGUMENT...]     runs the tool; starts a stopped device, Permissive\n"
         "       device trace [--bytes] [--json | --mermaid] ARGUMENT...\n"
-        "                                    runs the tool and shows what everybody did\n"
+        "                                    runs the tool and shows what all processes did\n"
         "       device fault [NAME [ARGUMENT] [COUNT] | none]\n"
         "                                    gives the daemon a fault; alone: lists them\n";
 
@@ -83,7 +83,7 @@ pid_t FindInit() {
     const bool isHeld = file >= 0 && fcntl(file, F_GETLK, &holder) == 0 &&
                         holder.l_type != F_UNLCK && holder.l_pid > 0;
     close(file);
-    // A stranger may hold a lock, too.
+    // Another program may hold a lock, too.
     const bool isInit = isHeld && ProgramOf(holder.l_pid).filename().string().rfind("init", 0) == 0;
     return isInit ? holder.l_pid : 0;
 }
@@ -99,7 +99,7 @@ bool IsCurrentBuild(pid_t init) {
 int Stop(int, char**) {
     const pid_t init = FindInit();
     const int process = init != 0 ? pidfd_open(init, 0) : -1;
-    // Init may have ended before the descriptor was there, which is then somebody else's.
+    // Init may have ended before the descriptor was there, which then belongs to another process.
     if (process < 0 || FindInit() != init) {
         close(process);
         return 0;
@@ -128,7 +128,7 @@ int AwaitDaemon() {
                           "`device shell tpd start` starts one that was stopped");
 }
 
-// Starts init and waits until it has booted the device. What fails there is said by init.
+// Starts init and waits until it has booted the device. Init reports what fails there.
 int Boot(const char* selinuxMode) {
     int report[2];
     if (pipe2(report, O_CLOEXEC) != 0) {

@@ -1,4 +1,4 @@
-// The faults that the simulated daemon can be given.
+// The faults that the simulated daemon can have.
 #pragma once
 
 #include <cstdint>

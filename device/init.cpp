@@ -1,8 +1,8 @@
-// The part of the device's init that boots it and minds the touch daemon: starts and stops it as
+// The part of the device's init that boots it and controls the touch daemon: starts and stops it as
 // "odm.thp.service_enable" says, and starts it again, counting, when it ends on its own.
 //
 // init MODE: boots the device root with SELinux in that mode. One byte on standard output says that
-// the device is booted; what fails before is said on standard error. Ends on SIGTERM or SIGINT, or
+// the device is booted; a failure before that goes to standard error. Ends on SIGTERM or SIGINT, or
 // when the folder of properties goes away.
 #include <android/log.h>
 #include <fcntl.h>
@@ -213,7 +213,7 @@ bool LeaveCaller() {
     return chdir("/") == 0;
 }
 
-// Signals that end this process or tell of its daemon become readable.
+// Makes the signals that end this process or report its daemon readable.
 int OpenSignals() {
     sigset_t signals;
     sigemptyset(&signals);
@@ -231,7 +231,7 @@ int OpenPropertyWatch() {
     return inotify_add_watch(watch, folder.c_str(), kEvents) >= 0 ? watch : -1;
 }
 
-// Tells that the device is booted and lets go of whoever waits for that.
+// Reports that the device is booted to the process that waits for it.
 void ReportBoot() {
     [[maybe_unused]] const ssize_t written = write(STDOUT_FILENO, "\n", 1);
     const int null = open("/dev/null", O_RDWR | O_CLOEXEC);

@@ -50,7 +50,7 @@ def shown(text):
 def describe(event):
     fields = {name: shown(str(value)) for name, value in event.items()}
     signaled, status = event.get("signal"), event.get("status", 0)
-    if event["what"] == "shell":  # as wait() tells it
+    if event["what"] == "shell":  # as wait() returns it
         signaled, status = status & 0x7F, status >> 8
     fields["end"] = f"signal {signaled}" if signaled else f"status {status}"
     fields["found"] = "found" if event.get("found") else "not found"
@@ -124,7 +124,7 @@ def main():
     try:
         os.close(os.open(TRACE, os.O_CREAT | os.O_EXCL, 0o600))
     except FileExistsError:
-        sys.exit(f"device: somebody traces this device; if nobody does, remove {TRACE}")
+        sys.exit(f"device: another trace runs; if not, remove {TRACE}")
     try:
         start = time.monotonic()
         events, result = record(options.arguments)

@@ -62,7 +62,7 @@ TEST(StringPairParserTest, ReadsNumbersWithinTheRangeOfInt) {
 
 using CmdLineTest = DeviceTest;
 
-TEST_F(CmdLineTest, TellsHowTheDeviceWasBooted) {
+TEST_F(CmdLineTest, ReportsHowTheDeviceWasBooted) {
     const struct {
         const char* line;
         bool upgradeMode;

@@ -159,7 +159,7 @@ void* operator new(size_t size, const std::nothrow_t& /* tag */) noexcept {
     return fails ? nullptr : operator new(size);
 }
 
-// The linker leads the C library's calls here.
+// The linker redirects the C library's calls here.
 extern "C" {
 
 FILE* __real_fopen(const char* path, const char* mode);

@@ -6,7 +6,7 @@ namespace test {
 
 using LogTest = DeviceTest;
 
-// Writes debug lines, too, and keeps texts in memory.
+// Writes debug lines, too, and keeps messages in memory.
 class DebugLog : public LogBase {
   public:
     DebugLog() : LogBase("debug") {}

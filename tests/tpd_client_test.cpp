@@ -65,7 +65,7 @@ TEST_F(TpdClientTest, ChecksOnlyOnceAfterTwoFailedWaits) {
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
 }
 
-TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerTellsAFailure) {
+TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerReportsAFailure) {
     const struct {
         const char* answer;
         bool trusted;

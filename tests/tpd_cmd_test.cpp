@@ -6,7 +6,7 @@ namespace test {
 
 using TpdCmdTest = DeviceTest;
 
-TEST_F(TpdCmdTest, TellsWhetherTheThplogIsOn) {
+TEST_F(TpdCmdTest, KnowsWhetherTheThplogIsOn) {
     const struct {
         const char* thplog;
         const char* userType;

@@ -23,7 +23,7 @@ RESTART = [("odm.thp.service_enable", "0"), ("odm.thp.service_enable", "1")]
 def wait_until(condition):
     deadline = time.monotonic() + LIMIT_S
     while not condition():
-        assert time.monotonic() < deadline, "waited in vain"
+        assert time.monotonic() < deadline, "waited too long"
         time.sleep(0.02)
 
 
