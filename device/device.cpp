@@ -228,7 +228,8 @@ int Run(int argc, char** argv) {
 }
 
 int Trace(int argc, char** argv) {
-    return FindInit() != 0 ? BecomeBeside("trace.py", argc, argv) : Fail("is stopped");
+    return FindInit() != 0 ? BecomeBeside("trace.py", argc, argv)
+                           : Fail("the device is stopped; `device start` boots it");
 }
 
 int ListFaults() {
@@ -247,7 +248,7 @@ int Fault(int argc, char** argv) {
         return ListFaults();
     }
     if (FindInit() == 0) {
-        return Fail("is stopped");
+        return Fail("the device is stopped; `device start` boots it");
     }
     const device::Fault* const fault = device::FindFault(argv[0]);
     const int arguments = fault != nullptr && fault->argument != nullptr ? 2 : 1;
@@ -285,6 +286,10 @@ int main(int argc, char** argv) {
             const bool isWritten = fflush(stdout) == 0 && ferror(stdout) == 0;
             return isWritten ? status : Fail(std::string("cannot write: ") + strerror(errno));
         }
+    }
+    if (argc == 2 && (argv[1] == std::string("-h") || argv[1] == std::string("--help"))) {
+        fputs(kUsage, stdout);
+        return 0;
     }
     return Usage();
 }

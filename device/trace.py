@@ -56,7 +56,7 @@ def describe(event):
     fields["found"] = "found" if event.get("found") else "not found"
     fields["size"] = len(event.get("request", "")) // 2
     fields["way"] = "one-way" if event.get("flags", 0) & 1 else "two-way"
-    return DESCRIPTIONS.get(event["what"], event["what"]).format_map(fields)
+    return DESCRIPTIONS.get(event["what"], event["what"]).format_map(fields).rstrip()
 
 
 def hexdump(request):

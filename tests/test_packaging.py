@@ -53,7 +53,7 @@ def test_completes_all_that_the_tool_sends_one_way():
     client = source("binder/corvane_sys_binder_client.cpp")
     names = re.search(r"g_asyncThpCmds = {(.*?)}", client, re.S)[1]
     completed = source("completions/daemon_commands")
-    assert re.findall(r'"(\w+)"', names) == re.findall(r"^THP_\w+", completed, re.M)
+    assert set(re.findall(r'"(\w+)"', names)) <= set(completed.split())
 
 
 def test_renders_the_manual_page(build):
