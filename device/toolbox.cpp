@@ -51,7 +51,7 @@ int Getprop(int argc, char** argv) {
 int Setprop(int /* argc */, char** argv) {
     const char* const name = argv[1];
     const std::string value = argv[2];
-    // A value that stands already is no change, which init would act on.
+    // The value that the property has already is no change: init would act on it.
     if ((!value.empty() && device::GetProperty(name) == value) ||
         __system_property_set(name, value.c_str()) == 0) {
         return 0;
