@@ -19,8 +19,8 @@
 #include "binder/corvane_sys_binder_client.h"
 #include "log/Log.h"
 #include "platform/device_root.h"
-#include "platform/vndbinder.h"
-#include "platform/vndbinder_wire.h"
+#include "platform/libbinder/vndbinder.h"
+#include "platform/libbinder/vndbinder_wire.h"
 #include "property/Property.h"
 
 namespace {

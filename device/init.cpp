@@ -29,7 +29,7 @@
 #include "common.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
-#include "platform/log_entry.h"
+#include "platform/log_file.h"
 #include "platform/trace.h"
 
 namespace {

@@ -24,7 +24,7 @@
 #include "common.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
-#include "platform/log_entry.h"
+#include "platform/log_file.h"
 
 namespace {
 

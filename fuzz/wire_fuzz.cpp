@@ -5,7 +5,7 @@
 #include <unistd.h>
 
 #include "fuzz.h"
-#include "platform/vndbinder.h"
+#include "platform/libbinder/vndbinder.h"
 
 namespace {
 

@@ -1,4 +1,4 @@
-#include "device_root.h"
+#include "platform/device_root.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -9,7 +9,7 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "files.h"
+#include "platform/files.h"
 
 namespace host {
 

@@ -1,4 +1,4 @@
-#include "files.h"
+#include "platform/files.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -8,7 +8,7 @@
 #include <cerrno>
 #include <cstdio>
 
-#include "device_root.h"
+#include "platform/device_root.h"
 
 namespace host {
 

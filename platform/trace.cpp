@@ -1,4 +1,4 @@
-#include "trace.h"
+#include "platform/trace.h"
 
 #include <unistd.h>
 
@@ -6,8 +6,8 @@
 #include <cerrno>
 #include <chrono>
 
-#include "device_root.h"
-#include "files.h"
+#include "platform/device_root.h"
+#include "platform/files.h"
 
 namespace host {
 

@@ -3,12 +3,15 @@
 include_guard(GLOBAL)
 
 add_library(tpd_front_end STATIC ${PROJECT_SOURCE_DIR}/main/TpdMain.cpp)
+export_headers(tpd_front_end main)
 target_compile_definitions(tpd_front_end PRIVATE main=tpd_main)
 target_link_libraries(tpd_front_end PUBLIC tpd_daemon PRIVATE tpd_build_options)
 
-# An object library: it comes whole and, unlike platform_device, before the product's archives.
+# An object library: the linker takes its definitions of the platform's calls before it looks into
+# the archives of the virtual device.
 add_library(fake_device OBJECT ${CMAKE_CURRENT_LIST_DIR}/fake_device.cpp)
-target_link_libraries(fake_device PUBLIC tpd_front_end tpd_log PRIVATE tpd_build_options)
-foreach(function fopen pclose popen system usleep)
-    target_link_options(fake_device INTERFACE -Wl,--wrap=${function})
-endforeach()
+export_headers(fake_device tests)
+target_link_libraries(
+    fake_device
+    PUBLIC tpd_front_end tpd_log device_files wrapped_calls
+    PRIVATE tpd_build_options)

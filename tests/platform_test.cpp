@@ -12,8 +12,8 @@
 #include <thread>
 
 #include "platform/device_root.h"
-#include "platform/log_entry.h"
-#include "platform/vndbinder.h"
+#include "platform/libbinder/vndbinder.h"
+#include "platform/log_file.h"
 
 namespace {
 

@@ -50,9 +50,9 @@ def test_completes_parameters(complete):
 
 
 def test_completes_all_that_the_tool_sends_one_way():
-    client = source("binder/corvane_sys_binder_client.cpp")
+    client = source("binder/ICorvaneInterfaceClient.cpp")
     names = re.search(r"g_asyncThpCmds = {(.*?)}", client, re.S)[1]
-    completed = source("completions/daemon_commands")
+    completed = source("device/daemon_commands")
     assert set(re.findall(r'"(\w+)"', names)) <= set(completed.split())
 
 

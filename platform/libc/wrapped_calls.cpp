@@ -8,8 +8,8 @@
 #include <cstring>
 #include <optional>
 
-#include "device_root.h"
-#include "trace.h"
+#include "platform/device_root.h"
+#include "platform/trace.h"
 
 extern "C" {
 

@@ -9,9 +9,9 @@
 #include <cstring>
 #include <string>
 
-#include "device_root.h"
-#include "files.h"
-#include "trace.h"
+#include "platform/device_root.h"
+#include "platform/files.h"
+#include "platform/trace.h"
 
 namespace {
 

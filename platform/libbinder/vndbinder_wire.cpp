@@ -1,4 +1,4 @@
-#include "vndbinder_wire.h"
+#include "platform/libbinder/vndbinder_wire.h"
 
 #include <sys/socket.h>
 #include <sys/uio.h>
@@ -7,7 +7,7 @@
 #include <cerrno>
 #include <cstdio>
 
-#include "device_root.h"
+#include "platform/device_root.h"
 
 namespace host {
 

@@ -7,9 +7,9 @@
 
 #include <binder/Parcel.h>
 
-#include "trace.h"
-#include "vndbinder.h"
-#include "vndbinder_wire.h"
+#include "platform/libbinder/vndbinder.h"
+#include "platform/libbinder/vndbinder_wire.h"
+#include "platform/trace.h"
 
 using android::IBinder;
 using android::Parcel;

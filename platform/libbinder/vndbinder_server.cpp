@@ -10,11 +10,11 @@
 
 #include <binder/Parcel.h>
 
-#include "device_root.h"
-#include "files.h"
-#include "trace.h"
-#include "vndbinder.h"
-#include "vndbinder_wire.h"
+#include "platform/device_root.h"
+#include "platform/files.h"
+#include "platform/libbinder/vndbinder.h"
+#include "platform/libbinder/vndbinder_wire.h"
+#include "platform/trace.h"
 
 using android::IBinder;
 using android::Parcel;

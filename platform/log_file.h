@@ -22,11 +22,15 @@ struct LogEntryHeader {
     uint32_t nanoseconds;
 };
 
-// The letter that readers show for a priority; '?' for a number that is none.
+// The letter that readers show for a priority; '?' for an unknown one.
 constexpr char LogPriorityLetter(int priority) {
     return priority >= ANDROID_LOG_VERBOSE && priority <= ANDROID_LOG_SILENT
                    ? "VDIWEFS"[priority - ANDROID_LOG_VERBOSE]
                    : '?';
 }
+
+// Appends an entry of this thread, time-stamped now. Returns the number of bytes written or a
+// negative errno value.
+int AppendLogEntry(int priority, const char* tag, const char* text);
 
 }  // namespace host

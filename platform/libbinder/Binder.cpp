@@ -13,9 +13,9 @@
 #include <cstdlib>
 #include <thread>
 
-#include "device_root.h"
-#include "trace.h"
-#include "vndbinder.h"
+#include "platform/device_root.h"
+#include "platform/libbinder/vndbinder.h"
+#include "platform/trace.h"
 
 namespace android {
 

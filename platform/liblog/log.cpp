@@ -1,0 +1,24 @@
+#include <android/log.h>
+
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+
+#include "platform/log_file.h"
+
+int __android_log_print(int priority, const char* tag, const char* format, ...) {
+    char text[host::kMaxLogText + 1] = "";
+    // A stream stops when the buffer is full; vsnprintf() also formats all that does not fit: 1.7
+    // ms instead of 8 us for a reply of 1 MiB.
+    FILE* const stream = fmemopen(text, sizeof(text), "w");
+    if (stream == nullptr) {
+        return -errno;
+    }
+    va_list args;
+    va_start(args, format);
+    vfprintf(stream, format, args);
+    va_end(args);
+    fclose(stream);
+    return host::AppendLogEntry(priority, tag != nullptr ? tag : program_invocation_short_name,
+                                text);
+}

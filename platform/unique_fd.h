@@ -1,0 +1,42 @@
+// The owner of a file descriptor.
+#pragma once
+
+#include <unistd.h>
+
+#include <cerrno>
+#include <utility>
+
+namespace host {
+
+// Closes its descriptor, if it has one, and keeps errno.
+class UniqueFd {
+  public:
+    UniqueFd() = default;
+    explicit UniqueFd(int fd) : mFd(fd) {}
+    UniqueFd(UniqueFd&& other) noexcept : mFd(other.release()) {}
+    UniqueFd& operator=(UniqueFd&& other) noexcept {
+        reset(other.release());
+        return *this;
+    }
+    ~UniqueFd() { reset(); }
+
+    int get() const { return mFd; }  // -1 when it has none
+    bool ok() const { return mFd >= 0; }
+
+    // Hands the descriptor to the caller, who closes it.
+    [[nodiscard]] int release() { return std::exchange(mFd, -1); }
+
+    void reset(int fd = -1) {
+        const int old = std::exchange(mFd, fd);
+        if (old >= 0) {
+            const int error = errno;
+            close(old);
+            errno = error;
+        }
+    }
+
+  private:
+    int mFd = -1;
+};
+
+}  // namespace host
