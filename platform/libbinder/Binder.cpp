@@ -5,7 +5,6 @@
 #include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
 #include <binder/ProcessState.h>
-#include <malloc.h>
 #include <unistd.h>
 
 #include <chrono>
@@ -103,12 +102,7 @@ status_t BBinder::onTransact(uint32_t /* code */, const Parcel& /* data */, Parc
     return UNKNOWN_TRANSACTION;
 }
 
-// On the device the driver's receive buffer is mapped once for the life of the process. Here
-// parcels take it from the heap, which therefore keeps the memory of one call for the next.
-ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {
-    mallopt(M_MMAP_THRESHOLD, 2 * host::kMaxTransactionBytes);
-    mallopt(M_TRIM_THRESHOLD, 8 * host::kMaxTransactionBytes);
-}
+ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {}
 
 sp<ProcessState> ProcessState::self() {
     return gProcess != nullptr ? gProcess : initWithDriver(kDefaultDriver);
