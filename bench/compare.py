@@ -1,190 +1,437 @@
 #!/usr/bin/env python3
-"""Measures tpd beside its baseline, prints the results as tables and draws them.
+"""Measures tpd and its baseline, prints the tables of docs/performance.md and draws its picture.
 
-compare.py BUILD PICTURE: on a device whose daemon runs without init, so that it outlives `stop`.
-Reads BUILD/parts.json, from bench/parts; writes BUILD/results.json: table, row, program, measure.
+Needs a device whose daemon runs without init, so that the daemon survives `stop`.
+Writes BUILD/results.json: table, row, program, measure, [lower quartile, median, upper quartile].
 """
+import argparse
 import json
 import os
 import re
-import shlex
 import subprocess
 import sys
 import time
 from pathlib import Path
 from statistics import median, quantiles
 
-BUILD, PICTURE = Path(sys.argv[1]), sys.argv[2]
-ROOT = Path(os.environ["TPD_DEVICE_ROOT"])
-OUTPUT, CALLS, TIMES = ROOT / "output", ROOT / "calls", ROOT / "times.json"
-PROGRAMS = {"true": "/bin/true", "shared": f"{BUILD}/bench/baseline_shared",
-            "baseline": f"{BUILD}/bench/baseline", "tpd": f"{BUILD}/tpd"}
 PERMISSIVE = "odm.thp.debug.selinux.permissive"
 FORWARDED = "THP_GetVersion"
-# The argument, and the property that is set before each run.
-COMMANDS = {"forwarded": (FORWARDED, (PERMISSIVE, "true")),
-            "refused": (FORWARDED, (PERMISSIVE, "null")),
-            "stop": ("stop", ("odm.thp.service_enable", "1"))}
-LARGEST_REPLY = (1 << 20) - 2 * 4096 - 4  # bytes; four more are terminator and padding
-BATCH = 128  # processes that all clients together start
-TIMED = "wall_us", "cpu_us"
+# Name of the command: its argument, and the property that is set before each run.
+COMMANDS = {
+    "forwarded": (FORWARDED, (PERMISSIVE, "true")),
+    "refused": (FORWARDED, (PERMISSIVE, "null")),
+    "stop": ("stop", ("odm.thp.service_enable", "1")),
+}
+KIB, MIB, GIB = 1 << 10, 1 << 20, 1 << 30
+LARGEST_REPLY = MIB - 2 * 4096 - 4  # bytes; four more are terminator and padding
+REPLY_BYTES = [256, 4 * KIB, 64 * KIB, LARGEST_REPLY]
+CLIENTS = [1, 2, 4, 8, 16, 32, 64]
+LOG_BYTES = [MIB, 32 * MIB, GIB]
+PROPERTIES = [1000, 10000, 100000]
+STEPS = 1 + sum(map(len, [COMMANDS, REPLY_BYTES, CLIENTS, LOG_BYTES, PROPERTIES]))
+BATCH = 128  # commands that all clients together run
+COUNTS = 5  # how often instructions and system calls are counted
+TIMES = ["processor_us", "elapsed_us"]
 
 
-def run(*command):
-    done = subprocess.run([str(each) for each in command], text=True, capture_output=True)
+def parse_options():
+    parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
+    parser.add_argument("build", type=Path, help="build directory")
+    parser.add_argument("--picture", type=Path, required=True, help="SVG file to write")
+    parser.add_argument("--rounds", type=int, default=30, help="rounds of a case, at least 2 (30)")
+    parser.add_argument("--runs", type=int, default=25, help="runs of a program in a round (25)")
+    options = parser.parse_args()
+    if options.rounds < 2 or options.runs < 1:
+        parser.error("needs at least 2 rounds and 1 run")
+    return options
+
+
+# Running programs
+
+
+def run(command, **options):
+    """Returns what the command prints."""
+    done = subprocess.run(command, text=True, capture_output=True, **options)
     if done.returncode != 0:
         sys.exit(f"{command}: status {done.returncode}\n{done.stderr}")
     return done.stdout
 
 
-def alternate(commands, rounds, runs, *options):
-    """Times the commands in short rounds. A ratio is of two medians of one round."""
-    samples = []
-    for _ in range(rounds):
-        run("hyperfine", "-N", "--style=none", "--warmup=2", f"--runs={runs}", *options,
-            f"--output={OUTPUT}", f"--export-json={TIMES}", *map(shlex.join, commands.values()))
-        samples.append({name: {"wall_us": 1e6 * each["median"],
-                               "cpu_us": 1e6 * (each["user"] + each["system"])}
-                        for name, each in zip(commands, json.loads(TIMES.read_text())["results"])})
-    row = {name: {kind: round(median(sample[name][kind] for sample in samples)) for kind in TIMED}
-           for name in commands}
-    row["ratio"] = {kind: [round(each, 2) for each in quantiles(
-        (sample["tpd"][kind] / sample["baseline"][kind] for sample in samples),
-        method="inclusive")] for kind in TIMED}
+def set_property(name, value):
+    run(["setprop", name, str(value)])
+
+
+def time_run(command, output):
+    """Times and page faults of one run, including the programs that it starts."""
+    flags = os.O_WRONLY | os.O_CREAT | os.O_TRUNC
+    to_file = [(os.POSIX_SPAWN_OPEN, 1, output, flags, 0o600)]
+    start = time.perf_counter()
+    process = os.posix_spawn(command[0], command, os.environ, file_actions=to_file)
+    _, status, usage = os.wait4(process, 0)
+    elapsed = time.perf_counter() - start
+    if status != 0:
+        sys.exit(f"{command}: wait status {status}")
+    return {
+        "processor_us": 1e6 * (usage.ru_utime + usage.ru_stime),
+        "elapsed_us": 1e6 * elapsed,
+        "page_faults": usage.ru_minflt,
+    }
+
+
+def count_instructions(command):
+    """Those of the program itself, in user mode."""
+    tool = ["valgrind", "--log-fd=1", "--tool=callgrind", "--callgrind-out-file=/dev/null"]
+    return int(re.search(r"Collected : (\d+)", run([*tool, *command]))[1])
+
+
+def count_system_calls(command, output):
+    """Includes those of the programs that it starts."""
+    run(["strace", f"--output={output}", "-c", "-f", "-U", "calls", *command])
+    return int(output.read_text().split()[-2])
+
+
+def list_system_calls(command, output):
+    """Calls and results from the first look at the device on, except memory and process ids."""
+    filtered = "trace=!%memory,getpid,gettid,clone3,vfork,wait4"
+    run(["strace", f"--output={output}", "-e", filtered, *command])
+    text = output.read_text()
+    start = text.index('"/dev/null"')
+    return re.findall(r"^(\w+)\(.*\) += (-?\d+)", text[start:], re.M)
+
+
+# Statistics
+
+
+def quartiles(values):
+    """Lower quartile, median, upper quartile."""
+    return quantiles(values, method="inclusive")
+
+
+def ratios(values, measure):
+    """Quartiles of the ratio of tpd to its baseline, pair by pair."""
+    pairs = zip(values["tpd"][measure], values["baseline"][measure])
+    return quartiles([tpd / baseline for tpd, baseline in pairs])
+
+
+def summarize(values, ratio_measures):
+    """From {program: {measure: [value]}} to quartiles, with "ratio" as one more program."""
+    row = {
+        program: {measure: quartiles(series) for measure, series in measures.items()}
+        for program, measures in values.items()
+    }
+    if "baseline" in row:  # a filtered log call has none
+        row["ratio"] = {measure: ratios(values, measure) for measure in ratio_measures}
     return row
 
 
-def strace(*arguments):
-    run("strace", f"--output={CALLS}", *arguments)
-    return CALLS.read_text()
+class Bench:
+    """Measures all tables on one device, {table: {row: {program: {measure: quartiles}}}}."""
 
+    def __init__(self, options):
+        self.build = options.build.resolve()
+        self.rounds = options.rounds
+        self.runs = options.runs
+        self.root = Path(os.environ["TPD_DEVICE_ROOT"])
+        self.output = self.root / "output"
+        self.programs = {
+            "true": "/bin/true",
+            "shared": f"{self.build}/bench/baseline_shared",
+            "baseline": f"{self.build}/bench/baseline",
+            "tpd": f"{self.build}/tpd",
+        }
+        self.step = 0
 
-def own_calls(command):
-    """Calls and results from the first look at the device on, memory and process ids aside."""
-    text = strace("-e", "trace=!%memory,getpid,gettid,clone3,vfork,wait4", *command)
-    return re.findall(r"^(\w+)\(.*\) += (-?\d+)", text[text.index('"/dev/null"'):], re.M)
+    def show_progress(self, what):
+        self.step += 1
+        if sys.stderr.isatty():
+            print(f"[{self.step}/{STEPS}] {what}", file=sys.stderr, flush=True)
 
+    def write_property(self, name, value):
+        """As set_property, without a process that would disturb the caches before a timed run."""
+        (self.root / "properties" / name).write_text(value)
 
-def system_calls(command):
-    """With those of the programs that it starts."""
-    return int(strace("-c", "-f", "-U", "calls", *command).split()[-2])
+    def measure_all(self):
+        tables = {"parts": self.measure_parts()}
+        tables["commands"] = self.measure_commands()
+        set_property(PERMISSIVE, "true")
+        tables["reply"] = self.measure_replies()
+        tables["clients"] = self.measure_clients()
+        tables["log"] = self.measure_logs()
+        tables["properties"] = self.measure_properties()
+        return tables
 
+    # Timing: rounds of runs, in which the programs take turns.
 
-def instructions(command):
-    """Those of the program itself, in user mode."""
-    log = run("valgrind", "--log-fd=1", "--tool=callgrind", "--callgrind-out-file=/dev/null",
-              *command)
-    return int(re.search(r"Collected : (\d+)", log)[1])
-
-
-def page_faults(command):
-    quiet = [(os.POSIX_SPAWN_OPEN, 1, OUTPUT, os.O_WRONLY, 0)]
-    process = os.posix_spawn(command[0], command, os.environ, file_actions=quiet)
-    return os.wait4(process, 0)[2].ru_minflt
-
-
-def measure_command(argument, prepare):
-    commands = {name: [program, argument] for name, program in PROGRAMS.items()}
-
-    def each(measure):
-        values = {}
-        for name in "baseline", "tpd":
-            run("setprop", *prepare)
-            values[name] = measure(commands[name])
+    def time_rounds(self, commands, runs, prepare):
+        """Returns {program: {measure: [median of each round]}}."""
+        values = {program: {} for program in commands}
+        for _ in range(self.rounds):
+            for program, samples in self.time_round(commands, runs, prepare).items():
+                for measure in samples[0]:
+                    typical = median(sample[measure] for sample in samples)
+                    values[program].setdefault(measure, []).append(typical)
         return values
 
-    for same in (lambda command: run(*command)), own_calls:
-        values = each(same)
-        if values["tpd"] != values["baseline"]:
-            sys.exit(f"the baseline does something else than tpd: {values}")
-    row = alternate(commands, 20, 25, "--prepare", shlex.join(["setprop", *prepare]))
-    for measure in instructions, system_calls, page_faults:
-        values = each(measure)
-        for name, value in values.items():
-            row[name][measure.__name__] = value
-        row["ratio"][measure.__name__] = round(values["tpd"] / values["baseline"], 2)
-    return row
+    def time_round(self, commands, runs, prepare):
+        samples = {program: [] for program in commands}
+        for _ in range(runs):
+            for program, command in commands.items():
+                prepare()
+                samples[program].append(time_run(command, self.output))
+        return samples
+
+    def time_forwarded(self, wrapper=(), runs=None):
+        """Times the forwarded command of the baseline and of tpd."""
+        commands = {
+            program: [*wrapper, self.programs[program], FORWARDED]
+            for program in ("baseline", "tpd")
+        }
+        return self.time_rounds(commands, runs or self.runs, lambda: None)
+
+    # One function for each table
+
+    def measure_parts(self):
+        self.show_progress("parts")
+        results = self.build / "parts.json"
+        run(
+            [
+                *["taskset", "-c", "0", f"{self.build}/bench/parts"],
+                "--benchmark_enable_random_interleaving=true",
+                f"--benchmark_repetitions={self.rounds}",
+                "--benchmark_min_time=0.02",
+                f"--benchmark_out={results}",
+            ],
+            env={**os.environ, "TPD_DEVICE_ROOT": f"{self.root}-parts"},
+        )
+        values = {}
+        for result in json.loads(results.read_text())["benchmarks"]:
+            if result["run_type"] == "iteration":
+                part, program, *size = result["run_name"].removesuffix("/process_time").split("/")
+                row = values.setdefault(" ".join([part, *size]), {})
+                row.setdefault(program, {"processor_ns": []})
+                row[program]["processor_ns"].append(result["cpu_time"])
+        return {part: summarize(row, ["processor_ns"]) for part, row in sorted(values.items())}
+
+    def measure_commands(self):
+        rows = {}
+        for name, (argument, prepare) in COMMANDS.items():
+            self.show_progress(f"commands: {name}")
+            rows[name] = self.measure_command(argument, lambda: self.write_property(*prepare))
+        return rows
+
+    def measure_command(self, argument, prepare):
+        commands = {program: [path, argument] for program, path in self.programs.items()}
+        self.require_same_behaviour(commands, prepare)
+        values = self.time_rounds(commands, self.runs, prepare)
+        for program in "baseline", "tpd":
+            values[program]["instructions"] = []
+            values[program]["system_calls"] = []
+            for _ in range(COUNTS):
+                prepare()
+                instructions = count_instructions(commands[program])
+                prepare()
+                system_calls = count_system_calls(commands[program], self.output)
+                values[program]["instructions"].append(instructions)
+                values[program]["system_calls"].append(system_calls)
+        return summarize(values, TIMES)
+
+    def require_same_behaviour(self, commands, prepare):
+        """Compares the output and the system calls of the baseline and of tpd."""
+        behaviour = {}
+        for program in "baseline", "tpd":
+            prepare()
+            output = run(commands[program])
+            prepare()
+            calls = list_system_calls(commands[program], self.output)
+            behaviour[program] = (output, calls)
+        if behaviour["tpd"] != behaviour["baseline"]:
+            sys.exit(f"the baseline behaves differently from tpd: {behaviour}")
+
+    def measure_replies(self):
+        rows = {}
+        set_property("sim.fault", "huge")
+        for size in REPLY_BYTES:
+            self.show_progress(f"reply: {size} bytes")
+            set_property("sim.fault_arg", size)
+            rows[size] = summarize(self.time_forwarded(), TIMES)
+        set_property("sim.fault", "")
+        return rows
+
+    def measure_clients(self):
+        """Times of one of the commands of a batch."""
+        rows = {}
+        batch = self.root / "batch"
+        batch.write_text("run\n" * BATCH)
+        for count in CLIENTS:
+            self.show_progress(f"clients: {count}")
+            xargs = ["/usr/bin/xargs", "-a", str(batch), "-P", str(count), "-I{}"]
+            values = self.time_forwarded(xargs, runs=1)
+            for measures in values.values():
+                for measure, series in measures.items():
+                    measures[measure] = [value / BATCH for value in series]
+            rows[count] = summarize(values, TIMES)
+        return rows
+
+    def measure_logs(self):
+        rows = {}
+        for size in LOG_BYTES:
+            self.show_progress(f"log: {size} bytes")
+            os.truncate(self.root / "log", size)
+            rows[size] = summarize(self.time_forwarded(), TIMES)
+        os.truncate(self.root / "log", 0)
+        return rows
+
+    def measure_properties(self):
+        rows = {}
+        for count in PROPERTIES:
+            self.show_progress(f"properties: {count}")
+            for number in range(count):
+                (self.root / f"properties/bench.{number}").touch()
+            rows[count] = summarize(self.time_forwarded(), TIMES)
+        return rows
 
 
-def parts():
-    rows = {}
-    for result in json.loads((BUILD / "parts.json").read_text())["benchmarks"]:
-        if result["aggregate_name"] == "median":
-            part, program, *size = result["run_name"].removesuffix("/process_time").split("/")
-            row = rows.setdefault(" ".join([part, *size]), {"baseline": {}, "tpd": {}, "ratio": {}})
-            row[program]["cpu_ns"] = round(result["cpu_time"], 1)
-    for row in rows.values():
-        if row["baseline"]:
-            row["ratio"]["cpu_ns"] = round(row["tpd"]["cpu_ns"] / row["baseline"]["cpu_ns"], 2)
-    return dict(sorted(rows.items()))
+# The tables of docs/performance.md, in its order
 
 
-def grow(sizes, change, wrapper=lambda size: [], runs=20):
-    rows = {}
-    for size in sizes:
-        change(size)
-        rows[size] = alternate({name: [*wrapper(size), PROGRAMS[name], FORWARDED]
-                                for name in ("baseline", "tpd")}, 10, runs)
-    return rows
+def number(value):
+    if value < 10:
+        return f"{value:.2f}"
+    return f"{value:,.0f}"
 
 
-def with_clients(count):
-    (ROOT / "batch").write_text("run\n" * BATCH)
-    return ["xargs", "-a", f"{ROOT}/batch", "-P", str(count), "-I{}"]
+def spread(summary):
+    """The median, with the quartiles unless they read the same."""
+    low, middle, high = map(number, summary)
+    return middle if low == high else f"{middle} ({low} to {high})"
 
 
-def fill_properties(count):
-    for number in range(count):
-        (ROOT / f"properties/bench.{number}").touch()
+def size(count):
+    for unit, name in (GIB, "GiB"), (MIB, "MiB"), (KIB, "KiB"):
+        if count >= unit:
+            return f"{count // unit} {name}"
+    return f"{count} bytes"
 
 
-def measure():
-    tables = {"commands": {name: measure_command(*each) for name, each in COMMANDS.items()}}
-    tables["parts"] = parts()
-    run("setprop", PERMISSIVE, "true")
-    run("setprop", "sim.fault", "huge")
-    tables["reply_bytes"] = grow([16, 256, 4096, 65536, LARGEST_REPLY],
-                                 lambda size: run("setprop", "sim.fault_arg", size))
-    run("setprop", "sim.fault", "")
-    tables["clients"] = grow([1, 2, 4, 8, 16, 32, 64], lambda count: None, with_clients, 3)
-    tables["log_bytes"] = grow([1, 1 << 20, 1 << 25, 1 << 30],
-                               lambda size: os.truncate(ROOT / "log", size))
-    tables["properties"] = grow([10, 1000, 10000, 100000], fill_properties)
-    return tables
+def print_table(heading, rows):
+    print(f"\n| {' | '.join(heading)} |\n|{'---|' * len(heading)}")
+    for cells in rows:
+        print(f"| {' | '.join(cells)} |")
+
+
+def time_cells(row):
+    return [
+        spread(row[program][measure])
+        for measure in TIMES
+        for program in ("baseline", "tpd", "ratio")
+    ]
 
 
 def print_tables(tables):
-    for title, rows in tables.items():
-        columns = [title, "measure", *next(iter(rows.values()))]
-        print(f"\n| {' | '.join(columns)} |\n|{'---|' * len(columns)}")
-        for name, row in rows.items():
-            for measure in row["tpd"]:
-                cells = [str(column.get(measure, "")) for column in row.values()]
-                print(f"| {name} | {measure} | {' | '.join(cells)} |")
+    times = ["baseline, processor", "`tpd`", "ratio", "baseline, elapsed", "`tpd`", "ratio"]
+    commands = tables["commands"]
+    print_table(
+        ["command, µs", *times], [[name, *time_cells(row)] for name, row in commands.items()]
+    )
+    print_table(
+        ["program, µs", "processor time", "elapsed time"],
+        [
+            [name, *(spread(commands["forwarded"][program][measure]) for measure in TIMES)]
+            for program, name in (
+                ("true", "`/bin/true`, shared C library"),
+                ("shared", "baseline, shared C library"),
+                ("baseline", "baseline"),
+                ("tpd", "`tpd`"),
+            )
+        ],
+    )
+    print_table(
+        ["command", "count", "baseline", "`tpd`"],
+        [
+            [name, label, spread(row["baseline"][measure]), spread(row["tpd"][measure])]
+            for name, row in commands.items()
+            for measure, label in (
+                ("instructions", "user instructions"),
+                ("system_calls", "system calls"),
+                ("page_faults", "page faults"),
+            )
+        ],
+    )
+    cases = {"as in the first table": commands["forwarded"]}
+    for length, row in tables["reply"].items():
+        largest = length == LARGEST_REPLY
+        cases["the largest reply" if largest else f"a reply of {size(length)}"] = row
+    for length, row in tables["log"].items():
+        cases[f"a log of {size(length)}"] = row
+    for count, row in tables["properties"].items():
+        cases[f"{count:,} properties"] = row
+    print_table(
+        ["forwarded, µs", *times], [[name, *time_cells(row)] for name, row in cases.items()]
+    )
+    print_table(
+        ["clients, µs a command", *times],
+        [[str(count), *time_cells(row)] for count, row in tables["clients"].items()],
+    )
+    print_table(
+        ["part, ns", "baseline", "`tpd`", "ratio"],
+        [
+            [
+                f"`{part}`",
+                *(
+                    spread(row[program]["processor_ns"]) if program in row else ""
+                    for program in ("baseline", "tpd", "ratio")
+                ),
+            ]
+            for part, row in tables["parts"].items()
+        ],
+    )
 
 
-def draw(title, tables):
-    """Hands gnuplot each table's times as a block with its name."""
+# The picture
+
+
+def write_gnuplot_data(path, title, tables):
+    """Writes each table as a data block: row, then three columns for each program."""
     lines = [f"title = '{title}'"]
     for table, rows in tables.items():
+        if table == "parts":
+            continue
         lines.append(f"${table} << EOD")
         for name, row in rows.items():
-            times = [row[program].get(kind) for program in row for kind in TIMED]
-            lines.append(" ".join(map(json.dumps, [name, *times])))
+            columns = [
+                figure
+                for program, measures in row.items()
+                if program != "ratio"
+                for figure in measures["processor_us"]
+            ]
+            lines.append(" ".join(map(json.dumps, [name, *columns])))
         lines.append("EOD")
-    (BUILD / "results.gp").write_text("\n".join(lines) + "\n")
-    run("gnuplot", "-e", f"set output '{PICTURE}'", BUILD / "results.gp",
-        Path(__file__).with_name("picture.gp"))
+    path.write_text("\n".join(lines) + "\n")
+
+
+def draw(build, picture, title, tables):
+    data = build / "results.gp"
+    write_gnuplot_data(data, title, tables)
+    script = Path(__file__).with_name("picture.gp")
+    run(["gnuplot", "-e", f"set output '{picture}'", str(data), str(script)])
+
+
+def describe_machine():
+    hypervisor = " hypervisor" in Path("/proc/cpuinfo").read_text()
+    kind = "virtual machine" if hypervisor else "machine"
+    return f"{kind} with {os.cpu_count()} {os.uname().machine} cores"
 
 
 def main():
-    kind = "virtual machine" if " hypervisor" in Path("/proc/cpuinfo").read_text() else "machine"
-    title = f"{time.strftime('%Y-%m-%d')}, {kind} with {os.cpu_count()} {os.uname().machine} cores"
-    tables = measure()
-    (BUILD / "results.json").write_text(json.dumps({"title": title, "tables": tables}, indent=1))
+    options = parse_options()
+    title = f"{time.strftime('%Y-%m-%d')}, {describe_machine()}"
+    tables = Bench(options).measure_all()
+    results = {"title": title, "tables": tables}
+    (options.build / "results.json").write_text(json.dumps(results, indent=1))
     print(title)
     print_tables(tables)
-    draw(title, tables)
+    draw(options.build, options.picture, title, tables)
 
 
-main()
+if __name__ == "__main__":
+    main()
