@@ -424,7 +424,8 @@ def describe_machine():
 
 def main():
     options = parse_options()
-    title = f"{time.strftime('%Y-%m-%d')}, {describe_machine()}"
+    rounds = f"{options.rounds} rounds of {options.runs} runs"
+    title = f"{time.strftime('%Y-%m-%d')}, {describe_machine()}, {rounds}"
     tables = Bench(options).measure_all()
     results = {"title": title, "tables": tables}
     (options.build / "results.json").write_text(json.dumps(results, indent=1))
