@@ -328,63 +328,64 @@ def time_cells(row):
 
 
 def print_tables(tables):
-    times = ["baseline, processor", "`tpd`", "ratio", "baseline, elapsed", "`tpd`", "ratio"]
     commands = tables["commands"]
-    print_table(
-        ["command, µs", *times], [[name, *time_cells(row)] for name, row in commands.items()]
-    )
-    print_table(
-        ["program, µs", "processor time", "elapsed time"],
-        [
-            [name, *(spread(commands["forwarded"][program][measure]) for measure in TIMES)]
-            for program, name in (
-                ("true", "`/bin/true`, shared C library"),
-                ("shared", "baseline, shared C library"),
-                ("baseline", "baseline"),
-                ("tpd", "`tpd`"),
-            )
-        ],
-    )
-    print_table(
-        ["command", "count", "baseline", "`tpd`"],
-        [
-            [name, label, spread(row["baseline"][measure]), spread(row["tpd"][measure])]
-            for name, row in commands.items()
-            for measure, label in (
-                ("instructions", "user instructions"),
-                ("system_calls", "system calls"),
-                ("page_faults", "page faults"),
-            )
-        ],
-    )
-    cases = {"as in the first table": commands["forwarded"]}
+    print_times("command, µs", commands)
+    print_programs(commands["forwarded"])
+    print_counts(commands)
+    print_times("forwarded, µs", {"as in the first table": commands["forwarded"], **cases(tables)})
+    print_times("clients, µs a command", tables["clients"])
+    print_parts(tables["parts"])
+
+
+def print_times(what, rows):
+    times = ["baseline, processor", "`tpd`", "ratio", "baseline, elapsed", "`tpd`", "ratio"]
+    print_table([what, *times], [[str(name), *time_cells(row)] for name, row in rows.items()])
+
+
+def print_programs(row):
+    names = {
+        "true": "`/bin/true`, shared C library",
+        "shared": "baseline, shared C library",
+        "baseline": "baseline",
+        "tpd": "`tpd`",
+    }
+    rows = [
+        [name, *(spread(row[program][measure]) for measure in TIMES)]
+        for program, name in names.items()
+    ]
+    print_table(["program, µs", "processor time", "elapsed time"], rows)
+
+
+def print_counts(commands):
+    rows = []
+    for name, row in commands.items():
+        for measure in "instructions", "system_calls", "page_faults":
+            cells = [spread(row[program][measure]) for program in ("baseline", "tpd")]
+            rows.append([name, measure.replace("_", " "), *cells])
+    print_table(["command", "count", "baseline", "`tpd`"], rows)
+
+
+def print_parts(parts):
+    rows = []
+    for part, row in parts.items():
+        cells = [f"`{part}`"]
+        for program in "baseline", "tpd", "ratio":
+            cells.append(spread(row[program]["processor_ns"]) if program in row else "")
+        rows.append(cells)
+    print_table(["part, ns", "baseline", "`tpd`", "ratio"], rows)
+
+
+def cases(tables):
+    """The rows of the tables of forwarded commands, under the names that the page gives them."""
+    rows = {}
     for length, row in tables["reply"].items():
         largest = length == LARGEST_REPLY
-        cases["the largest reply" if largest else f"a reply of {size(length)}"] = row
+        rows["the largest reply" if largest else f"a reply of {size(length)}"] = row
     for length, row in tables["log"].items():
-        cases[f"a log of {size(length)}"] = row
+        rows[f"a log of {size(length)}"] = row
     for count, row in tables["properties"].items():
-        cases[f"{count:,} properties"] = row
-    print_table(
-        ["forwarded, µs", *times], [[name, *time_cells(row)] for name, row in cases.items()]
-    )
-    print_table(
-        ["clients, µs a command", *times],
-        [[str(count), *time_cells(row)] for count, row in tables["clients"].items()],
-    )
-    print_table(
-        ["part, ns", "baseline", "`tpd`", "ratio"],
-        [
-            [
-                f"`{part}`",
-                *(
-                    spread(row[program]["processor_ns"]) if program in row else ""
-                    for program in ("baseline", "tpd", "ratio")
-                ),
-            ]
-            for part, row in tables["parts"].items()
-        ],
-    )
+        rows[f"{count:,} properties"] = row
+    return rows
 
 
 # The picture
