@@ -123,3 +123,10 @@ def test_runs_the_ci_example(stopped_device):
     page = source("docs/automation.md")
     example = page.partition("<!-- ci-example -->\n")[2]
     run_in_source(stopped_device, fenced(example))
+
+
+def test_client_passes_any_argument_unchanged(device):
+    argument = "it's  $HOME\n`x`"
+    script = '. client/tpd.sh; tpd_send captest "$1"; printf %s "$TPD_RESULT"'
+    answer = device.output("sh", "-c", script, "sh", argument, cwd=SOURCE)
+    assert answer == f"captest {argument}: PASS"
