@@ -66,7 +66,7 @@ namespace {
 
 constexpr uint32_t kExecuteCommandCode = 0;
 
-// Log lines have no tag, so that readers show the program's name.
+// Readers show the program's name for a null tag.
 constexpr const char* kNoTag = nullptr;
 
 const android::StaticString16 kDescriptor(

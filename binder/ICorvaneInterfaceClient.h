@@ -1,5 +1,5 @@
-// The daemon's binder interface as a client sees it: one operation, "execute this command with
-// these parameters and answer with a string".
+// The client side of the daemon's binder interface. It has one operation: execute a command with
+// parameters and return a string.
 #pragma once
 
 #include <string>
@@ -15,8 +15,8 @@ class ICorvaneInterfaceClient : public android::IInterface {
   public:
     static const android::String16 descriptor;
 
-    // The implementation itself when the binder lives in this process, otherwise a new proxy on it.
-    // Null when the binder is null.
+    // Returns the implementation if the binder is in this process, otherwise a new proxy. Null for
+    // a null binder.
     static android::sp<ICorvaneInterfaceClient> asInterface(
             const android::sp<android::IBinder>& binder);
 
@@ -25,11 +25,13 @@ class ICorvaneInterfaceClient : public android::IInterface {
 
     virtual const android::String16& getInterfaceDescriptor() const;
 
-    // Has the daemon execute `cmd` with `params`. A command that carries kTwoWayMarker is sent
-    // without everything up to and including it, and always two-way; any other goes one-way when
-    // the lists below name it. Two-way: returns 0 with the daemon's answer in `reply` (empty when
-    // it answered without a string), or the transport's status with `reply` untouched. One-way:
-    // `reply` is "OK" whatever the status is.
+    // Sends `cmd` with `params` to the daemon. A command that contains kTwoWayMarker is always
+    // two-way; the marker and what precedes it are not sent. Any other command is one-way if it or
+    // its parameters match the lists below.
+    //
+    // Two-way: on success returns 0 and the daemon's answer in `reply`, empty if the answer has no
+    // string; otherwise returns the transport's status and leaves `reply` alone. One-way: `reply`
+    // is "OK" regardless of the status.
     virtual android::status_t ExecuteCommand(std::string& reply, std::string cmd,
                                              std::string params) = 0;
 };
@@ -43,8 +45,8 @@ class BpCorvaneInterfaceClient : public android::BpInterface<ICorvaneInterfaceCl
                                      std::string params) override;
 };
 
-// Records the daemon's death in the log and ends its own registration. It repairs nothing: the next
-// call on the dead binder fails, and the runner looks the service up again.
+// Logs the daemon's death and unlinks itself. Recovery is elsewhere: the next call on the dead
+// binder fails, and RunCmdParms() looks the service up again.
 class MyDeathRecipient : public android::IBinder::DeathRecipient {
   public:
     explicit MyDeathRecipient(const android::sp<android::IBinder>& binder);
@@ -56,14 +58,15 @@ class MyDeathRecipient : public android::IBinder::DeathRecipient {
     android::sp<android::IBinder> mBinder;
 };
 
-// Whether any entry of `list` occurs in `text`, byte for byte; an empty entry occurs everywhere.
+// Whether any entry of `list` is a substring of `text`.
 bool IsAsync(const std::vector<std::string>& list, std::string text);
 
-// What is sent one-way: matched against the command and against the parameters. Read-only.
+// Commands that are sent one-way. The first list is matched against the command, the second against
+// the parameters. Read-only.
 extern const std::vector<std::string> g_asyncCmds;
 extern const std::vector<std::string> g_asyncThpCmds;
 
-// The service binder that the last lookup found, null when there is none, and the one recipient
-// linked to every service binder of this process.
+// The service's binder, null before the first lookup and after a failed call, and the death
+// recipient that is linked to every such binder of this process.
 extern android::sp<android::IBinder> g_thpBinder;
 extern android::sp<MyDeathRecipient> g_deathRecipient;

@@ -30,12 +30,12 @@ constexpr char kTimeoutText[] =
         "corvane_daemon binder server execute command return ERROR, may caused by processing "
         "timeout.";
 
-// The interface fixes all log lines below: without a tag, so that readers show the program's name;
-// many at ERROR though nothing failed; and with a 1 behind "retry:", whichever write it is.
+// The log lines are part of the interface: they have no tag, for which readers show the program's
+// name, many are at ERROR though nothing failed, and "retry:" is always followed by 1.
 constexpr const char* kNoTag = nullptr;
 
-// Writes until the value reads back, a bounded number of times. Of a rejected write only its log
-// lines remain. Not Property::Set(), which reads, writes and logs in another order.
+// Writes up to six times, until the value reads back. A failure shows only in the log. Not
+// Property::Set(): that logs other lines, and binder/ does not depend on property/.
 void SetProperty(std::string key, std::string value) {
     char current[kPropertyBufferBytes] = {};
     for (int writes = 0; writes < kPropertyWrites; ++writes) {
@@ -50,7 +50,7 @@ void SetProperty(std::string key, std::string value) {
     }
 }
 
-// One lookup: the service's binder with the death recipient linked to it, or null.
+// Looks the service up once. Returns its binder with the death recipient linked to it, or null.
 sp<IBinder> LookUpService() {
     constexpr char kName[] = "ThpGetBinder";
     __android_log_print(ANDROID_LOG_INFO, kNoTag, "%s", kName);

@@ -1,22 +1,22 @@
-// Commands to the daemon over the vendor binder, for the rest of the tool.
+// Sends commands to the daemon over the vendor binder.
 #pragma once
 
 #include <string>
 
-// Makes the call of a command that carries it two-way; sent without it and all that precedes it.
+// Makes the call two-way when the command contains it. It is removed before the command is sent.
 constexpr char kTwoWayMarker[] = "[TPD]";
 
-// How an answer begins when the service could not be obtained.
+// The prefix of a result when the service was not found.
 constexpr char kNoServicePrefix[] = "0F_1F; ";
 
-// Has the daemon execute `cmd` with `params` and returns its answer ("OK" for a one-way call). A
-// failed call is tried once more on a fresh service lookup. When the service cannot be obtained the
-// answer begins with kNoServicePrefix, when both calls fail it contains "ERROR"; either way a
-// restart of the daemon was requested. Blocks until the daemon answers: the call has no time-out.
+// Sends `cmd` with `params` to the daemon and returns its answer, "OK" for a one-way call. A failed
+// call is retried once after a new service lookup. Returns a text that begins with kNoServicePrefix
+// if the service is not found, or one that contains "ERROR" if both calls fail; in both cases the
+// daemon is restarted. There is no time-out: blocks until the daemon answers.
 std::string RunCmdParms(std::string cmd, std::string params);
 
-// Restarts the daemon by switching its service property off and on.
+// Restarts the daemon by setting its service property to "0" and then "1".
 void ResetDaemon();
 
-// Keeps parameters that carry a screen-state marker in the screen-state property.
+// Stores the parameters in the screen-state property if they contain a screen-state marker.
 void StoreScreenState(std::string params);

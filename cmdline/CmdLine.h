@@ -5,19 +5,19 @@
 
 #include "cmdline/StringPairParser.h"
 
-// Reads the command line once, at construction.
+// Reads the kernel command line once, at construction.
 class CmdLine : public StringPairParser {
   public:
     CmdLine();
 
-    // The first line of the kernel command line, at most 8191 bytes and up to its first NUL. Empty
-    // when it cannot be read.
+    // The first line of the kernel command line, up to 8191 bytes or the first NUL. Empty if it
+    // cannot be read.
     static std::string GetCmdLine();
 
-    // Booted into recovery or upgrade.
+    // Whether the device was booted into recovery or an upgrade.
     bool IsUpgradeMode() const;
 
-    // Booted into a factory build.
+    // Whether the device runs a factory build.
     bool IsFactoryVersion() const;
 
   private:

@@ -1,5 +1,5 @@
-// The daemon's client: waits for the daemon, sends it one command and judges the outcome. Every
-// outcome is a text for the user; nothing here fails in another way.
+// The daemon's client: waits for the daemon, sends it a command and judges the outcome. Every
+// outcome, failures included, is a text for the user.
 #pragma once
 
 #include <cstdint>
@@ -9,29 +9,30 @@ class TpdClient {
   public:
     TpdClient();
 
-    // Waits for the daemon, has it execute `cmd` with `params` and returns its answer. A text that
-    // begins with "0P_1P; " says that nothing was sent: the daemon is not alive, or its firmware is
-    // being updated. After two failed waits in a row each further wait makes a single check.
+    // Waits for the daemon, sends it `cmd` with `params` and returns its answer. If the daemon is
+    // not alive or is updating its firmware, sends nothing and returns a text that begins with
+    // "0P_1P; ". After two failed waits in a row, further waits check only once.
     std::string ThpExecuteCmdParams(std::string cmd, std::string params);
 
-    // Sends one command without waiting. For a capacity test the answer grows by a failure text
-    // when the daemon is not alive afterwards or its reboot indicator changed meanwhile.
+    // Sends a command without waiting first. If the daemon died or restarted during a capacity
+    // test, a failure text is appended to the answer.
     std::string RunCmd(const char* cmd, const char* params);
 
     // Whether this is a capacity test in running-test mode.
     static bool IsCaptestInRt(std::string cmd, std::string params);
 
-    // Whether the daemon is up and its binder service published; appends both states to `info`.
+    // Whether the daemon is alive and its binder service is published. Appends both states to
+    // `info`.
     static bool IsDaemonAlive(std::string& info);
 
-    // Checks at most `checks` times, 200 ms apart, whether the daemon is alive, and returns a
-    // report. The outcome itself is in daemonUnavailable. A daemon that was seen alive in this
-    // process is not checked again until a command has failed.
+    // Checks up to `checks` times, 200 ms apart, whether the daemon is alive, sets
+    // daemonUnavailable and returns a report. Once the daemon was seen alive in this process, it is
+    // not checked again until a command has failed.
     std::string WaitDaemonAlive(int checks);
 
-    int32_t daemonUnavailable;  // 0: the last wait or command found the daemon, otherwise 1
+    int32_t daemonUnavailable;  // 0 if the last wait or command found the daemon, otherwise 1
 };
 
-// What all clients of the process remember of the daemon, for its single thread.
-extern bool aliveConfirmed;  // a check found it alive, and no command has failed since
-extern int failedWaitCount;  // waits in a row that did not find it, at most 2
+// Shared by all clients of the process, which has one thread.
+extern bool aliveConfirmed;  // the daemon was seen alive and no command has failed since
+extern int failedWaitCount;  // failed waits in a row, at most 2

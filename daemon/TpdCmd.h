@@ -1,6 +1,6 @@
-// The daemon's controller: starts, stops and restarts it, switches its log, and checks whether
-// SELinux lets commands through to it. It never handles the process itself; it writes the daemon's
-// control properties and the platform acts on them.
+// The daemon's controller: starts, stops and restarts the daemon, switches its log, and decides
+// whether commands may be forwarded. It only writes the daemon's control properties; the platform's
+// init acts on them.
 #pragma once
 
 #include <cstdint>
@@ -10,30 +10,31 @@
 
 class TpdCmd {
   public:
-    // Creates the client. False, with a message on standard output, when there is no memory for it.
+    // Creates the client. Prints a message on standard output and returns false if out of memory.
     bool Init();
 
     void StartCorvane();
     void StopCorvane();
     void RebootCorvane();
 
-    // Whether the touch-processing log counts as on: as its property says, else by the user type.
+    // Whether the touch-processing log is on: its property decides, or the user type if that is
+    // unset.
     static bool IsThplogEnable();
 
-    // Switch the touch-processing log and restart the daemon so that it takes effect. They do
-    // nothing in upgrade mode or when the log is in that state already.
+    // Switch the touch-processing log and restart the daemon for the change to take effect. Do
+    // nothing in upgrade mode or if the log is already in that state.
     void EnableThplog();
     void DisableThplog();
 
-    // Reading of the monotonic clock in milliseconds; 0 when it cannot be read.
+    // The monotonic clock in milliseconds, or 0 if it cannot be read.
     static uint64_t GetMonotonicTime();
 
-    // Whether commands may be forwarded to the daemon: when a stored flag, upgrade mode, a factory
-    // build or a permissive SELinux says so. A permissive SELinux is stored in a property for later
-    // runs. Any failure to find out means no.
+    // Whether commands may be forwarded: a stored flag is set, the device is in upgrade mode or
+    // runs a factory build, or SELinux is permissive. The last is stored in the flag for later
+    // runs. If it cannot be determined, the answer is no.
     bool IsSelinuxPermissive();
 
-    // The client, null before Init() succeeded. The controller owns it.
+    // The client, owned by the controller. Null before Init() succeeds.
     TpdClient* GetTpdclient() const;
 
   private:

@@ -12,7 +12,7 @@ constexpr char kTag[] = "corvane_daemon";
 constexpr int kDefaultLogLevel = LOG_INFO;
 constexpr size_t kMessageBytes = 2048;
 
-// In the order of LogLevel, from LOG_ERROR.
+// Indexed by LogLevel, from LOG_ERROR.
 constexpr int kPriorities[] = {ANDROID_LOG_ERROR, ANDROID_LOG_WARN, ANDROID_LOG_INFO,
                                ANDROID_LOG_INFO};
 
@@ -33,7 +33,7 @@ void LogBase::Printf(LogLevel level, std::string function, int line, ...) {
     if (GetLogLevel() < static_cast<int>(level)) {
         return;
     }
-    // Zero-filled: what a failed formatting leaves behind is still terminated.
+    // Zero-filled, so that the text is terminated even if formatting fails.
     char message[kMessageBytes] = {};
     va_list args;
     va_start(args, line);

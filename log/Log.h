@@ -1,5 +1,5 @@
-// The log facility: printf-style lines made of the caller's name, the source line in brackets and
-// the message, filtered by level, in the Android log.
+// The log facility: writes printf-style messages to the Android log, filtered by level and prefixed
+// with the caller's name and source line.
 #pragma once
 
 #include <mutex>
@@ -12,7 +12,7 @@ enum LogLevel : int {
     LOG_DEBUG = 4,  // written with the priority of LOG_INFO
 };
 
-// Any thread may log at any time. A specialised facility overrides GetLogLevel() for another
+// Any thread may log at any time. A derived facility overrides GetLogLevel() to set another
 // threshold and Append() to keep texts in memory.
 class LogBase {
   public:
@@ -23,26 +23,26 @@ class LogBase {
 
     virtual std::string GetName() const;
 
-    // Writes one line unless `level` is above the threshold. `function` is the caller's full
-    // signature or plain name; after `line` come the printf format (const char*) and its arguments.
-    // A message is cut when it is longer than 2047 bytes, and a line in the log says so.
+    // Writes one line unless `level` is above the threshold. `function` is the caller's name or
+    // full signature; the printf format (const char*) and its arguments follow `line`. A message
+    // longer than 2047 bytes is cut, and an extra log line says so.
     virtual void Printf(LogLevel level, std::string function, int line, ...);
 
-    // Hook for keeping `text` in mLog, under mMutex. Does nothing here.
+    // Hook that keeps `text` in mLog, under mMutex. Does nothing by default.
     virtual void Append(std::string text) const;
 
     // The text kept in memory; GetLogClear() also empties it.
     virtual std::string GetLog() const;
     virtual std::string GetLogClear() const;
 
-    // The highest level that is written.
+    // The threshold: the highest level that is written.
     virtual int GetLogLevel() const;
 
     // Writes "function[line] message" when `level` is a LogLevel not above the threshold.
     void AndroidLog(unsigned int level, const std::string& function, int line,
                     const std::string& message);
 
-    // The qualified name in a function signature: without return type and parameter list.
+    // Returns the qualified name in a function signature, without return type and parameters.
     std::string PrettyTrim(std::string signature);
 
   protected:
@@ -51,5 +51,5 @@ class LogBase {
     mutable std::mutex mMutex;
 };
 
-// The process-wide facility, "sys".
+// The process-wide facility, named "sys".
 extern LogBase gSysLog;

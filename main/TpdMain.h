@@ -8,31 +8,31 @@
 
 class TpdCmd;
 
-// A local command. Its handler answers with a short confirmation.
+// A local command. Its handler returns a short confirmation.
 struct Cmd {
     std::function<std::string(std::string)> handler;
 };
 
-// The one controller, which main creates and destroys; null outside of it.
+// The controller. main creates and destroys it; null before and after.
 extern TpdCmd* g_tpdCmd;
 
-// The local commands by name; main fills it first and empties it last.
+// The local commands by name. main fills the table before it dispatches and empties it at the end.
 extern std::map<std::string, Cmd> gTpdCmds;
 
-// Put their commands into the table; a name that is already there keeps its handler.
+// Add local commands to the table. A name that is already there keeps its handler.
 void AddBasicTpdCmds();
 void AddThplogTpdCmds();
 void AddRawTpdCmds();
 void AddAfelogTpdCmds();
 void AddShowtouchTpdCmds();
 
-// Runs the local command of exactly this name and drops its confirmation. False when there is none.
-// The interface fixes this spelling.
+// Runs the local command of that name and discards its confirmation. Returns false if there is no
+// such command. The misspelt name is part of the interface.
 bool ExcuteTpdCmd(std::string name);
 
-// The help text that lists the local commands.
+// Returns the help text that lists the local commands.
 std::string CmdsToStr();
 
-// Has the daemon run "TSA_ExecuteCommand" with both arguments, joined by a space, as its parameters
-// and returns the result text. Empty, with nothing sent, when the first argument is empty.
+// Forwards "TSA_ExecuteCommand" with the two arguments, joined by a space, as its parameters and
+// returns the result text. Sends nothing and returns an empty string if `first` is empty.
 std::string Thp_runCommand(std::string first, std::string second);

@@ -9,13 +9,13 @@
 
 namespace {
 
-// The interface fixes the log lines: each write is at ERROR with "retry:1", also a first one that
-// succeeds, and a value found by the second read is at "i = 1".
+// The log lines are part of the interface: every write, even a successful first one, is logged at
+// ERROR with "retry:1", and a value found by the second read with "i = 1".
 constexpr char kTag[] = "corvane_daemon";
 constexpr int kWriteAttempts = 6;
 constexpr useconds_t kPauseUs = 100;
 
-// Written at the rate of touch input: its writes are not worth a log line each.
+// Written at the rate of touch input, therefore not logged.
 constexpr char kSilentKey[] = "odm.thp.trigger_input";
 
 struct Row {

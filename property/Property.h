@@ -1,7 +1,7 @@
-// The daemon's system properties: a fixed table of named rows, reads with defaults, writes that are
-// confirmed by reading them back, and a typed accessor for every row the tool uses.
+// The daemon's system properties: a fixed table of named rows, reads with defaults, writes
+// confirmed by reading back, and a typed accessor for every row that the tool uses.
 //
-// An object is meant for one caller's scope; it caches no value, so every read sees the device.
+// An object lives in the scope of one operation. It caches no values: every read asks the device.
 #pragma once
 
 #include <mutex>
@@ -9,9 +9,9 @@
 #include <vector>
 
 struct PropertyItem {
-    std::string alias;         // name the accessors use, unique in the table
+    std::string alias;         // the accessors' name for the row, unique in the table
     std::string key;           // system property
-    std::string defaultValue;  // of an empty property; empty when the row has none
+    std::string defaultValue;  // for an empty property; empty if the row has none
 };
 
 class Property {
@@ -20,19 +20,19 @@ class Property {
     Property(const Property&) = delete;
     Property& operator=(const Property&) = delete;
 
-    // The row of this alias, or the table's first row when there is none. The object owns it.
+    // The row with this alias, or the table's first row if the alias is unknown. Owned by the
+    // object.
     PropertyItem& GetItem(std::string alias);
 
-    // Reads the property `key` into `out` and returns the length of its value. An empty property is
-    // read once more after a pause; if it stays empty, `out` gets the default, which is also stored
-    // in the property, and the result is the default's length + 1 (0 when there is no default).
+    // Reads the property `key` into `out` and returns the length of the value. An empty property is
+    // read once more after a pause. If it is still empty, the default is stored in the property and
+    // in `out`, and the default's length + 1 is returned, or 0 if there is no default.
     int Get(std::string key, std::string& out, std::string defaultValue);
 
-    // Writes `value` until the property reads back as it, at most six times. Of a rejected write
-    // only its log lines remain.
+    // Writes `value` up to six times, until it reads back. A failure shows only in the log.
     void Set(std::string key, std::string value);
 
-    // Setters. A flag is stored as "true" or "false", a number in decimal.
+    // Setters. Flags are stored as "true" or "false", numbers in decimal.
     void SetDebugOn(bool on);
     void SetRawData(bool on);
     void SetThplogEnable(bool on);
@@ -43,7 +43,7 @@ class Property {
     void SetAfeLog(bool on);
     void SetPermissive(bool on);
 
-    // String getters: `out` and the result are those of Get() with the row's default.
+    // String getters: Get() with the row's default.
     int GetThplogEnable(std::string& out);
     int GetServiceEnable(std::string& out);
     int GetDaeAlive(std::string& out);
@@ -52,12 +52,12 @@ class Property {
     int GetUpdateFW(std::string& out);
     int GetPermissive(std::string& out);
 
-    // The user type as a decimal number; the result is that of Get(). `type` is left untouched when
-    // the property is empty, does not begin with a number or holds one outside the range of int.
+    // The user type, a decimal number. Returns what Get() returns. Leaves `type` alone if the value
+    // does not begin with a number or the number does not fit in an int.
     int GetUserType(int& type);
 
-    // Flag getters: whether the value is exactly "true" or "1". Thus GetRebootTimes() is whether
-    // the count reads "1", not how many restarts there were.
+    // Flag getters: whether the value is exactly "true" or "1". GetRebootTimes() therefore tells
+    // whether the count is "1", not how many restarts there were.
     bool GetServiceEnable();
     bool GetDaeAlive();
     bool GetRebootTimes();
@@ -71,7 +71,7 @@ class Property {
     int GetText(const char* alias, std::string& out);
     bool GetFlag(const char* alias);
 
-    std::mutex mMutex;    // held by each accessor; Get, Set and GetItem never take it
+    std::mutex mMutex;    // held by the accessors; Get, Set and GetItem do not take it
     char mBuf[128] = {};  // last value read
     std::string mValue;   // last string read by a flag getter or GetUserType
     std::vector<PropertyItem> mItems;
