@@ -2,6 +2,7 @@
 #include <android/log.h>
 #include <binder/Parcel.h>
 #include <gmock/gmock.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
@@ -20,6 +21,7 @@ namespace {
 using android::IBinder;
 using android::Parcel;
 using android::sp;
+using android::wp;
 
 constexpr char kDriver[] = "/dev/vndbinder";
 
@@ -115,6 +117,19 @@ class TestService : public android::BBinder {
     }
 };
 
+// The code of a call is the size of its reply in bytes.
+class LongReplyService : public android::BBinder {
+    android::status_t onTransact(uint32_t code, const Parcel&, Parcel* reply, uint32_t) override {
+        reply->resize(code);
+        return android::OK;
+    }
+};
+
+struct TestRecipient : IBinder::DeathRecipient {
+    void binderDied(const wp<IBinder>&) override { ++deaths; }
+    int deaths = 0;
+};
+
 TEST(VndBinderTest, TakesAPositiveStatusForSuccessWithoutAReply) {
     Parcel request, reply;
     EXPECT_EQ(host::PublishService(kDriver, "status", new TestService), android::OK);
@@ -136,6 +151,44 @@ TEST(VndBinderTest, LimitsTheSizeOfRequests) {
     request.resize(520196);
     EXPECT_EQ(proxy->transact(0, request, nullptr, IBinder::FLAG_ONEWAY),
               android::FAILED_TRANSACTION);
+}
+
+TEST(VndBinderTest, LimitsTheSizeOfReplies) {
+    EXPECT_EQ(host::PublishService(kDriver, "replies", new LongReplyService), android::OK);
+    const sp<IBinder> proxy = host::ConnectService(kDriver, "replies");
+    Parcel request, reply;
+    EXPECT_EQ(proxy->transact(1040384, request, &reply), android::OK);
+    EXPECT_EQ(reply.dataSize(), 1040384U);
+    EXPECT_EQ(proxy->transact(1040388, request, &reply), android::FAILED_TRANSACTION);
+    EXPECT_EQ(reply.dataSize(), 0U);
+}
+
+TEST(VndBinderTest, NotifiesLinkedRecipientsOfTheOwnersDeath) {
+    int ends[2];
+    ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
+    const sp<IBinder> proxy = host::NewProxy(ends[0]);
+    const sp<TestRecipient> linked = new TestRecipient;
+    const sp<TestRecipient> unlinked = new TestRecipient;
+    EXPECT_EQ(proxy->linkToDeath(linked), android::OK);
+    EXPECT_EQ(proxy->linkToDeath(unlinked), android::OK);
+    EXPECT_EQ(proxy->unlinkToDeath(unlinked), android::OK);
+
+    close(ends[1]);
+    Parcel request, reply;
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
+
+    EXPECT_EQ(linked->deaths, 1);
+    EXPECT_EQ(unlinked->deaths, 0);
+    EXPECT_EQ(proxy->linkToDeath(unlinked), android::DEAD_OBJECT);
+}
+
+TEST(VndBinderTest, RejectsAnotherInterfaceOfTheSameLength) {
+    Parcel request;
+    request.writeInterfaceToken(android::String16("interface.a"));
+    EXPECT_FALSE(request.enforceInterface(android::String16("interface.b")));
+    request.setDataPosition(0);
+    EXPECT_TRUE(request.enforceInterface(android::String16("interface.a")));
 }
 
 TEST(VndBinderTest, CarriesOutOneWayCallsOfAllClientsOneAfterAnother) {
