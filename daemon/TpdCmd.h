@@ -17,8 +17,8 @@ class TpdCmd {
     void StopCorvane();
     void RebootCorvane();
 
-    // Whether the touch-processing log is on. The user type decides if the log's property is neither
-    // true nor false.
+    // Whether the touch-processing log is on. The user type decides if the log's property is
+    // neither true nor false.
     static bool IsThplogEnable();
 
     // Switch the touch-processing log and restart the daemon for the change to take effect. Do
