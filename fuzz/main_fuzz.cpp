@@ -1,8 +1,13 @@
-// The tool with any arguments, on a device with any kernel command line. The input's first byte
-// chooses the state of the device; the arguments follow, each with a terminating zero.
+// The tool with any arguments, on any device. The bits of the input's first two bytes choose the
+// state of the device; the arguments follow, each with a terminating zero. The last one is also
+// the kernel command line, getenforce's output and the daemon's answer.
+#include <algorithm>
+#include <bitset>
 #include <cstdio>
+#include <cstring>
 #include <vector>
 
+#include "daemon/TpdClient.h"
 #include "fuzz.h"
 #include "tests/fake_device.h"
 
@@ -10,24 +15,41 @@ int tpd_main(int argc, char** argv);
 
 int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     static const bool silent = freopen("/dev/null", "w", stdout) != nullptr;
-    const int state = size > 0 ? data[0] : 0;
-    test::FakeDevice device;
-    device.properties["odm.thp.dae_alive"] = state % 3 != 0 ? "true" : "";
-    device.properties["odm.thp.is_updating_fw"] = state % 5 == 0 ? "1" : "";
-    device.properties["odm.thp.debug.selinux.permissive"] = state % 7 != 0 ? "1" : "";
-    device.kernelCommandLine = ToString(data, size);
-    device.lookups = {state % 11 != 0};
-    device.answers = {{state % 2 != 0 ? android::OK : android::DEAD_OBJECT}};
-
+    uint16_t bits = 0;
+    memcpy(&bits, data, std::min(size, sizeof(bits)));
+    const std::bitset<16> state(bits);
     std::vector<std::string> arguments = {"tpd"};
-    for (size_t at = 1; at < size && arguments.size() < 6; at += arguments.back().size() + 1) {
+    for (size_t at = sizeof(bits); at < size && arguments.size() < 6;
+         at += arguments.back().size() + 1) {
         arguments.emplace_back(ToString(data + at, size - at).c_str());
     }
     std::vector<char*> argv;
     for (std::string& argument : arguments) {
         argv.push_back(argument.data());
     }
+
+    test::FakeDevice device;
+    device.properties["odm.thp.dae_alive"] = state[0] ? "" : "true";
+    device.properties["odm.thp.is_updating_fw"] = state[1] ? "1" : "";
+    device.properties["odm.thp.debug.selinux.permissive"] = state[2] ? "" : "1";
+    device.getenforce = state[3] ? "Permissive\n" : arguments.back();
+    device.properties["persist.odm.thp.thplog_enabled"] = state[4] ? "true" : "";
+    device.lookups = {!state[5], !state[6]};
+    for (const bool dies : {state[7], state[8]}) {
+        device.answers.push_back({dies ? android::DEAD_OBJECT : android::OK, argv.back()});
+    }
+    if (state[9]) {
+        device.rejectedWrites = {"odm.thp.service_enable", "odm.thp.screen_status"};
+    }
+    device.kernelCommandLine = arguments.back();
+
     Check(silent && tpd_main(static_cast<int>(argv.size()), argv.data()) == 0);
     Check(device.calls({test::kTransact}).size() <= 2);
+    Check(device.openStreams.empty());
+    // The tool marks each command as two-way. Without the mark, names are sent one-way and a
+    // capacity test is judged.
+    if (argv.size() == 3) {
+        TpdClient().RunCmd(argv[1], argv[2]);
+    }
     return 0;
 }

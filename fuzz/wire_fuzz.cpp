@@ -1,53 +1,106 @@
-// Client and service of a connection, with a peer that sends the input, never reads and hangs up.
+// A published service and a client's proxy, each with a peer that sends the input and hangs up.
 #include <binder/Parcel.h>
 #include <sys/socket.h>
 #include <sys/time.h>
+#include <sys/un.h>
 #include <unistd.h>
+
+#include <filesystem>
 
 #include "fuzz.h"
 #include "platform/libbinder/vndbinder.h"
 
 namespace {
 
-// The request says where to read.
-class EchoService : public android::BBinder {
-    android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
-                                 android::Parcel* reply, uint32_t /* flags */) override {
+using namespace android;
+
+// The request says where to read. Code 1 asks for a reply over the limit.
+class EchoService : public BBinder {
+    status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t) override {
         data.setDataPosition(static_cast<size_t>(data.readInt32()));
-        data.enforceInterface(android::String16("x"));
+        data.enforceInterface(String16("x"));
         const char* const text = data.readCString();
         Check(data.dataPosition() <= data.dataSize());
+        reply->resize(code == 1 ? host::kMaxTransactionBytes : 0);
         return reply->writeCString(text);
     }
 };
 
-// Connects to such a peer. Returns our end of the connection; the peer's is in `peer`. The socket's
-// buffer takes every input that scripts/fuzz makes.
-int Connect(const uint8_t* data, size_t size, int& peer) {
+struct Recipient : IBinder::DeathRecipient {
+    void binderDied(const wp<IBinder>& /* who */) override { ++deaths; }
+    int deaths = 0;
+};
+
+// The device root of this process.
+const struct TemporaryRoot {
+    TemporaryRoot() { setenv("TPD_DEVICE_ROOT", mkdtemp(path), 1); }
+    ~TemporaryRoot() { std::filesystem::remove_all(path); }
+    char path[32] = "/tmp/tpd-fuzz-XXXXXX";
+} kRoot;
+
+// A socket's buffer takes every input that scripts/fuzz makes.
+void SendAndHangUp(int socket, const uint8_t* data, size_t size) {
+    Check(send(socket, data, size, MSG_NOSIGNAL) == static_cast<ssize_t>(size));
+    shutdown(socket, SHUT_WR);
+}
+
+void CallService(const uint8_t* data, size_t size) {
+    static const status_t published = host::PublishService("/driver", "echo", new EchoService);
+    sockaddr_un address = {AF_UNIX, {}};
+    snprintf(address.sun_path, sizeof(address.sun_path), "%s/driver/echo", kRoot.path);
+    const int peer = socket(AF_UNIX, SOCK_STREAM, 0);
+    Check(published == OK &&
+          connect(peer, reinterpret_cast<sockaddr*>(&address), sizeof(address)) == 0);
+    SendAndHangUp(peer, data, size);
+    char replies[4096];
+    while (recv(peer, replies, sizeof(replies), 0) > 0) {
+    }
+    close(peer);
+
+    // The next client is served.
+    const sp<IBinder> proxy = host::ConnectService("/driver", "echo");
+    Parcel request, reply;
+    request.writeInt32(4);
+    request.writeInterfaceToken(String16("x"));
+    request.writeCString("text");
+    Check(proxy != nullptr && proxy->transact(0, request, &reply) == OK);
+    Check(reply.readCString() == std::string("text"));
+}
+
+void AnswerProxy(const uint8_t* data, size_t size) {
     int ends[2];
     Check(socketpair(AF_UNIX, SOCK_STREAM, 0, ends) == 0);
-    peer = ends[1];
-    Check(send(peer, data, size, 0) == static_cast<ssize_t>(size));
-    shutdown(peer, SHUT_WR);
-    // A few hundred messages fill the peer's buffer, which it never reads. Then it counts as gone.
+    SendAndHangUp(ends[1], data, size);
+    // A few hundred requests fill the buffer of the peer, which never reads. Then it counts as
+    // gone.
     const timeval shortest = {0, 1};
     Check(setsockopt(ends[0], SOL_SOCKET, SO_SNDTIMEO, &shortest, sizeof(shortest)) == 0);
-    return ends[0];
+
+    const sp<IBinder> proxy = host::NewProxy(ends[0]);
+    const sp<Recipient> linked = new Recipient;
+    const sp<Recipient> unlinked = new Recipient;
+    proxy->linkToDeath(linked);
+    proxy->linkToDeath(unlinked);
+    Check(proxy->unlinkToDeath(unlinked) == OK);
+    Check(proxy->unlinkToDeath(unlinked) == NAME_NOT_FOUND);
+    Parcel request, reply;
+    Check(proxy->transact(0, request, &reply, IBinder::FLAG_ONEWAY) == OK);
+    request.resize(host::kMaxTransactionBytes + 4);
+    Check(proxy->transact(0, request, &reply) == FAILED_TRANSACTION);
+    request.resize(0);
+    while (linked->deaths == 0) {
+        proxy->transact(0, request, &reply);
+        Check(reply.dataSize() <= size);
+    }
+    Check(proxy->linkToDeath(linked) == DEAD_OBJECT);
+    Check(linked->deaths == 1 && unlinked->deaths == 0);
+    close(ends[1]);
 }
 
 }  // namespace
 
 int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-    int peer = -1;
-    host::ServeClient(Connect(data, size, peer), new EchoService);
-    close(peer);
-
-    const android::sp<android::IBinder> proxy = host::NewProxy(Connect(data, size, peer));
-    android::Parcel request;
-    android::Parcel reply;
-    while (proxy->transact(0, request, &reply, 0) != android::DEAD_OBJECT) {
-        Check(reply.dataSize() <= size);
-    }
-    close(peer);
+    CallService(data, size);
+    AnswerProxy(data, size);
     return 0;
 }

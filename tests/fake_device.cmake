@@ -15,3 +15,5 @@ target_link_libraries(
     fake_device
     PUBLIC tpd_front_end tpd_log device_files wrapped_calls
     PRIVATE tpd_build_options)
+# It counts the streams that the tool closes.
+target_link_options(fake_device INTERFACE -Wl,--wrap=fclose)

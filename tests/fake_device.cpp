@@ -23,6 +23,8 @@ namespace test {
 namespace {
 
 FakeDevice* gDevice;
+const bool kAliveConfirmedAtStart = aliveConfirmed;
+const int kFailedWaitCountAtStart = failedWaitCount;
 
 template <typename T>
 T TakeFirst(std::deque<T>& queue, T whenEmpty) {
@@ -48,6 +50,10 @@ class FakeService : public IBinder {
         }
         gDevice->Record({flags == FLAG_ONEWAY ? kTransactOneWay : kTransact, request});
         const Answer answer = TakeFirst(gDevice->answers, {});
+        const sp<DeathRecipient> recipient = mRecipient.promote();
+        if (answer.status == DEAD_OBJECT && recipient != nullptr) {
+            recipient->binderDied(this);
+        }
         reply->writeCString(answer.text);
         reply->setDataPosition(0);
         return answer.status;
@@ -56,6 +62,7 @@ class FakeService : public IBinder {
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
                          uint32_t flags) override {
         gDevice->Record(LinkToDeath(IsTools(recipient, cookie, flags) ? mNumber : -1));
+        mRecipient = recipient;
         return OK;
     }
 
@@ -71,6 +78,7 @@ class FakeService : public IBinder {
     }
 
     const int mNumber;
+    wp<DeathRecipient> mRecipient;
 };
 
 class FakeServiceManager : public IServiceManager {
@@ -90,8 +98,8 @@ class FakeServiceManager : public IServiceManager {
 
 FakeDevice::FakeDevice() {
     gDevice = this;
-    aliveConfirmed = false;
-    failedWaitCount = 0;
+    aliveConfirmed = kAliveConfirmedAtStart;
+    failedWaitCount = kFailedWaitCountAtStart;
     g_thpBinder = nullptr;
     g_deathRecipient = nullptr;
     delete g_tpdCmd;
@@ -123,7 +131,12 @@ void FakeDevice::Record(const Call& call) {
 using test::gDevice;
 
 static FILE* OpenString(std::optional<std::string>& content, const char* mode) {
-    return content ? fmemopen(content->data(), content->size(), mode) : nullptr;
+    if (!content) {
+        return nullptr;
+    }
+    FILE* const stream = fmemopen(content->data(), content->size(), mode);
+    gDevice->openStreams.insert(stream);
+    return stream;
 }
 
 // No test reaches a device on disk.
@@ -171,9 +184,18 @@ FILE* __wrap_fopen(const char* path, const char* mode) {
     return OpenString(gDevice->kernelCommandLine, mode);
 }
 
+int __real_fclose(FILE* stream);
+
+int __wrap_fclose(FILE* stream) {
+    if (gDevice != nullptr) {
+        gDevice->openStreams.erase(stream);
+    }
+    return __real_fclose(stream);
+}
+
 FILE* __wrap_popen(const char* command, const char* mode) {
     gDevice->Record(test::Shell(command));
-    return OpenString(gDevice->getenforce, mode);
+    return strcmp(mode, "r") == 0 ? OpenString(gDevice->getenforce, mode) : nullptr;
 }
 
 int __wrap_pclose(FILE* stream) {

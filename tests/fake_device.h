@@ -6,6 +6,7 @@
 #include <utils/Errors.h>
 
 #include <chrono>
+#include <cstdio>
 #include <deque>
 #include <map>
 #include <optional>
@@ -76,15 +77,18 @@ class FakeDevice {
     std::optional<std::string> kernelCommandLine = "";  // none: it cannot be opened
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
     int getenforceStatus = 0;                               // what closing its output returns
-    int failingAllocation = 0;   // of those that may fail, counted from 1
-    std::deque<bool> lookups;    // whether each finds the service; all later ones do
-    std::deque<Answer> answers;  // to the calls, in order; all later ones get the default
+    int failingAllocation = 0;  // of those that may fail, counted from 1
+    std::deque<bool> lookups;   // whether each finds the service; all later ones do
+    // To the calls, in order; all later ones get the default. With DEAD_OBJECT the service's death
+    // recipient is told first.
+    std::deque<Answer> answers;
     // The property that changes during a call, and its new value.
     std::map<Call, std::pair<std::string, std::string>> changes;
 
     // The recorded calls of these functions, or of all when none is named.
     std::vector<Call> calls(const std::set<std::string>& functions = {}) const;
-    std::string request;  // the bytes of the last call's parcel
+    std::string request;          // the bytes of the last call's parcel
+    std::set<FILE*> openStreams;  // of the kernel command line and of getenforce
 
     // For the functions that end here.
     void Record(const Call& call);
