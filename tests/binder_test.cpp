@@ -12,15 +12,28 @@ using android::DEAD_OBJECT;
 
 constexpr char kServiceMissing[] = "0F_1F; failed to get binder service";
 const Call kLookup = UntaggedLog(INFO, "ThpGetBinder");
+const Call kNotFound = UntaggedLog(ERROR, "ThpGetBinder, failed to get binder service\n");
+
+// The bytes of a value in a parcel.
+std::string Padded(std::string bytes) {
+    bytes.resize((bytes.size() + 3) / 4 * 4);
+    return bytes;
+}
+std::string Int32(int32_t value) { return {reinterpret_cast<const char*>(&value), sizeof(value)}; }
+std::string CString(const std::string& text) { return Padded(text + '\0'); }
+std::string Utf16(const std::u16string& text) {
+    const size_t bytes = (text.size() + 1) * sizeof(char16_t);
+    return Padded({reinterpret_cast<const char*>(text.c_str()), bytes});
+}
 
 TEST_F(BinderTest, WritesTheRequestAsTheDaemonReadsIt) {
     RunCmdParms("[TPD]TSA_ExecuteCommand", "captest");
-    std::string expected("\0\0\0\x80\xFF\xFF\xFF\xFFRDNV\x37\0\0\0", 16);
-    for (const char c : std::string("android.CorvaneInterfaceServer.ICorvaneInterfaceService")) {
-        expected += {c, '\0'};
-    }
-    expected += std::string("\0\0TSA_ExecuteCommand\0\0\1\0\0\0captest\0", 34);
-    EXPECT_EQ(device.request, expected);
+    const std::string strictMode = Int32(INT32_MIN), workSource = Int32(-1);
+    const std::string descriptor =
+            Int32(55) + Utf16(u"android.CorvaneInterfaceServer.ICorvaneInterfaceService");
+    EXPECT_EQ(device.request, strictMode + workSource + "RDNV" + descriptor +
+                                      CString("TSA_ExecuteCommand") + Int32(1) +
+                                      CString("captest"));
 }
 
 TEST_F(BinderTest, SendsMarkedCommandsTwoWayAndNamedOnesOneWay) {
@@ -41,11 +54,30 @@ TEST_F(BinderTest, SendsMarkedCommandsTwoWayAndNamedOnesOneWay) {
         EXPECT_EQ(RunCmdParms(row.command, row.parameters), row.result);
         EXPECT_EQ(device.calls().back(), row.call);
     }
+    EXPECT_EQ(device.calls({kLog}).back(), UntaggedLog(ERROR, "Async"));
 }
 
-TEST_F(BinderTest, LogsAOneWayCall) {
-    RunCmdParms("aftouch", "");
-    EXPECT_EQ(device.calls({kLog}).back(), UntaggedLog(ERROR, "Async"));
+TEST_F(BinderTest, SendsTheseNamesOneWay) {
+    EXPECT_THAT(g_asyncCmds, ElementsAre("aftouch"));
+    EXPECT_THAT(
+            g_asyncThpCmds,
+            ElementsAre("THP_ASA_EnableFreqShift", "THP_ASA_ForceSetToNewFreq",
+                        "THP_ASA_SetTpPenMatchCode", "THP_DisableBaselineUpdate",
+                        "THP_DisableFeature", "THP_DisableScenario", "THP_EnableBaselineUpdate",
+                        "THP_EnableFeature", "THP_EnableScenario", "THP_InformTypingStatus",
+                        "THP_InformUserAppCrash", "THP_Log_Commander", "THP_Log_GhostTouch",
+                        "THP_ResetBaseline", "THP_Ring_AddSideGesture", "THP_Ring_EnterBetaTask",
+                        "THP_Ring_EnterSpecialBeta", "THP_Ring_ExitBetaTask",
+                        "THP_Ring_ExitSpecialBeta", "THP_Ring_ExposeSideArea",
+                        "THP_Ring_MapSideArea", "THP_Ring_MapSideGestureToKeyCode",
+                        "THP_Ring_MapSideGestureToTPEvent", "THP_Ring_RemoveSideArea",
+                        "THP_Ring_ResetSideGesture", "THP_Ring_SetGestureTag",
+                        "THP_Ring_SetVolumeGUIInfo", "THP_SetAccData",
+                        "THP_SetEnvironmentTemperature", "THP_SetFoldState",
+                        "THP_SetPressureGesture", "THP_SetRunTimePrmt", "THP_SetSensorData",
+                        "THP_SetSensorGesture", "THP_SetSensorGestureWithTimeStamp",
+                        "THP_SetSupportedSensorGesture", "THP_SetTuneTimePrmt", "THP_SetVirtualKey",
+                        "THP_SetVolumeGUIInfo", "THP_SetXCoreArea", "THP_UpdateViewsLocation"));
 }
 
 TEST_F(BinderTest, LooksTheServiceUpOnce) {
@@ -67,10 +99,13 @@ TEST_F(BinderTest, TriesAFailedCallOnceMoreOnAFreshLookup) {
     device.lookups = {true, false, true};
     device.answers = {{DEAD_OBJECT}};
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), "answer");
-    EXPECT_THAT(device.calls({kGetService, kLinkToDeath, kTransact, kWrite}),
-                ElementsAre(GetService(), LinkToDeath(1), Transact("c"), GetService(), GetService(),
-                            LinkToDeath(2), Transact("c")));
-    EXPECT_THAT(device.calls({kLog}), Contains(UntaggedLog(INFO, "retry = 1")));
+    EXPECT_THAT(device.calls(),
+                ElementsAre(kLookup, GetService(), UntaggedLog(ERROR, "enter"), LinkToDeath(1),
+                            UntaggedLog(ERROR, "ThpGetBinder ret = 0"), Transact("c"),
+                            UntaggedLog(INFO, "binder died"), UnlinkToDeath(1),
+                            UntaggedLog(INFO, "retry = 1"), kLookup, GetService(), kNotFound,
+                            kLookup, GetService(), LinkToDeath(2),
+                            UntaggedLog(ERROR, "ThpGetBinder ret = 0"), Transact("c")));
 }
 
 TEST_F(BinderTest, RestartsTheDaemonAfterTwoFailedCalls) {
@@ -79,18 +114,17 @@ TEST_F(BinderTest, RestartsTheDaemonAfterTwoFailedCalls) {
               "corvane_daemon binder server execute command return ERROR, may caused by "
               "processing timeout.");
     EXPECT_EQ(g_thpBinder, nullptr);
-    EXPECT_THAT(device.calls({kGetService, kTransactOneWay, kWrite}),
-                ElementsAre(GetService(), TransactOneWay("aftouch"), GetService(),
-                            TransactOneWay("aftouch"), kStop, kStart));
+    EXPECT_THAT(device.calls({kGetService, kTransactOneWay, kUnlinkToDeath, kWrite}),
+                ElementsAre(GetService(), TransactOneWay("aftouch"), UnlinkToDeath(1), GetService(),
+                            TransactOneWay("aftouch"), UnlinkToDeath(1), kStop, kStart));
 }
 
 TEST_F(BinderTest, RestartsTheDaemonWhoseServiceIsMissing) {
     device.lookups = {false, false};
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
-    const Call notFound = UntaggedLog(ERROR, "ThpGetBinder, failed to get binder service\n");
     const std::string write = "retry:1, odm.thp.service_enable, ";
     EXPECT_THAT(device.calls({kGetService, kLog, kWrite}),
-                ElementsAre(kLookup, GetService(), notFound, kLookup, GetService(), notFound,
+                ElementsAre(kLookup, GetService(), kNotFound, kLookup, GetService(), kNotFound,
                             UntaggedLog(WARN, "reboot"), kStop,
                             UntaggedLog(ERROR, write + "[new]0, [old]"), kStart,
                             UntaggedLog(ERROR, write + "[new]1, [old]0")));
@@ -101,14 +135,6 @@ TEST_F(BinderTest, TakesAMissingServiceManagerForAMissingService) {
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
     EXPECT_EQ(device.calls({kLog})[1],
               UntaggedLog(ERROR, "ThpGetBinder, failed to get defaultServiceManager\n"));
-}
-
-TEST_F(BinderTest, UnlinksFromTheFirstServiceWhenOneDies) {
-    device.answers = {{DEAD_OBJECT}};
-    RunCmdParms("[TPD]c", "");
-    g_deathRecipient->binderDied(g_thpBinder);
-    EXPECT_THAT(device.calls({kUnlinkToDeath}), ElementsAre(UnlinkToDeath(1)));
-    EXPECT_EQ(device.calls({kLog}).back(), UntaggedLog(INFO, "binder died"));
 }
 
 TEST_F(BinderTest, StoresAScreenStateBeforeTheLookup) {

@@ -82,13 +82,16 @@ TEST_F(CmdLineTest, ReportsHowTheDeviceWasBooted) {
     }
 }
 
-TEST_F(CmdLineTest, ReadsTheFirstLineUpToItsLimit) {
+TEST_F(CmdLineTest, ReadsTheFirstLineUpToItsLimitAndClosesTheFile) {
     device.kernelCommandLine = "first\nsecond";
     EXPECT_EQ(CmdLine::GetCmdLine(), "first");
     device.kernelCommandLine = std::string(9000, 'x');
     EXPECT_EQ(CmdLine::GetCmdLine(), std::string(8191, 'x'));
-    device.kernelCommandLine = std::nullopt;
-    EXPECT_EQ(CmdLine::GetCmdLine(), "");
+    EXPECT_THAT(device.openStreams, IsEmpty());
+    for (const auto& noLine : {std::optional<std::string>(""), std::optional<std::string>()}) {
+        device.kernelCommandLine = noLine;
+        EXPECT_EQ(CmdLine::GetCmdLine(), "");
+    }
 }
 
 }  // namespace test

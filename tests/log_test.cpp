@@ -33,6 +33,11 @@ TEST_F(LogTest, NamesTheFunctionWithoutItsSignature) {
     EXPECT_THAT(device.calls(), ElementsAre(Log(ERROR, "A::B[120] failed")));
 }
 
+TEST_F(LogTest, WritesAnEmptyMessage) {
+    gSysLog.Printf(LOG_INFO, "f", 1, "%s", "");
+    EXPECT_THAT(device.calls(), ElementsAre(Log(INFO, "f[1] ")));
+}
+
 TEST_F(LogTest, SaysThatAMessageIsTooLong) {
     const std::string longest(2047, 'x');
     gSysLog.Printf(LOG_INFO, "f", 1, "%s", longest.c_str());
@@ -41,15 +46,17 @@ TEST_F(LogTest, SaysThatAMessageIsTooLong) {
                                             Log(INFO, "f[2] " + longest)));
 }
 
-TEST_F(LogTest, EmptiesItsMemory) {
+TEST_F(LogTest, KeepsOnlyWhatIsAppended) {
     DebugLog log;
+    log.Printf(LOG_ERROR, "f", 1, "written");
+    EXPECT_EQ(log.GetLog(), "");
     log.Append("kept");
     EXPECT_EQ(log.GetLog(), "kept");
     EXPECT_EQ(log.GetLogClear(), "kept");
     EXPECT_EQ(log.GetLogClear(), "");
 }
 
-TEST_F(LogTest, KeepsNothingInMemoryByItself) {
+TEST_F(LogTest, KeepsNothingInTheSystemLog) {
     gSysLog.Append("text");
     EXPECT_EQ(gSysLog.GetLog(), "");
     EXPECT_EQ(gSysLog.GetName(), "sys");

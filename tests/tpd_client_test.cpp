@@ -20,6 +20,10 @@ class TpdClientTest : public DeviceTest {
     TpdClient client;
 };
 
+TEST_F(TpdClientTest, TreatsTheDaemonAsUnavailableBeforeTheFirstWait) {
+    EXPECT_EQ(client.daemonUnavailable, 1);
+}
+
 TEST_F(TpdClientTest, ChecksALivingDaemonOnceForAllCommands) {
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 0.thp.dae_alive : 1. thp.binder: 1");
     EXPECT_EQ(client.daemonUnavailable, 0);
@@ -63,6 +67,7 @@ TEST_F(TpdClientTest, ChecksOnlyOnceAfterTwoFailedWaits) {
     device.answers = {{android::OK, "an ERROR"}};
     EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", ""), "an ERROR");
     EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
+    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
 }
 
 TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerReportsAFailure) {
@@ -94,16 +99,21 @@ TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
 constexpr char kCaptestFailure[] =
         "captest fail due to corvane_daemon is not alive or unexpected reboot. ";
 
+TEST(IsCaptestInRtTest, KnowsAnyFragmentOfTheModeNames) {
+    for (const char* fragment : {"running_testrunning", "running_test_lasttime", "g"}) {
+        EXPECT_TRUE(TpdClient::IsCaptestInRt("captest", fragment)) << fragment;
+    }
+    EXPECT_FALSE(TpdClient::IsCaptestInRt("captest", "lasttimerunning"));
+    EXPECT_FALSE(TpdClient::IsCaptestInRt("captest", ""));
+    EXPECT_FALSE(TpdClient::IsCaptestInRt("[TPD]captest", "running_test"));
+}
+
 TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonDied) {
     device.properties[kAliveKey] = "false";
-    const std::string failed = "answerthp.dae_alive : 0. thp.binder: 1" +
-                               std::string(kCaptestFailure) + "before: 0, after: 0";
-    for (const char* fragment : {"running_testrunning", "running_test_lasttime"}) {
-        EXPECT_EQ(client.RunCmd("captest", fragment), failed);
-    }
-    EXPECT_EQ(client.RunCmd("captest", "lasttimerunning"), "answer");
-    EXPECT_EQ(client.RunCmd("captest", ""), "answer");
-    EXPECT_EQ(client.RunCmd("[TPD]captest", "running_test"), "answer");
+    EXPECT_EQ(client.RunCmd("captest", "running_test"), "answerthp.dae_alive : 0. thp.binder: 1" +
+                                                                std::string(kCaptestFailure) +
+                                                                "before: 0, after: 0");
+    EXPECT_EQ(client.RunCmd("captest", "other"), "answer");
 }
 
 TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonRestarted) {

@@ -23,7 +23,7 @@ std::string RunTool(std::vector<std::string> arguments) {
     return testing::internal::GetCapturedStdout();
 }
 
-TEST(TpdMainTest, ForwardsCommands) {
+TEST(TpdMainTest, MarksForwardedCommandsAsTwoWay) {
     const struct {
         std::vector<std::string> arguments;
         Call call;
@@ -33,6 +33,7 @@ TEST(TpdMainTest, ForwardsCommands) {
             {{"tpd", "help"}, Transact("help"), kHelpText},
             {{"tpd", "help", ""}, Transact("help"), ""},
             {{"tpd", "Start"}, Transact("Start"), ""},
+            {{"tpd", "aftouch"}, Transact("aftouch"), ""},
             {{"tpd", "start", "x"}, Transact("start, x"), ""},
             {{"tpd", "TSA_ExecuteCommand", "a", "b"}, Transact("TSA_ExecuteCommand, a b"), ""},
     };
@@ -75,7 +76,11 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
             {"stop", "stop corvane_daemon done\n", {kStop}},
             {"reboot", "reboot corvane_daemon done\n", {kStop, kSetBootFlag, kStart}},
             {"log_enable", "enable thplog\n", {logOn, kStop, kSetBootFlag, kStart}},
-            {"log_disable", "disable thplog\n", {Write("persist.sys.zelmor.debug.on", "false")}},
+            {"log_disable",
+             "disable thplog\n",
+             {Write("persist.sys.zelmor.debug.on", "false"),
+              Write("persist.odm.thp.ver_dae", "true"), Write("odm.thp.ver_dae", "true"),
+              Write(kThplogKey, "false"), kStop, kSetBootFlag, kStart}},
             {"debugRawEnable", "set thp.debug.raw as 1\n", {Write("thp.debug.raw", "true")}},
             {"debugDifEnable", "set thp.debug.raw as 0\n", {Write("thp.debug.raw", "false")}},
             {"log_afe_enable", "enable afehal log\n", {afeOn, kStop, kSetBootFlag, kStart}},
@@ -86,6 +91,7 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
     for (const auto& row : kRows) {
         SCOPED_TRACE(row.command);
         FakeDevice device;
+        device.properties[kThplogKey] = row.command == std::string("log_disable") ? "true" : "";
         g_tpdCmd = new TpdCmd;
         for (const auto addCommands : {AddBasicTpdCmds, AddThplogTpdCmds, AddRawTpdCmds,
                                        AddAfelogTpdCmds, AddShowtouchTpdCmds}) {
@@ -96,19 +102,14 @@ TEST(TpdMainTest, CarriesOutLocalCommands) {
     }
 }
 
-TEST(TpdMainTest, DisablesDebuggingBeforeTheThplog) {
+TEST(TpdMainTest, LogsALocalCommandAndPrintsAnEmptyLine) {
     FakeDevice device;
-    device.properties[kThplogKey] = "true";
-    RunTool({"tpd", "log_disable"});
-    EXPECT_THAT(device.calls({kWrite}), SizeIs(7));
-    EXPECT_EQ(device.calls({kWrite})[0], Write("persist.sys.zelmor.debug.on", "false"));
-}
-
-TEST(TpdMainTest, PrintsAnEmptyLineForALocalCommand) {
-    FakeDevice device;
-    EXPECT_EQ(RunTool({"tpd", "stop"}), "\n");
-    EXPECT_THAT(device.calls({kWrite, kGetService}), ElementsAre(kStop));
-    EXPECT_EQ(device.calls({kLog})[2], Log(INFO, "ExcuteTpdCmd[145] Get cmd. stop\n"));
+    EXPECT_EQ(RunTool({"tpd", "showtouch"}), "\n");
+    EXPECT_THAT(device.calls(),
+                ElementsAre(Log(INFO, "InitTpdCmds[120] +\n"), Log(INFO, "ExcuteTpdCmd[142] +\n"),
+                            Log(INFO, "ExcuteTpdCmd[145] Get cmd. showtouch\n"),
+                            Shell("settings put system show_touches 1"),
+                            Shell("settings put system pointer_location 1")));
 }
 
 TEST(TpdMainTest, LogsAForwardedCommand) {
@@ -116,10 +117,12 @@ TEST(TpdMainTest, LogsAForwardedCommand) {
     device.properties[kPermissiveKey] = "1";
     RunTool({"tpd", "help"});
     EXPECT_THAT(device.calls({kLog}),
-                IsSupersetOf({Log(INFO, "InitTpdCmds[120] +\n"), Log(INFO, "ExcuteTpdCmd[142] +\n"),
-                              Log(INFO, "ExcuteTpdCmd[150] -\n"),
-                              Log(INFO, "corvane_daemon ThpDebugExecuteCmd[156] cmd help\n"),
-                              Log(INFO, "ret = answer"), Log(INFO, "CmdsToStr[130] +\n")}));
+                ElementsAre(Log(INFO, "InitTpdCmds[120] +\n"), Log(INFO, "ExcuteTpdCmd[142] +\n"),
+                            Log(INFO, "ExcuteTpdCmd[150] -\n"),
+                            Log(INFO, "corvane_daemon ThpDebugExecuteCmd[156] cmd help\n"),
+                            UntaggedLog(INFO, "ThpGetBinder"), UntaggedLog(ERROR, "enter"),
+                            UntaggedLog(ERROR, "ThpGetBinder ret = 0"), Log(INFO, "ret = answer"),
+                            Log(INFO, "CmdsToStr[130] +\n")));
 }
 
 TEST(TpdMainTest, SendsNothingWhileSelinuxEnforces) {

@@ -8,11 +8,9 @@
 namespace test {
 
 using namespace std::chrono_literals;
-using testing::Contains;
 using testing::ElementsAre;
 using testing::ElementsAreArray;
 using testing::IsEmpty;
-using testing::IsSupersetOf;
 using testing::Pair;
 using testing::SizeIs;
 
