@@ -17,14 +17,16 @@
 
 #define COMMAND "THP_GetVersion"
 #define DESCRIPTOR u"android.CorvaneInterfaceServer.ICorvaneInterfaceService"
-#define SERVICE_ENABLE "properties/odm.thp.service_enable"
-#define REBOOT_TIMES "properties/odm.thp.dae_reboot_times"
+#define SERVICE_ENABLE "odm.thp.service_enable"
+#define REBOOT_TIMES "odm.thp.dae_reboot_times"
 #define REFUSAL "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
 
 enum { kMaxValue = 91, kMaxLogText = 1023, kBlock = 4096, kInfo = 4, kError = 6 };
 enum { kFile = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC };
+enum { kDirectory = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC };
 
 static int root;
+static int properties;
 static int logFile;
 static char value[kMaxValue + 1];
 static struct stat status;
@@ -57,31 +59,36 @@ static void Log(uint8_t priority, const char* tag, const char* text) {
     }
 }
 
-static void ReadProperty(const char* path) {
-    const int file = openat(root, path, O_RDONLY | kFile);
+// The first use opens the directory of properties.
+static void ReadProperty(const char* name) {
+    if (properties == 0) {
+        properties = openat(root, "properties", kDirectory);
+    }
+    const int file = openat(properties, name, O_RDONLY | kFile);
     const ssize_t size = read(file, value, kMaxValue);
     if (size < 0) {
-        Fail(path);
+        Fail(name);
     }
     close(file);
     value[size] = '\0';
 }
 
-static void WriteProperty(const char* path, const char* text) {
+static void WriteProperty(const char* name, const char* text) {
     char temporary[64];
-    fstatat(root, path, &status, AT_SYMLINK_NOFOLLOW);
-    snprintf(temporary, sizeof(temporary), "tmp/%d.0", getpid());
-    const int file = openat(root, temporary, O_WRONLY | O_CREAT | O_TRUNC | kFile, 0600);
+    fstatat(properties, name, &status, AT_SYMLINK_NOFOLLOW);
+    snprintf(temporary, sizeof(temporary), "%d.0", getpid());
+    const int directory = openat(root, "tmp", kDirectory);
+    const int file = openat(directory, temporary, O_WRONLY | O_CREAT | O_TRUNC | kFile, 0600);
     WriteAll(file, text, strlen(text));
     close(file);
-    if (renameat2(root, temporary, root, path, 0) != 0) {
-        Fail(path);
+    if (renameat2(directory, temporary, properties, name, 0) != 0) {
+        Fail(name);
     }
 }
 
 static void ReadKernelCommandLine(void) {
     char line[kBlock];
-    openat(root, "proc/cmdline", O_RDONLY | O_NONBLOCK | O_CLOEXEC);  // the device has none
+    openat(root, "proc", kDirectory);  // the device has none
     const int file = open("/proc/cmdline", O_RDONLY);
     fstat(file, &status);
     if (read(file, line, (size_t)status.st_blksize) < 0) {
@@ -92,12 +99,14 @@ static void ReadKernelCommandLine(void) {
 
 static void Start(void) {
     close(open("/dev/null", O_RDWR));
+    umask(077);
     root = open(getenv("TPD_DEVICE_ROOT"), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
     fstat(root, &status);
     geteuid();
+    fstatat(root, ".tpd-device", &status, AT_SYMLINK_NOFOLLOW);
     logFile = openat(root, "log", O_WRONLY | O_APPEND | O_CREAT | kFile, 0600);
     fstat(logFile, &status);
-    faccessat(root, "trace", F_OK, 0);
+    openat(root, "trace", O_RDONLY | kFile);
     Log(kInfo, "corvane_daemon", "InitTpdCmds[120] +\n");
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[142] +\n");
 }
@@ -174,13 +183,13 @@ static void Forward(void) {
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[150] -\n");
     Log(kInfo, "corvane_daemon", "corvane_daemon ThpDebugExecuteCmd[156] cmd " COMMAND "\n");
     ReadKernelCommandLine();
-    ReadProperty("properties/odm.thp.debug.selinux.permissive");
+    ReadProperty("odm.thp.debug.selinux.permissive");
     if (strcmp(value, "true") != 0) {
         Refuse();
         return;
     }
-    ReadProperty("properties/odm.thp.dae_alive");
-    ReadProperty("properties/odm.thp.binder");
+    ReadProperty("odm.thp.dae_alive");
+    ReadProperty("odm.thp.binder");
     ReadProperty(REBOOT_TIMES);
     Log(kInfo, "tpd", "ThpGetBinder");
     const int connection = Connect();

@@ -1,6 +1,7 @@
 // What the programs of the virtual device share.
 #pragma once
 
+#include <dirent.h>
 #include <sys/system_properties.h>
 
 #include <cerrno>
@@ -10,17 +11,10 @@
 #include <set>
 #include <string>
 
-#include "platform/device_root.h"
+#include "keys.h"
 #include "platform/files.h"
 
 namespace device {
-
-// The file that init holds a record lock on for its life.
-constexpr char kInitLock[] = "init.lock";
-constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
-constexpr char kDaemonBinderKey[] = "odm.thp.binder";
-constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
-constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 
 // The property's value; empty when it is not set.
 inline std::string GetProperty(const char* key) {
@@ -62,23 +56,31 @@ inline std::string ReadText(const std::string& path, const char* missing) {
 }
 
 // What `getenforce` prints: Enforcing, Permissive or Disabled.
-inline std::string SelinuxMode() { return ReadText("selinux", "Enforcing"); }
+inline std::string SelinuxMode() { return ReadText(host::kSelinuxFile, "Enforcing"); }
 
-// The names in a folder of the device root, sorted. Empty when there is no such folder.
-inline std::set<std::string> FilesIn(const std::string& folder) {
+// The names in a directory of the device root, sorted. Empty when it cannot be read.
+inline std::set<std::string> FilesIn(const std::string& path) {
     std::set<std::string> names;
-    std::error_code error;
-    std::filesystem::directory_iterator file(host::DeviceRootPath() + "/" + folder, error);
-    for (; file != std::filesystem::directory_iterator(); file.increment(error)) {
-        names.insert(file->path().filename());
+    host::UniqueFd opened = host::OpenDirectory(path);
+    DIR* const directory = opened.ok() ? fdopendir(opened.get()) : nullptr;
+    if (directory == nullptr) {
+        return names;
     }
+    (void)opened.release();
+    while (const dirent* const entry = readdir(directory)) {
+        names.insert(entry->d_name);
+    }
+    closedir(directory);
+    names.erase(".");
+    names.erase("..");
     return names;
 }
 
-// The path of a file in the folder of the program that runs, links to which are resolved.
+// The path of a file in the directory of the running executable. Without /proc, a path to nothing.
 inline std::string PathBesideProgram(const char* name) {
     std::error_code error;
-    return std::filesystem::read_symlink("/proc/self/exe", error).replace_filename(name);
+    const std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe", error);
+    return (error ? "/proc/self/exe" : program.parent_path()) / name;
 }
 
 }  // namespace device

@@ -1,9 +1,9 @@
 // The part of the device's init that boots it and controls the touch daemon: starts and stops it as
-// "odm.thp.service_enable" says, and starts it again, counting, when it ends on its own.
+// "odm.thp.service_enable" says, and restarts it, counting, when it exits on its own.
 //
 // init MODE: boots the device root with SELinux in that mode. One byte on standard output says that
-// the device is booted; a failure before that goes to standard error. Ends on SIGTERM or SIGINT, or
-// when the folder of properties goes away.
+// the device is booted; a failure before that goes to standard error. Exits on SIGTERM or SIGINT,
+// or when the directory of properties goes away.
 #include <android/log.h>
 #include <fcntl.h>
 #include <poll.h>
@@ -21,8 +21,6 @@
 #include <csignal>
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
-#include <set>
 #include <string>
 #include <thread>
 
@@ -31,81 +29,91 @@
 #include "platform/files.h"
 #include "platform/log_file.h"
 #include "platform/trace.h"
+#include "platform/unique_fd.h"
 
 namespace {
 
-constexpr char kRestartsKey[] = "odm.thp.dae_reboot_times";
-// A daemon that was alive is back soon; the pause doubles for one that ends before it is.
+using host::UniqueFd;
+
+constexpr char kDriverDirectory[] = "dev/vndbinder";
+// A daemon that was alive is back soon; the pause doubles for one that exits before it is.
 constexpr int kMinRestartPauseMs = 50;
 constexpr int kMaxRestartPauseMs = 5000;
 
 constexpr const char* kBootProperties[][2] = {
-        {"ro.build.display.id", "VIRTUAL-11.0"}, {"ro.logsystem.usertype", "1"},
-        {"odm.thp.ver_firmware", "virtual-1"},   {device::kDaemonAliveKey, "false"},
-        {device::kDaemonBinderKey, "0"},         {kRestartsKey, "0"},
-        {"odm.thp.is_updating_fw", "false"},     {"odm.thp.dae_bootflag", "true"},
+        {device::kBuildIdKey, "VIRTUAL-11.0"},
+        {"ro.build.version.release", "11"},
+        {"ro.build.version.sdk", "30"},
+        {"ro.debuggable", "1"},
+        {"ro.logsystem.usertype", "1"},
+        {"ro.product.cpu.abi", "arm64-v8a"},
+        {"ro.serialno", "virtual"},
+        {device::kFirmwareVersionKey, "virtual-1"},
+        {"odm.thp.dae_bootflag", "true"},
+        {device::kDaemonAliveKey, "false"},
+        {device::kDaemonBinderKey, "0"},
+        {device::kRestartCountKey, "0"},
+        {device::kIsUpdatingFirmwareKey, "false"},
         {device::kServiceEnableKey, "1"},
 };
 
-int Fail(const char* what, const char* why) {
-    fprintf(stderr, "init: %s: %s\n", what, why);
+// Says what failed and, from errno, why.
+int Fail(const char* what) {
+    fprintf(stderr, "init: %s: %s\n", what, strerror(errno));
     return 1;
 }
 
-void Remove(const std::string& path) {
-    std::error_code error;
-    std::filesystem::remove_all(host::DeviceRootPath() + "/" + path, error);
+bool PersistsReboot(const std::string& property) { return property.rfind("persist.", 0) == 0; }
+
+// Removes the files of a directory, which is made when it is missing. Returns whether it is there.
+bool Empty(const char* path) {
+    const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
+    for (const std::string& name : device::FilesIn(path)) {
+        unlinkat(directory.get(), name.c_str(), 0);
+    }
+    return directory.ok();
 }
 
-// Whether a boot, which removes files, destroys nothing of anybody else's: the folder was booted
-// before, or has only what the tool and the device's commands make. These leave nothing in tmp and
-// no log without properties. A symbolic link would lead the boot to files elsewhere.
-bool IsDeviceRoot() {
-    const std::set<std::string> files = device::FilesIn(".");
-    const std::set<std::string> own = {"dev",     "log",      "proc", "properties",
-                                       "selinux", "settings", "tmp",  "trace"};
-    const bool hasLink = std::any_of(files.begin(), files.end(), [](const std::string& name) {
-        std::error_code error;
-        return std::filesystem::is_symlink(host::DeviceRootPath() + "/" + name, error);
-    });
-    return !hasLink &&
-           (files.count(device::kInitLock) > 0 ||
-            (device::FilesIn("tmp").empty() && files.count("log") <= files.count("properties") &&
-             std::includes(own.begin(), own.end(), files.begin(), files.end())));
-}
-
-// Makes this process the device's one init. The kernel ends a record lock when the process closes
-// any descriptor of the file: nothing else may open it here.
+// Makes this process the device's one init. The kernel releases a record lock when the process
+// closes any descriptor of the file: nothing else may open it here.
 bool LockDevice() {
-    const int file = openat(host::DeviceRoot(), device::kInitLock,
-                            O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0600);
+    static const UniqueFd file = host::OpenFile(host::kInitLockFile, O_RDWR | O_CREAT);
     struct flock whole = {};
     whole.l_type = F_WRLCK;
-    return file >= 0 && fcntl(file, F_SETLK, &whole) == 0;
+    return file.ok() && fcntl(file.get(), F_SETLK, &whole) == 0;
 }
 
-// The state of a device that has just been switched on: what persists, and the boot properties.
-bool Boot(const std::string& selinuxMode) {
+// Clears the properties, except those that persist, and sets those of a boot: read-only ones, too,
+// that another process has just written.
+bool BootProperties() {
+    const int properties = host::PropertiesDirectory();
+    for (const std::string& name : device::FilesIn(host::kPropertiesDirectory)) {
+        if (!PersistsReboot(name)) {
+            unlinkat(properties, name.c_str(), 0);
+        }
+    }
+    return std::all_of(std::begin(kBootProperties), std::end(kBootProperties),
+                       [properties](const auto& property) {
+                           return host::ReplaceFileAt(properties, property[0], property[1]);
+                       });
+}
+
+// Brings the root into the state of a device that has just been switched on. Returns null, or what
+// failed.
+const char* Boot(const char* selinuxMode) {
     const host::TraceEvent event("boot");
-    Remove("tmp");
-    Remove("dev/vndbinder");
-    for (const std::string& name : device::FilesIn("properties")) {
-        if (name.rfind("persist.", 0) != 0) {
-            Remove("properties/" + name);
-        }
-    }
-    for (const auto& [key, value] : kBootProperties) {
-        if (__system_property_set(key, value) != 0) {
-            return false;
-        }
-    }
-    return host::WriteFile(host::kLogFile, "") && host::ReplaceFile("selinux", selinuxMode);
+    return !Empty(host::kTemporaryDirectory)                     ? "cannot empty tmp"
+           : !Empty(kDriverDirectory)                            ? "cannot empty dev/vndbinder"
+           : !BootProperties()                                   ? "cannot set the boot properties"
+           : !host::WriteFile(host::kLogFile, "")                ? "cannot empty the log"
+           : !host::ReplaceFile(host::kSelinuxFile, selinuxMode) ? "cannot set SELinux's mode"
+                                                                 : nullptr;
 }
 
 // Whether a property that init follows was written since the last call.
-bool TakeWrites(int watch) {
+bool DrainEvents(const UniqueFd& watch) {
     alignas(inotify_event) char events[16384];
-    const ssize_t size = read(watch, events, sizeof(events));
+    const ssize_t size = read(watch.get(), events, sizeof(events));
     bool isWritten = false;
     for (ssize_t at = 0; at < size;) {
         const auto* const event = reinterpret_cast<const inotify_event*>(events + at);
@@ -117,19 +125,20 @@ bool TakeWrites(int watch) {
     return isWritten;
 }
 
-class DaemonMinder {
+class DaemonSupervisor {
   public:
     // Follows a write. Of several quick writes only the last value can be read: "1" for a running
-    // daemon means that "0" came before it. Writes until the daemon has ended are followed at once.
-    void Restart(int watch) {
+    // daemon means that "0" came before it. Writes until the daemon has exited are followed at
+    // once.
+    void Restart(const UniqueFd& watch) {
         Stop();
-        TakeWrites(watch);
+        DrainEvents(watch);
         mIsEnabled = device::IsDaemonEnabled();
         mPauseMs = 0;
     }
 
-    // Notices that the daemon has ended, and starts one that is to run. False when that failed.
-    bool Mind() {
+    // Notices that the daemon has exited, and starts one that is to run. False when that failed.
+    bool ReapAndStart() {
         ReapDaemon();
         if (mDaemon < 0 && mIsEnabled) {
             const pid_t init = getpid();
@@ -151,7 +160,7 @@ class DaemonMinder {
     }
 
   private:
-    // Whatever becomes of init, its daemon goes with it: also when init is gone before this begins.
+    // The daemon dies with init, also when init has died before this begins.
     [[noreturn]] void RunDaemon(pid_t init) const {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
         sigset_t none;
@@ -180,8 +189,9 @@ class DaemonMinder {
                            ? kMinRestartPauseMs
                            : std::clamp(mPauseMs * 2, kMinRestartPauseMs, kMaxRestartPauseMs);
         DaemonGone();
-        const int64_t restarts = device::GetPropertyNumber(kRestartsKey) + 1;
-        __system_property_set(kRestartsKey, std::to_string(restarts).c_str());
+        const int64_t restarts = device::GetPropertyNumber(device::kRestartCountKey);
+        const int64_t next = std::clamp<int64_t>(restarts, 0, INT32_MAX - 1) + 1;
+        __system_property_set(device::kRestartCountKey, std::to_string(next).c_str());
         host::TraceEvent("restart_pause").Add("ms", mPauseMs);
         if (mPauseMs == kMinRestartPauseMs * 2) {
             __android_log_print(ANDROID_LOG_ERROR, nullptr,
@@ -191,10 +201,10 @@ class DaemonMinder {
 
     void DaemonGone() {
         mDaemon = -1;
-        Remove("dev/vndbinder");
+        Empty(kDriverDirectory);
         __system_property_set(device::kDaemonAliveKey, "false");
         __system_property_set(device::kDaemonBinderKey, "0");
-        __system_property_set("odm.thp.is_updating_fw", "false");
+        __system_property_set(device::kIsUpdatingFirmwareKey, "false");
     }
 
     pid_t mDaemon = -1;
@@ -202,81 +212,111 @@ class DaemonMinder {
     int mPauseMs = 0;  // before the next daemon runs; its process waits
 };
 
-// Signal handling, descriptors, session and folder as they are for no caller in particular.
-bool LeaveCaller() {
-    for (int each = 1; each < NSIG; ++each) {
-        signal(each, SIG_DFL);
-    }
+// Signal handling, descriptors, session and directory as they are for no caller in particular.
+bool Daemonize() {
     close_range(STDERR_FILENO + 1, ~0U, 0);
+    for (int number = 1; number < NSIG; ++number) {
+        signal(number, SIG_DFL);
+    }
     setsid();
-    umask(077);
     return chdir("/") == 0;
 }
 
-// Makes the signals that end this process or report its daemon readable.
-int OpenSignals() {
+// Makes the signals that terminate this process or report its daemon readable.
+UniqueFd OpenSignals() {
     sigset_t signals;
     sigemptyset(&signals);
-    for (const int each : {SIGCHLD, SIGINT, SIGTERM}) {
-        sigaddset(&signals, each);
+    for (const int number : {SIGCHLD, SIGINT, SIGTERM}) {
+        sigaddset(&signals, number);
     }
     sigprocmask(SIG_SETMASK, &signals, nullptr);
-    return signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK);
+    return UniqueFd(signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK));
 }
 
-int OpenPropertyWatch() {
-    const int watch = inotify_init1(IN_CLOEXEC | IN_NONBLOCK);
-    const std::string folder = host::DeviceRootPath() + "/properties";
-    constexpr uint32_t kEvents = IN_MOVED_TO | IN_DELETE_SELF | IN_MOVE_SELF;
-    return inotify_add_watch(watch, folder.c_str(), kEvents) >= 0 ? watch : -1;
+// Watches the properties, and the root for the directory of properties to go away.
+UniqueFd OpenWatch() {
+    UniqueFd watch(inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
+    const auto add = [&watch](int directory, uint32_t events) {
+        const std::string path = "/proc/self/fd/" + std::to_string(directory);
+        return inotify_add_watch(watch.get(), path.c_str(), events) >= 0;
+    };
+    const bool isWatching = add(host::PropertiesDirectory(), IN_MOVED_TO) &&
+                            add(host::DeviceRoot(), IN_MOVED_FROM | IN_DELETE);
+    return isWatching ? std::move(watch) : UniqueFd();
 }
 
-// Reports that the device is booted to the process that waits for it.
-void ReportBoot() {
+bool ExitRequested(const UniqueFd& signals) {
+    signalfd_siginfo signal = {};
+    const bool isSignaled = read(signals.get(), &signal, sizeof(signal)) == sizeof(signal);
+    return isSignaled && signal.ssi_signo != SIGCHLD;
+}
+
+// Whether other processes still find the directory of properties that this one follows.
+bool PropertiesExist() {
+    struct stat followed = {};
+    struct stat found = {};
+    return fstat(host::PropertiesDirectory(), &followed) == 0 &&
+           fstatat(host::DeviceRoot(), host::kPropertiesDirectory, &found, AT_SYMLINK_NOFOLLOW) ==
+                   0 &&
+           followed.st_ino == found.st_ino;
+}
+
+// Reports that the device is booted to the process that waits for it, and lets go of the streams.
+void ReportBoot(const UniqueFd& null) {
     [[maybe_unused]] const ssize_t written = write(STDOUT_FILENO, "\n", 1);
-    const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-    for (const int descriptor : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
-        dup2(null, descriptor);
+    for (const int stream : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
+        dup2(null.get(), stream);
     }
+}
+
+void FollowProperties(const UniqueFd& signals, const UniqueFd& watch) {
+    DaemonSupervisor supervisor;
+    supervisor.Restart(watch);
+    bool isBootCompleted = false;
+    pollfd waits[] = {{signals.get(), POLLIN, 0}, {watch.get(), POLLIN, 0}};
+    do {
+        poll(waits, std::size(waits), supervisor.ReapAndStart() ? -1 : kMinRestartPauseMs);
+        host::LookForTrace();
+        if (DrainEvents(watch)) {
+            supervisor.Restart(watch);
+        }
+        if (!isBootCompleted && device::IsDaemonAlive()) {
+            isBootCompleted = __system_property_set(device::kBootCompletedKey, "1") == 0;
+        }
+    } while (!ExitRequested(signals) && PropertiesExist());
+    supervisor.Stop();
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
     if (argc != 2) {
-        return Fail("usage", "init MODE");
+        fputs("usage: init MODE\n", stderr);
+        return 2;
     }
-    if (!LeaveCaller() || host::DeviceRoot() < 0) {
+    if (!Daemonize()) {
+        return Fail("cannot change to /");
+    }
+    if (host::DeviceRoot() < 0) {
         return 1;
     }
-    if (!IsDeviceRoot()) {
-        return Fail(host::DeviceRootPath().c_str(), "has files that are no device's; nothing done");
-    }
     if (!LockDevice()) {
-        return Fail("cannot lock init.lock", strerror(errno));
+        return Fail("cannot lock init.lock");
     }
-    if (!Boot(argv[1])) {
-        return Fail("cannot write to the device root", strerror(errno));
+    const UniqueFd null(open("/dev/null", O_RDWR | O_CLOEXEC));
+    if (!null.ok()) {
+        return Fail("/dev/null");
     }
-    const int signals = OpenSignals();
-    const int watch = OpenPropertyWatch();
-    if (signals < 0 || watch < 0) {
-        return Fail("cannot watch the properties", strerror(errno));
+    if (const char* const failure = Boot(argv[1]); failure != nullptr) {
+        return Fail(failure);
     }
-    ReportBoot();
-    DaemonMinder minder;
-    minder.Restart(watch);
-    pollfd waits[] = {{signals, POLLIN, 0}, {watch, POLLIN, 0}};
-    signalfd_siginfo signal = {};
-    do {
-        poll(waits, std::size(waits), minder.Mind() ? -1 : kMinRestartPauseMs);
-        host::LookForTrace();
-        if (TakeWrites(watch)) {
-            minder.Restart(watch);
-        }
-    } while ((read(signals, &signal, sizeof(signal)) < 0 || signal.ssi_signo == SIGCHLD) &&
-             faccessat(host::DeviceRoot(), "properties", F_OK, 0) == 0);
-    minder.Stop();
-    Remove("tmp");
+    const UniqueFd signals = OpenSignals();
+    const UniqueFd watch = OpenWatch();
+    if (!signals.ok() || !watch.ok()) {
+        return Fail("cannot watch the properties");
+    }
+    ReportBoot(null);
+    FollowProperties(signals, watch);
+    Empty(host::kTemporaryDirectory);
     return 0;
 }

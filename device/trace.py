@@ -1,15 +1,19 @@
 #!/usr/bin/env python3
 """Runs the tool on the device and shows what it, the daemon and init did meanwhile."""
 import argparse
+import contextlib
+import fcntl
 import json
 import os
-import pathlib
+import re
 import signal
+import stat
 import subprocess
 import sys
 import time
 
-TRACE = pathlib.Path(os.environ["TPD_DEVICE_ROOT"], "trace")
+TRACE = "trace"
+ESCAPES = {ord("#"): "#35;", ord(";"): "#59;"}  # of a diagram
 QUIET_S = 0.15  # without an event: whatever the command set off has happened
 REST_LIMIT_S = 5
 NAMES = {"tpd": "tool", "corvane_daemon": "daemon"}
@@ -43,8 +47,16 @@ ARROWS = {"call": "tool->>daemon", "reply": "daemon-->>tool", "daemon_start": "i
 
 def shown(text):
     """The bytes, which the trace holds as one code point each, as readable text"""
-    text = text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace")
+    return escaped(text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace"))
+
+
+def escaped(text):
+    """The text without characters that a terminal acts on"""
     return "".join(c if c.isprintable() else repr(c)[1:-1] for c in text)
+
+
+def actor(event):
+    return NAMES.get(event["who"], shown(event["who"]))
 
 
 def describe(event):
@@ -67,14 +79,41 @@ def hexdump(request):
         print(f"{'':19}{at // 2:08x}: {groups:39}  {text}")
 
 
-def read_trace():
-    # The last line may still be on its way.
-    lines = TRACE.read_text("ascii").splitlines(keepends=True)
-    return sorted((json.loads(line) for line in lines if line.endswith("\n")),
-                  key=lambda event: event["time"])
+@contextlib.contextmanager
+def recording(root):
+    """Turns tracing on: the file is locked before it has its name, and as long as this runs."""
+    temporary = f"{os.getpid()}.{TRACE}"
+    directory = os.open("tmp", os.O_DIRECTORY | os.O_NOFOLLOW, dir_fd=root)
+    trace = os.open(temporary, os.O_RDWR | os.O_CREAT | os.O_EXCL, 0o600, dir_fd=directory)
+    fcntl.flock(trace, fcntl.LOCK_EX)
+    try:
+        os.link(temporary, TRACE, src_dir_fd=directory, dst_dir_fd=root)
+    except FileExistsError:
+        sys.exit("device: another trace is running")
+    finally:
+        os.unlink(temporary, dir_fd=directory)
+    try:
+        yield trace
+    finally:
+        with contextlib.suppress(FileNotFoundError):
+            os.unlink(TRACE, dir_fd=root)
 
 
-def is_at_rest(events):
+def read_trace(trace):
+    events = []
+    for line in os.pread(trace, os.fstat(trace).st_size, 0).decode("ascii").splitlines():
+        # The last line may still be on its way, and a full disk cuts lines short.
+        with contextlib.suppress(json.JSONDecodeError):
+            events.append(json.loads(line))
+    return sorted(events, key=lambda event: event["time"])
+
+
+def is_complete(trace):
+    """Whether all events were written. Who cannot write one takes the write permission away."""
+    return os.fstat(trace).st_mode & stat.S_IWUSR != 0
+
+
+def is_idle(events):
     """Whether nothing happens any more and no daemon is on its way up"""
     life = [event["what"] for event in events
             if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")]
@@ -82,23 +121,22 @@ def is_at_rest(events):
             and (not events or time.monotonic() - events[-1]["time"] > QUIET_S))
 
 
-def record(arguments):
-    """What happened while the tool ran and until the device is at rest, and the result text"""
+def record(trace, arguments):
+    """What happened while the tool ran and until the device is idle, and the result text"""
     try:
         tool = subprocess.run(["tpd", *arguments], stdout=subprocess.PIPE, check=False)
         result = tool.stdout.decode(errors="backslashreplace")
     except KeyboardInterrupt:
         result = "(interrupted)\n"
     limit = time.monotonic() + REST_LIMIT_S
-    while not is_at_rest(events := read_trace()) and time.monotonic() < limit:
+    while not is_idle(events := read_trace(trace)) and time.monotonic() < limit:
         time.sleep(0.02)
     return events, result
 
 
 def print_timeline(events, start, with_bytes):
     for event in events:
-        who = NAMES.get(event["who"], event["who"])
-        print(f"{(event['time'] - start) * 1000:10.3f} {who:>7} {describe(event)}")
+        print(f"{(event['time'] - start) * 1000:10.3f} {actor(event):>7} {describe(event)}")
         if with_bytes and event["what"] == "call":
             hexdump(event["request"])
 
@@ -106,9 +144,9 @@ def print_timeline(events, start, with_bytes):
 def print_diagram(events):
     print("sequenceDiagram\n    participant tool\n    participant daemon\n    participant init")
     for event in events:
-        who = NAMES.get(event["who"], event["who"])
+        who = re.sub(r"\W", "_", actor(event))
         arrow = ARROWS.get(event["what"], f"Note over {who}")
-        print(f"    {arrow}: " + describe(event).replace("#", "#35;").replace(";", "#59;"))
+        print(f"    {arrow}: {describe(event).translate(ESCAPES)}")
 
 
 def main():
@@ -118,18 +156,18 @@ def main():
     form.add_argument("--json", action="store_true", help="print the events as recorded")
     form.add_argument("--mermaid", action="store_true", help="print a sequence diagram")
     parser.add_argument("arguments", nargs=argparse.REMAINDER, metavar="ARGUMENT")
-    options = parser.parse_args()
+    root = int(sys.argv[1])  # the device root's descriptor, from `device`
+    options = parser.parse_args(sys.argv[2:])
+    if options.arguments[:1] == ["--"]:
+        del options.arguments[0]
     sys.stdout.reconfigure(errors="backslashreplace")
-    signal.signal(signal.SIGTERM, signal.default_int_handler)
-    try:
-        os.close(os.open(TRACE, os.O_CREAT | os.O_EXCL, 0o600))
-    except FileExistsError:
-        sys.exit(f"device: another trace runs; if not, remove {TRACE}")
-    try:
+    for number in signal.SIGTERM, signal.SIGHUP:
+        signal.signal(number, signal.default_int_handler)
+    with recording(root) as trace:
         start = time.monotonic()
-        events, result = record(options.arguments)
-    finally:
-        TRACE.unlink(missing_ok=True)
+        events, result = record(trace, options.arguments)
+        if not is_complete(trace):
+            print("device: events were lost; is the file system full?", file=sys.stderr)
     signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     if options.json:
         print(*map(json.dumps, events), sep="\n")
@@ -137,7 +175,7 @@ def main():
         print_diagram(events)
     else:
         print_timeline(events, start, options.bytes)
-        print("result:", result, end="")
+        print("result:", "\n".join(map(escaped, result.split("\n"))), end="")
 
 
 if __name__ == "__main__":

@@ -1,5 +1,6 @@
 #include "platform/device_root.h"
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -9,11 +10,14 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "platform/files.h"
+#include "platform/unique_fd.h"
 
 namespace host {
 
 namespace {
+
+// The file that tells a device root from other directories.
+constexpr char kMark[] = ".tpd-device";
 
 bool IsSet(const char* value) { return value != nullptr && *value != '\0'; }
 
@@ -25,15 +29,75 @@ int Refuse(const std::string& path, const char* why) {
 // Opens closed standard descriptors. A file of the device must not get the number of one, since the
 // program's output would go to that file.
 void FillStandardDescriptors() {
-    int null = open("/dev/null", O_RDWR);
-    while (null >= 0 && null <= STDERR_FILENO) {
-        null = open("/dev/null", O_RDWR);
+    UniqueFd null(open("/dev/null", O_RDWR));
+    while (null.ok() && null.get() <= STDERR_FILENO) {
+        (void)null.release();
+        null.reset(open("/dev/null", O_RDWR));
     }
-    close(null);
+}
+
+// Makes a directory and those above it. Returns 0 or an errno value.
+int MakeDirectories(const std::string& path) {
+    size_t end = 0;
+    do {
+        end = path.find('/', end + 1);
+        if (mkdir(path.substr(0, end).c_str(), 0700) != 0 && errno != EEXIST) {
+            return errno;
+        }
+    } while (end != std::string::npos);
+    return 0;
+}
+
+bool IsMarked(int root) {
+    struct stat status = {};
+    return fstatat(root, kMark, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
+}
+
+bool IsEmpty(DIR* directory) {
+    const dirent* entry = nullptr;
+    do {
+        entry = readdir(directory);
+    } while (entry != nullptr &&
+             (strcmp(entry->d_name, ".") == 0 || strcmp(entry->d_name, "..") == 0));
+    return entry == nullptr;
+}
+
+// Marks an empty directory as a device's. Returns why the directory cannot be one, or null.
+const char* Mark(int root) {
+    UniqueFd content(openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    DIR* const directory = content.ok() ? fdopendir(content.get()) : nullptr;
+    if (directory == nullptr) {
+        return strerror(errno);
+    }
+    (void)content.release();
+    const bool isEmpty = IsEmpty(directory);
+    closedir(directory);
+    if (isEmpty) {
+        const UniqueFd mark(openat(root, kMark, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+        return mark.ok() || errno == EEXIST ? nullptr : strerror(errno);
+    }
+    // Another process may have marked it since this one looked.
+    return IsMarked(root) ? nullptr : "contains files that do not belong to a device";
+}
+
+// Why the directory cannot be the device root, or null.
+const char* Check(int root) {
+    struct stat status = {};
+    if (fstat(root, &status) != 0) {
+        return strerror(errno);
+    }
+    if (status.st_uid != geteuid()) {
+        return "belongs to another user";
+    }
+    if ((status.st_mode & 0077) != 0) {
+        return "is open to other users; its mode must be 0700";
+    }
+    return IsMarked(root) ? nullptr : Mark(root);
 }
 
 int OpenRoot() {
     FillStandardDescriptors();
+    umask(077);
     const std::string path = DeviceRootPath();
     if (path.empty()) {
         return Refuse("", "neither TPD_DEVICE_ROOT, XDG_STATE_HOME nor HOME names a place for it");
@@ -42,28 +106,18 @@ int OpenRoot() {
         return Refuse(path, "is not an absolute path");
     }
     constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-    int root = open(path.c_str(), kFlags);
-    if (root < 0 && errno == ENOENT) {
-        MakeFolders(AT_FDCWD, path);
-        root = open(path.c_str(), kFlags);
+    UniqueFd root(open(path.c_str(), kFlags));
+    if (!root.ok() && errno == ENOENT) {
+        if (const int error = MakeDirectories(path); error != 0) {
+            return Refuse(path, strerror(error));
+        }
+        root.reset(open(path.c_str(), kFlags));
     }
-    if (root < 0) {
+    if (!root.ok()) {
         return Refuse(path, strerror(errno));
     }
-    struct stat status = {};
-    const char* why = nullptr;
-    if (fstat(root, &status) != 0) {
-        why = strerror(errno);
-    } else if (status.st_uid != geteuid()) {
-        why = "belongs to another user";
-    } else if ((status.st_mode & 0077) != 0) {
-        why = "is open to other users; its mode must be 0700";
-    }
-    if (why != nullptr) {
-        close(root);
-        return Refuse(path, why);
-    }
-    return root;
+    const char* const why = Check(root.get());
+    return why == nullptr ? root.release() : Refuse(path, why);
 }
 
 }  // namespace

@@ -1,5 +1,5 @@
-// Files of the device, by their paths below the device root. No symbolic link in the last
-// component of a path is followed. A function that returns false or -1 leaves the reason in errno.
+// Files of the device, by their paths below the device root. No component of a path is followed
+// when it is a symbolic link. A function that fails leaves the reason in errno.
 #pragma once
 
 #include <sys/types.h>
@@ -7,25 +7,49 @@
 #include <string>
 #include <string_view>
 
+#include "platform/unique_fd.h"
+
 namespace host {
 
-// Makes a folder and those above it, for this user only. A relative path begins at the folder that
-// `base` is a descriptor of. A failure shows when the folder is used.
-void MakeFolders(int base, const std::string& path);
+// What the device root contains, besides "settings/SPACE/KEY" and the driver of the binder.
+constexpr char kCommandLineFile[] = "proc/cmdline";
+constexpr char kInitLockFile[] = "init.lock";  // init holds a record lock on it for its life
+constexpr char kLogFile[] = "log";
+constexpr char kPropertiesDirectory[] = "properties";
+constexpr char kSelinuxFile[] = "selinux";
+constexpr char kTemporaryDirectory[] = "tmp";  // new files are written here first
+constexpr char kTraceFile[] = "trace";
+
+enum class IfMissing { kFail, kMake };
+
+// Opens a directory, for reading and for the *at() calls. "." is the device root.
+UniqueFd OpenDirectory(const std::string& path, IfMissing ifMissing = IfMissing::kFail);
+
+// The directory of properties, which is made when it is missing and then stays open. -1 on failure.
+int PropertiesDirectory();
+
+// Opens a file with these flags of open(). O_CREAT also makes missing directories.
+UniqueFd OpenFile(const std::string& path, int flags);
+
+// Opens a regular file to append to it. The caller closes the descriptor. A pipe is rejected:
+// writing to it terminates the process once its reader is gone. O_CREAT in `flags` makes a missing
+// file.
+int OpenForAppending(const char* path, int flags);
 
 // Reads at most `size` bytes from the beginning of a file. Returns how many, or -1.
 ssize_t ReadFile(const std::string& path, char* buffer, size_t size);
+ssize_t ReadFileAt(int directory, const std::string& name, char* buffer, size_t size);
 
 // Overwrites a file, or makes it when it is missing. Other processes may see it empty or half
 // written meanwhile.
 bool WriteFile(const std::string& path, std::string_view content);
 
-// Replaces a file atomically, or makes it and its missing folders. `flags` are those of
+// Replaces a file atomically, or makes it and its missing directories. `flags` are those of
 // renameat2().
-bool ReplaceFile(const std::string& path, std::string_view content, unsigned flags = 0);
+bool ReplaceFile(const std::string& path, std::string_view content);
+bool ReplaceFileAt(int directory, const std::string& name, std::string_view content,
+                   unsigned flags = 0);
 
-// A descriptor that appends to a regular file, or -1; the caller closes it. A pipe is rejected:
-// writing to it ends the process once its reader is gone. O_CREAT in `flags` makes a missing file.
-int OpenForAppending(const char* path, int flags);
+bool RemoveFile(const std::string& path);
 
 }  // namespace host

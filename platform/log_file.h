@@ -8,9 +8,10 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "platform/files.h"
+
 namespace host {
 
-constexpr char kLogFile[] = "log";
 constexpr size_t kMaxLogText = 1023;  // bytes of a text before its terminator, as on a device
 
 // In the machine's byte order.

@@ -1,5 +1,8 @@
 #include "platform/trace.h"
 
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -17,6 +20,26 @@ std::atomic<int> gTraced{-1};  // negative until this process has looked
 
 constexpr char kHexDigits[] = "0123456789abcdef";
 
+// Whether a recorder holds the lock of the file. Whoever gets the lock instead removes the file; as
+// nobody else does then, its name does not pass to another file meanwhile.
+bool IsRecorded() {
+    const UniqueFd trace = DeviceRoot() < 0 ? UniqueFd() : OpenFile(kTraceFile, O_RDONLY);
+    if (!trace.ok()) {
+        return false;
+    }
+    if (flock(trace.get(), LOCK_EX | LOCK_NB) != 0) {
+        return errno == EWOULDBLOCK;
+    }
+    struct stat locked = {};
+    struct stat named = {};
+    if (fstat(trace.get(), &locked) == 0 &&
+        fstatat(DeviceRoot(), kTraceFile, &named, AT_SYMLINK_NOFOLLOW) == 0 &&
+        locked.st_ino == named.st_ino) {
+        unlinkat(DeviceRoot(), kTraceFile, 0);
+    }
+    return false;
+}
+
 }  // namespace
 
 bool IsTraced() {
@@ -26,10 +49,7 @@ bool IsTraced() {
     return gTraced == 1;
 }
 
-void LookForTrace() {
-    const int root = DeviceRoot();
-    gTraced = root >= 0 && faccessat(root, kTraceFile, F_OK, 0) == 0 ? 1 : 0;
-}
+void LookForTrace() { gTraced = IsRecorded() ? 1 : 0; }
 
 int64_t MonotonicUs() {
     return std::chrono::steady_clock::now().time_since_epoch() / std::chrono::microseconds(1);
@@ -51,11 +71,15 @@ TraceEvent::~TraceEvent() {
     const int error = errno;
     mLine += "}\n";
     // Opened for each event: the file may be gone, and threads share no descriptor.
-    const int file = OpenForAppending(kTraceFile, 0);
-    if (file < 0 || write(file, mLine.data(), mLine.size()) < 0) {
+    const UniqueFd file(OpenForAppending(kTraceFile, 0));
+    const bool isWritten = file.ok() && write(file.get(), mLine.data(), mLine.size()) ==
+                                                static_cast<ssize_t>(mLine.size());
+    if (file.ok() && !isWritten) {
+        fchmod(file.get(), S_IRUSR);
+    }
+    if (!isWritten) {
         gTraced = 0;
     }
-    close(file);
     errno = error;
 }
 

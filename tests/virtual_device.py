@@ -1,5 +1,6 @@
 """What the tests do with a virtual device"""
 import contextlib
+import fcntl
 import json
 import os
 import pathlib
@@ -71,9 +72,10 @@ class Device:
         return int(self.getprop("odm.thp.dae_reboot_times"))
 
     def watch(self):
-        """Has all processes of the device record from now on what they do."""
-        self.root.mkdir(mode=0o700)
-        (self.root / "trace").write_text("")
+        """Turns tracing on, for as long as the file is locked."""
+        self.output("device", "root")
+        self.recorder = open(self.root / "trace", "w")
+        fcntl.flock(self.recorder, fcntl.LOCK_EX)
 
     def events(self, what, who=""):
         """What was recorded of one kind, by one program or by all."""

@@ -119,7 +119,7 @@ status_t PublishService(const std::string& driver, const std::string& name,
         close(listener);
         listener = high;
     }
-    MakeFolders(DeviceRoot(), driver.substr(1));
+    OpenDirectory(driver.substr(1), IfMissing::kMake);
     if (!ListenAt(listener, address)) {
         const status_t status = -errno;
         close(listener);

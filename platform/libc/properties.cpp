@@ -30,32 +30,55 @@ bool IsLegalName(const std::string& name) {
     return true;
 }
 
-std::string PropertyPath(const std::string& name) { return "properties/" + name; }
+// Whether the value is UTF-8, without overlong forms and surrogates.
+bool IsUtf8(const std::string& value) {
+    constexpr char32_t kLeast[] = {0, 0x80, 0x800, 0x10000};
+    for (size_t i = 0; i < value.length();) {
+        const auto lead = static_cast<unsigned char>(value[i++]);
+        const int following = lead < 0x80 ? 0 : lead < 0xE0 ? 1 : lead < 0xF0 ? 2 : 3;
+        if ((lead >= 0x80 && lead < 0xC0) || lead > 0xF7) {
+            return false;
+        }
+        char32_t point = following == 0 ? lead : lead & (0x3FU >> following);
+        for (int k = 0; k < following; ++k) {
+            const auto byte = static_cast<unsigned char>(i < value.length() ? value[i++] : '\0');
+            if ((byte & 0xC0) != 0x80) {
+                return false;
+            }
+            point = point << 6 | (byte & 0x3F);
+        }
+        const bool isSurrogate = point >= 0xD800 && point <= 0xDFFF;
+        if (point < kLeast[following] || isSurrogate || point > 0x10FFFF) {
+            return false;
+        }
+    }
+    return true;
+}
 
 // Whether the file's owner may not write it. Then nobody writes the property, not even root.
-bool IsWriteProtected(const std::string& path) {
+bool IsWriteProtected(int properties, const std::string& name) {
     struct stat status = {};
-    return fstatat(host::DeviceRoot(), path.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+    return fstatat(properties, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
            (status.st_mode & S_IWUSR) == 0;
 }
 
 int Get(const std::string& name, char* value) {
     ssize_t length = -1;
     if (host::DeviceRoot() >= 0 && IsLegalName(name)) {
-        length = host::ReadFile(PropertyPath(name), value, PROP_VALUE_MAX - 1);
+        length = host::ReadFileAt(host::PropertiesDirectory(), name, value, PROP_VALUE_MAX - 1);
     }
     value[length > 0 ? length : 0] = '\0';
     return static_cast<int>(strlen(value));
 }
 
 bool Set(const std::string& name, const std::string& value) {
-    if (host::DeviceRoot() < 0 || !IsLegalName(name) ||
-        (value.length() >= PROP_VALUE_MAX && !IsReadOnlyKey(name))) {
+    const bool isTooLong = value.length() >= PROP_VALUE_MAX && !IsReadOnlyKey(name);
+    if (host::DeviceRoot() < 0 || !IsLegalName(name) || isTooLong || !IsUtf8(value)) {
         return false;
     }
-    const std::string path = PropertyPath(name);
-    return !IsWriteProtected(path) &&
-           host::ReplaceFile(path, value, IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0);
+    const int properties = host::PropertiesDirectory();
+    return properties >= 0 && !IsWriteProtected(properties, name) &&
+           host::ReplaceFileAt(properties, name, value, IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0);
 }
 
 }  // namespace

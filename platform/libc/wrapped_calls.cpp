@@ -9,6 +9,7 @@
 #include <optional>
 
 #include "platform/device_root.h"
+#include "platform/files.h"
 #include "platform/trace.h"
 
 extern "C" {
@@ -21,17 +22,16 @@ int __real_pclose(FILE* stream);
 
 // The device's own kernel command line when the device root has one, else the machine's.
 FILE* __wrap_fopen(const char* path, const char* mode) {
-    const int root = strcmp(path, "/proc/cmdline") == 0 ? host::DeviceRoot() : -1;
-    if (root < 0) {
+    if (strcmp(path, "/proc/cmdline") != 0 || host::DeviceRoot() < 0) {
         return __real_fopen(path, mode);
     }
-    const int file = openat(root, "proc/cmdline", O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-    if (file < 0) {
+    host::UniqueFd file = host::OpenFile(host::kCommandLineFile, O_RDONLY);
+    if (!file.ok()) {
         return errno == ENOENT ? __real_fopen(path, mode) : nullptr;
     }
-    FILE* const stream = fdopen(file, mode);
-    if (stream == nullptr) {
-        close(file);
+    FILE* const stream = fdopen(file.get(), mode);
+    if (stream != nullptr) {
+        (void)file.release();
     }
     return stream;
 }

@@ -1,0 +1,22 @@
+// The property keys by which init, the daemon and the programs of the device work together.
+#pragma once
+
+namespace device {
+
+// As on a phone.
+constexpr char kBootCompletedKey[] = "sys.boot_completed";
+constexpr char kBuildIdKey[] = "ro.build.display.id";
+constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
+constexpr char kDaemonBinderKey[] = "odm.thp.binder";
+constexpr char kFirmwareVersionKey[] = "odm.thp.ver_firmware";
+constexpr char kIsUpdatingFirmwareKey[] = "odm.thp.is_updating_fw";
+constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
+constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
+
+// What the simulated daemon is to do: the time that it takes to come up, whether it updates its
+// firmware ("true"), and its fault (see faults.h).
+constexpr char kBootDelayKey[] = "sim.boot_delay_ms";
+constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
+constexpr char kFaultKey[] = "sim.fault";
+
+}  // namespace device
