@@ -13,6 +13,7 @@
 #include <thread>
 
 #include "platform/device_root.h"
+#include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/log_file.h"
 
@@ -50,6 +51,27 @@ TEST(DeviceRootDeathTest, RefusesFoldersThatAreNotThisUsersAlone) {
     EXPECT_EXIT(ExpectRefusal("relative"), refused, "absolute");
 }
 
+TEST(DeviceRootDeathTest, IsADirectoryThatWasEmptyOnce) {
+    const std::string root = kRoot.path + "/other";
+    std::filesystem::create_directory(root);
+    chmod(root.c_str(), 0700);
+    std::ofstream(root + "/letter") << "Dear";
+    const auto refused = testing::ExitedWithCode(0);
+    EXPECT_EXIT(ExpectRefusal(root), refused, "contains files that do not belong to a device");
+    std::ofstream(root + "/.tpd-device");
+    EXPECT_EXIT(ExpectRefusal(root), testing::ExitedWithCode(1), "");
+}
+
+TEST(FilesTest, FollowNoLinkAtAnyDepth) {
+    const std::string outside = kRoot.path + "-outside";
+    std::filesystem::create_directory(outside);
+    EXPECT_TRUE(host::OpenDirectory("links", host::IfMissing::kMake).ok());
+    std::filesystem::create_directory_symlink(outside, kRoot.path + "/links/link");
+    EXPECT_FALSE(host::ReplaceFile("links/link/file", "text"));
+    EXPECT_FALSE(host::WriteFile("links/link/below/file", "text"));
+    EXPECT_TRUE(std::filesystem::remove(outside));  // fails when it is not empty
+}
+
 bool SetProperty(const std::string& name, const std::string& value) {
     return __system_property_set(name.c_str(), value.c_str()) == 0;
 }
@@ -68,6 +90,13 @@ TEST(PropertiesTest, HoldAtMost91Bytes) {
     char value[PROP_VALUE_MAX];
     EXPECT_EQ(__system_property_get("limited", value), 91);
     EXPECT_EQ(value, longest);
+}
+
+TEST(PropertiesTest, HoldUtf8) {
+    for (const char* value : {"\xff", "\xc3", "\xc0\xaf", "\xed\xa0\x80", "\xf4\x90\x80\x80"}) {
+        EXPECT_FALSE(SetProperty("text", value)) << testing::PrintToString(value);
+    }
+    EXPECT_TRUE(SetProperty("text", "a\u00e9\u20ac\U0001f600"));
 }
 
 TEST(PropertiesTest, RejectWritesWhenReadOnly) {

@@ -1,7 +1,9 @@
 """The life of the virtual device: who runs it, how it starts and how it ends"""
 import concurrent.futures
+import fcntl
 import os
 import random
+import shutil
 import subprocess
 
 import pytest
@@ -62,13 +64,59 @@ def test_keeps_nothing_of_its_caller(device, tmp_path):
     assert os.getsid(init) == init
 
 
-def test_starts_again_after_a_crash(device):
+def test_boots_whatever_was_there_before(device):
+    device.tpd("stop")
+    device.setprop("ro.build.version.sdk", "29")
     device.start()
     device.kill("/init")
     wait_until(lambda: not device.processes())
     (device.root / "tmp/left").write_text("")
     device.start()
     assert os.listdir(device.root / "tmp") == []
+    assert device.getprop("ro.build.version.sdk") == "30"
+
+
+def test_makes_files_for_its_user_alone_whatever_the_umask(device):
+    device.output("sh", "-c", "umask 0777; exec device start")
+    device.output("device", "reboot")
+    assert (device.root / "properties").stat().st_mode & 0o777 == 0o700
+
+
+def test_reboots_with_what_persists(device):
+    device.start(), device.setprop("persist.a", "1"), device.setprop("b", "1")
+    device.output("setenforce", "0")
+    device.output("device", "reboot")
+    assert device.getprop("sys.boot_completed") == "1"
+    assert (device.getprop("persist.a"), device.getprop("b")) == ("1", "")
+    assert device.output("getenforce") == "Enforcing\n"
+
+
+def test_stays_in_a_root_that_was_renamed(device):
+    device.start()
+    moved = device.root.rename(device.root.with_name("moved"))
+    letter = device.root / "dev/vndbinder/letter"
+    letter.parent.mkdir(parents=True)
+    letter.write_text("Dear")
+    env = device.env | {"TPD_DEVICE_ROOT": str(moved)}
+    device.kill("corvane_daemon")
+    wait_until(lambda: device.output("getprop", "odm.thp.dae_reboot_times", env=env) == "1\n")
+    device.output("device", "stop", env=env)
+    assert letter.read_text() == "Dear"
+    shutil.rmtree(device.root)
+
+
+def test_says_what_it_cannot_find_out(device):
+    device.output("device", "root")
+    with open(device.root / "init.lock", "w") as lock:
+        fcntl.lockf(lock, fcntl.LOCK_EX)
+        asked = in_parallel(device, ["status", "start", "stop", "run x", "fault none"])
+    assert [done.returncode for done in asked] == [4, 1, 1, 1, 1]
+    assert all("which is not init" in done.stderr for done in asked)
+
+
+def test_lets_its_caller_go_without_descriptors(device):
+    done = device.run("bash", "-c", "ulimit -n 5; device start")
+    assert "Too many open files" in done.stderr
 
 
 def test_says_once_that_the_daemon_cannot_live(device):
@@ -83,20 +131,10 @@ def test_says_once_that_the_daemon_cannot_live(device):
     assert len(device.events("log", who="init")) == 1
 
 
-def test_boots_in_no_folder_of_somebody_else(device):
-    device.root.mkdir(mode=0o700)
-    letter = device.root / "tmp/letter"
-    letter.parent.mkdir()
-    letter.write_text("Dear")
-    assert device.run("device", "start").returncode == 1
-    assert letter.read_text() == "Dear"
-
-
 def test_boots_through_no_link(device, tmp_path):
     letter = tmp_path / "letter"
     letter.write_text("Dear")
-    device.root.mkdir(mode=0o700)
-    (device.root / "init.lock").write_text("")
+    device.output("device", "root")
     (device.root / "properties").symlink_to(tmp_path)
     assert device.run("device", "start").returncode == 1
     assert os.listdir(tmp_path) == ["letter"]

@@ -65,10 +65,3 @@ def test_refuses_wrong_use(device, command):
 def test_serves_adb_shell(device):
     done = device.run("adb", "shell", "tpd", "captest;", "exit", "3")
     assert (done.returncode, done.stdout) == (3, PASS)
-
-
-def test_leaves_no_trace_when_it_is_ended(device):
-    (device.root / "trace").unlink()
-    device.output("device", "fault", "hang", "60000")
-    device.run("timeout", "1", "device", "trace", "captest")
-    assert not (device.root / "trace").exists()

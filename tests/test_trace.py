@@ -1,10 +1,12 @@
 """scripts/device trace: what it shows of a command"""
 import json
 import re
+import signal
+import subprocess
 
 import pytest
 
-from virtual_device import PASS
+from virtual_device import LIMIT_S, PASS, wait_until
 
 
 @pytest.fixture
@@ -55,4 +57,21 @@ def test_prints_the_events_as_they_were_recorded(trace):
 
 
 def test_draws_a_sequence_diagram(trace):
-    assert_in_order(trace("--mermaid", "captest"), "sequenceDiagram\n", "tool->>", "daemon-->>")
+    shown = trace("--mermaid", "--", "captest", "#;")
+    assert_in_order(shown, "sequenceDiagram\n", "tool->>", '"#35;#59;"', "daemon-->>")
+
+
+def test_ends_with_its_terminal(trace, stopped_device):
+    stopped_device.output("device", "fault", "hang", "60000")
+    command = ["device", "trace", "captest"]
+    recorder = subprocess.Popen(command, env=stopped_device.env, stdout=subprocess.DEVNULL)
+    wait_until(lambda: (stopped_device.root / "trace").exists() and stopped_device.events("fault"))
+    assert "another trace" in stopped_device.run(*command).stderr
+    recorder.send_signal(signal.SIGHUP)
+    recorder.wait(LIMIT_S)
+    assert not (stopped_device.root / "trace").exists()
+
+
+def test_clears_the_file_of_a_recorder_that_was_killed(trace, stopped_device):
+    (stopped_device.root / "trace").write_text("{}\n")
+    assert_in_order(trace("captest"), "tool calls", PASS)
