@@ -34,18 +34,6 @@ def test_shows_who_did_what(trace):
     )
 
 
-def test_follows_the_daemon_through_its_death(trace, stopped_device):
-    stopped_device.output("device", "fault", "die_during", "1")
-    assert_in_order(
-        trace("captest"),
-        "daemon has the fault die_during",
-        "init sees the daemon end",
-        "init starts the daemon",
-        "daemon publishes",
-        f"result: {PASS}",
-    )
-
-
 def test_shows_the_bytes_of_the_request(trace):
     assert "00000080: 6361 7074 6573 7400 0000 0000" in trace("--bytes", "captest")
 
