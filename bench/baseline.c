@@ -124,15 +124,21 @@ static const struct {
              0};
 
 static int Connect(void) {
+    const int dev = openat(root, "dev", kDirectory);
+    const int driver = openat(dev, "vndbinder", kDirectory);
+    close(dev);
+    const int service =
+            openat(driver, "service.corvaneinterfaceservice", O_PATH | O_NOFOLLOW | O_CLOEXEC);
     struct sockaddr_un address = {AF_UNIX, ""};
-    snprintf(address.sun_path, sizeof(address.sun_path),
-             "/proc/self/fd/%d/dev/vndbinder/service.corvaneinterfaceservice", root);
+    snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d", service);
     const int connection = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
     fcntl(connection, F_SETFL, O_NONBLOCK);
     if (connect(connection, (struct sockaddr*)&address, sizeof(address)) != 0) {
         Fail("connect");
     }
     fcntl(connection, F_SETFL, 0);
+    close(service);
+    close(driver);
     return connection;
 }
 

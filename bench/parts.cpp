@@ -20,6 +20,7 @@
 #include "binder/corvane_sys_binder_client.h"
 #include "log/Log.h"
 #include "platform/device_root.h"
+#include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/libbinder/vndbinder_wire.h"
 #include "property/Property.h"
@@ -99,15 +100,15 @@ void RunBaseline(State& state) {
     const host::RequestHeader header = {0, 0x10, static_cast<uint32_t>(request.dataSize())};
     host::ReplyHeader reply = {};
     std::vector<char> buffer(host::kMaxTransactionBytes);
-    sockaddr_un address;
-    const int connection = host::NewSocket(kDriver, kServiceName, address);
-    connect(connection, reinterpret_cast<sockaddr*>(&address), sizeof(address));
+    const host::UniqueFd connection = host::NewSocket();
+    const host::UniqueFd directory = host::OpenDirectory(kDriver + 1);
+    const sockaddr_un address = host::Address(directory, kServiceName);
+    connect(connection.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address));
     for (auto _ : state) {
-        host::SendMessage(connection, &header, sizeof(header), request);
-        host::Receive(connection, &reply, sizeof(reply));
-        host::Receive(connection, buffer.data(), reply.size);
+        host::SendMessage(connection.get(), &header, sizeof(header), request);
+        host::Receive(connection.get(), &reply, sizeof(reply));
+        host::Receive(connection.get(), buffer.data(), reply.size);
     }
-    close(connection);
     if (reply.size <= state.range(0)) {
         state.SkipWithError("no reply");
     }

@@ -76,7 +76,7 @@ void AnswerProxy(const uint8_t* data, size_t size) {
     const timeval shortest = {0, 1};
     Check(setsockopt(ends[0], SOL_SOCKET, SO_SNDTIMEO, &shortest, sizeof(shortest)) == 0);
 
-    const sp<IBinder> proxy = host::NewProxy(ends[0]);
+    const sp<IBinder> proxy = host::NewProxy(host::UniqueFd(ends[0]));
     const sp<Recipient> linked = new Recipient;
     const sp<Recipient> unlinked = new Recipient;
     proxy->linkToDeath(linked);

@@ -167,6 +167,22 @@ TEST(VndBinderTest, TakesAPositiveStatusForSuccessWithoutAReply) {
     EXPECT_EQ(reply.dataSize(), 0U);
 }
 
+TEST(VndBinderTest, ReplacesOnlyTheSocketOfAnEarlierService) {
+    EXPECT_EQ(host::PublishService(kDriver, "again", new TestService), android::OK);
+    EXPECT_EQ(host::PublishService(kDriver, "again", new TestService), android::OK);
+    std::ofstream(kRoot.path + kDriver + "/file") << "kept";
+    EXPECT_EQ(host::PublishService(kDriver, "file", new TestService), -EADDRINUSE);
+}
+
+TEST(VndBinderTest, FollowsNoLink) {
+    EXPECT_EQ(host::PublishService(kDriver, "target", new TestService), android::OK);
+    std::filesystem::create_symlink("target", kRoot.path + kDriver + "/link");
+    std::filesystem::create_symlink("vndbinder", kRoot.path + "/dev/linked");
+    EXPECT_NE(host::ConnectService(kDriver, "target"), nullptr);
+    EXPECT_EQ(host::ConnectService(kDriver, "link"), nullptr);
+    EXPECT_EQ(host::ConnectService("/dev/linked", "target"), nullptr);
+}
+
 TEST(VndBinderTest, LimitsTheSizeOfRequests) {
     EXPECT_EQ(host::PublishService(kDriver, "limits", new TestService), android::OK);
     const sp<IBinder> proxy = host::ConnectService(kDriver, "limits");
@@ -195,7 +211,7 @@ TEST(VndBinderTest, LimitsTheSizeOfReplies) {
 TEST(VndBinderTest, NotifiesLinkedRecipientsOfTheOwnersDeath) {
     int ends[2];
     ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
-    const sp<IBinder> proxy = host::NewProxy(ends[0]);
+    const sp<IBinder> proxy = host::NewProxy(host::UniqueFd(ends[0]));
     const sp<TestRecipient> linked = new TestRecipient;
     const sp<TestRecipient> unlinked = new TestRecipient;
     EXPECT_EQ(proxy->linkToDeath(linked), android::OK);

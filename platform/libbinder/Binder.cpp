@@ -7,6 +7,7 @@
 #include <binder/ProcessState.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
@@ -21,7 +22,8 @@ namespace android {
 namespace {
 
 constexpr char kDefaultDriver[] = "/dev/binder";
-constexpr int64_t kGetServiceLimitUs = 5000000;
+constexpr int64_t kGetServiceLimitMs = 5000;
+constexpr int64_t kMaxGetServiceLimitMs = 86'400'000;  // a day
 constexpr int64_t kGetServicePauseUs = 100000;
 
 sp<ProcessState> gProcess;
@@ -29,7 +31,8 @@ sp<IServiceManager> gServiceManager;
 
 int64_t GetServiceLimitUs() {
     const char* const ms = getenv("TPD_GET_SERVICE_MS");
-    return ms != nullptr ? strtol(ms, nullptr, 10) * 1000 : kGetServiceLimitUs;
+    const int64_t limitMs = ms != nullptr ? strtoll(ms, nullptr, 10) : kGetServiceLimitMs;
+    return std::clamp<int64_t>(limitMs, 0, kMaxGetServiceLimitMs) * 1000;
 }
 
 // Service names are ASCII.
@@ -37,7 +40,7 @@ std::string ServiceName(const String16& name) {
     return {name.string(), name.string() + name.size()};
 }
 
-// The sockets in the driver's folder are the list of services.
+// The services are the sockets in the driver's directory.
 class DriverServiceManager : public IServiceManager {
   public:
     sp<IBinder> getService(const String16& name) const override {

@@ -1,31 +1,30 @@
-// A binder driver in the device root: every published service is a socket in the driver's folder,
-// every proxy a connection to one.
+// A binder driver in the device root: a published service is a socket in the driver's directory, a
+// proxy is a connection to one.
 #pragma once
 
 #include <string>
 
 #include <binder/Binder.h>
 
+#include "platform/unique_fd.h"
+
 namespace host {
 
-// The driver's receive buffer: 1 MiB less two pages. Neither a request nor a reply is larger, and a
-// one-way request gets half of it.
+// The size of the driver's receive buffer: 1 MiB less two pages. A request or a reply must fit into
+// it, a one-way request into half of it.
 constexpr size_t kMaxTransactionBytes = (1 << 20) - 2 * 4096;
 constexpr size_t kMaxOneWayBytes = kMaxTransactionBytes / 2;
 
-// A proxy of the service; null when there is none, or when it has too many clients to accept now.
-// `driver` is the driver's path on the device.
+// Returns a proxy of the service; null when it is not published, or when it has too many clients to
+// accept another one now. `driver` is the driver's path on the device.
 android::sp<android::IBinder> ConnectService(const std::string& driver, const std::string& name);
 
-// A proxy over a connected socket, which it owns.
-android::sp<android::IBinder> NewProxy(int connection);
+// Returns a proxy over a connected socket.
+android::sp<android::IBinder> NewProxy(UniqueFd connection);
 
-// Publishes a binder of this process and serves each client on a thread of its own from now on.
-// Returns 0 or a negative status.
+// Publishes a binder of this process, in place of an earlier one of that name, and serves its
+// clients on other threads from then on. Returns 0 or a negative status.
 android::status_t PublishService(const std::string& driver, const std::string& name,
                                  const android::sp<android::IBinder>& binder);
-
-// Serves one client until it hangs up or sends something that is not a request. Closes the socket.
-void ServeClient(int connection, const android::sp<android::IBinder>& service);
 
 }  // namespace host

@@ -1,12 +1,13 @@
 #include <fcntl.h>
 #include <sys/socket.h>
-#include <unistd.h>
 
 #include <algorithm>
+#include <utility>
 #include <vector>
 
 #include <binder/Parcel.h>
 
+#include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/libbinder/vndbinder_wire.h"
 #include "platform/trace.h"
@@ -28,8 +29,7 @@ constexpr uint32_t kAcceptFds = 0x10;
 // A client's proxy of one service. For one thread at a time, like the process that uses it.
 class RemoteBinder : public IBinder {
   public:
-    explicit RemoteBinder(int connection) : mConnection(connection) {}
-    ~RemoteBinder() override { Close(); }
+    explicit RemoteBinder(UniqueFd connection) : mConnection(std::move(connection)) {}
 
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
         flags |= kAcceptFds;
@@ -51,7 +51,7 @@ class RemoteBinder : public IBinder {
 
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
                          uint32_t flags) override {
-        const status_t status = mConnection < 0 ? android::DEAD_OBJECT : android::OK;
+        const status_t status = mConnection.ok() ? android::OK : android::DEAD_OBJECT;
         if (status == android::OK) {
             mLinks.push_back({recipient, cookie, flags});
         }
@@ -74,7 +74,7 @@ class RemoteBinder : public IBinder {
     };
 
     status_t Deliver(uint32_t code, const Parcel& data, Parcel& reply, uint32_t flags) {
-        if (mConnection < 0) {
+        if (!mConnection.ok()) {
             return android::DEAD_OBJECT;
         }
         const bool oneWay = (flags & FLAG_ONEWAY) != 0;
@@ -82,7 +82,7 @@ class RemoteBinder : public IBinder {
             return android::FAILED_TRANSACTION;
         }
         const RequestHeader header = {code, flags, static_cast<uint32_t>(data.dataSize())};
-        if (!SendMessage(mConnection, &header, sizeof(header), data)) {
+        if (!SendMessage(mConnection.get(), &header, sizeof(header), data)) {
             return OwnerDied();
         }
         return oneWay ? android::OK : ReceiveReply(reply);
@@ -90,27 +90,27 @@ class RemoteBinder : public IBinder {
 
     status_t ReceiveReply(Parcel& reply) {
         ReplyHeader header = {};
-        if (!Receive(mConnection, &header, sizeof(header))) {
+        if (!Receive(mConnection.get(), &header, sizeof(header))) {
             return OwnerDied();
         }
         if (header.size > kMaxTransactionBytes) {
-            // Where the next reply begins is unknown: the connection is of no more use.
+            // Where the next reply begins is unknown: the connection is unusable.
             OwnerDied();
             return android::FAILED_TRANSACTION;
         }
-        if (!Receive(mConnection, reply.resize(header.size), header.size)) {
+        if (!Receive(mConnection.get(), reply.resize(header.size), header.size)) {
             reply.resize(0);
             return OwnerDied();
         }
         if (header.status != android::OK) {
             reply.resize(0);
         }
-        // A positive status is no failure, as on a device.
+        // A positive status counts as success, as on a device.
         return std::min<status_t>(header.status, android::OK);
     }
 
     status_t Unlink(const Link& old, wp<DeathRecipient>* outRecipient) {
-        if (mConnection < 0) {
+        if (!mConnection.ok()) {
             return android::DEAD_OBJECT;
         }
         const auto link = std::find_if(mLinks.begin(), mLinks.end(), [&old](const Link& each) {
@@ -127,17 +127,10 @@ class RemoteBinder : public IBinder {
         return android::OK;
     }
 
-    void Close() {
-        if (mConnection >= 0) {
-            close(mConnection);
-            mConnection = -1;
-        }
-    }
-
     // Notifies the recipients, once, on this thread.
     status_t OwnerDied() {
         const TraceEvent event("binder_died");
-        Close();
+        mConnection.reset();
         const sp<IBinder> keep(this);  // a recipient may drop the last other reference
         const std::vector<Link> links = std::move(mLinks);
         mLinks.clear();
@@ -150,32 +143,33 @@ class RemoteBinder : public IBinder {
         return android::DEAD_OBJECT;
     }
 
-    int mConnection;  // -1 once the owner is known to be dead
+    UniqueFd mConnection;  // closed once the owner is known to be dead
     std::vector<Link> mLinks;
 };
 
-// Connects without waiting for a service that is too busy to accept: the next lookup may find it.
-bool Connect(int socket, const sockaddr_un& address) {
-    return fcntl(socket, F_SETFL, O_NONBLOCK) == 0 &&
-           connect(socket, reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0 &&
-           fcntl(socket, F_SETFL, 0) == 0;
+// Does not wait for a service that is too busy to accept: the next lookup may reach it.
+bool Connect(const UniqueFd& connection, const sockaddr_un& address) {
+    return fcntl(connection.get(), F_SETFL, O_NONBLOCK) == 0 &&
+           connect(connection.get(), reinterpret_cast<const sockaddr*>(&address),
+                   sizeof(address)) == 0 &&
+           fcntl(connection.get(), F_SETFL, 0) == 0;
 }
 
 }  // namespace
 
 sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
-    sockaddr_un address;
-    const int connection = NewSocket(driver, name, address);
-    if (connection < 0) {
+    if (!IsServiceName(name)) {
         return nullptr;
     }
-    if (!Connect(connection, address)) {
-        close(connection);
+    const UniqueFd directory = OpenDirectory(driver.substr(1));
+    const UniqueFd service(openat(directory.get(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
+    UniqueFd connection = NewSocket();
+    if (!service.ok() || !Connect(connection, Address(service))) {
         return nullptr;
     }
-    return NewProxy(connection);
+    return NewProxy(std::move(connection));
 }
 
-sp<IBinder> NewProxy(int connection) { return new RemoteBinder(connection); }
+sp<IBinder> NewProxy(UniqueFd connection) { return new RemoteBinder(std::move(connection)); }
 
 }  // namespace host

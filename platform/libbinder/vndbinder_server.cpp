@@ -1,16 +1,20 @@
 #include <fcntl.h>
+#include <pthread.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <chrono>
+#include <condition_variable>
 #include <deque>
+#include <memory>
 #include <mutex>
 #include <thread>
+#include <utility>
 
 #include <binder/Parcel.h>
 
-#include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/libbinder/vndbinder_wire.h"
@@ -26,25 +30,60 @@ namespace host {
 namespace {
 
 constexpr int kBacklog = 128;
-constexpr std::chrono::milliseconds kNoDescriptorPause(10);
-// The kernel closes a dying process's descriptors from the highest down. With the listener above
-// the connections, a client whose call fails finds no listener any more, as with a real driver.
+constexpr std::chrono::milliseconds kRetryPause(10);
+// The kernel closes the descriptors of a dying process from the highest down. The listener is above
+// the connections: a client whose call fails finds no listener any more, as with a real driver.
 constexpr int kListenerDescriptor = 900;
 
-// Carries out the one-way calls of all clients of a service one after another, in the order in
-// which they were read. Two-way calls do not wait for them. The queue has no limit.
+// Runs `work` on a detached thread. While the system cannot make a thread, waits and tries again;
+// std::thread would abort the process.
+template <typename Work>
+void StartThread(Work work) {
+    const auto run = [](void* argument) -> void* {
+        const std::unique_ptr<Work> owned(static_cast<Work*>(argument));
+        (*owned)();
+        return nullptr;
+    };
+    auto* const argument = new Work(std::move(work));
+    pthread_t thread;
+    while (pthread_create(&thread, nullptr, run, argument) != 0) {
+        std::this_thread::sleep_for(kRetryPause);
+    }
+    pthread_detach(thread);
+}
+
+// Executes the one-way calls of all clients of a service one after another, in the order in which
+// they were read. Two-way calls do not wait for them. The queue has no limit.
 class OneWayQueue : public android::BBinder {
   public:
     explicit OneWayQueue(const sp<IBinder>& service) : mService(service) {}
+
+    // Executes the queued calls as they come. Never returns.
+    [[noreturn]] void Drain() {
+        std::unique_lock<std::mutex> lock(mMutex);
+        for (;;) {
+            mHasCalls.wait(lock, [this] { return !mCalls.empty(); });
+            const std::deque<Call> calls = std::exchange(mCalls, {});
+            lock.unlock();
+            for (const Call& call : calls) {
+                Parcel reply;
+                mService->transact(call.code, call.data, &reply, call.flags);
+            }
+            lock.lock();
+        }
+    }
 
   protected:
     status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
         if ((flags & FLAG_ONEWAY) == 0) {
             return mService->transact(code, data, reply, flags);
         }
-        if (Append(code, data, flags)) {
-            std::thread([keep = sp<OneWayQueue>(this)] { keep->CarryOut(); }).detach();
-        }
+        const std::lock_guard<std::mutex> lock(mMutex);
+        Call& call = mCalls.emplace_back();
+        call.code = code;
+        call.flags = flags;
+        call.data.setData(data.data(), data.dataSize());
+        mHasCalls.notify_one();
         return android::OK;
     }
 
@@ -55,86 +94,33 @@ class OneWayQueue : public android::BBinder {
         Parcel data;
     };
 
-    // Returns whether the queue was empty: then no thread is carrying it out.
-    bool Append(uint32_t code, const Parcel& data, uint32_t flags) {
-        const std::lock_guard<std::mutex> lock(mMutex);
-        Call& call = mCalls.emplace_back();
-        call.code = code;
-        call.flags = flags;
-        call.data.setData(data.data(), data.dataSize());
-        return mCalls.size() == 1;
-    }
-
-    void CarryOut() {
-        std::unique_lock<std::mutex> lock(mMutex);
-        while (!mCalls.empty()) {
-            Call& call = mCalls.front();
-            lock.unlock();
-            Parcel reply;
-            mService->transact(call.code, call.data, &reply, call.flags);
-            lock.lock();
-            mCalls.pop_front();
-        }
-    }
-
     const sp<IBinder> mService;
     std::mutex mMutex;
-    std::deque<Call> mCalls;  // the first is the one being carried out
+    std::condition_variable mHasCalls;
+    std::deque<Call> mCalls;
 };
 
-// Replaces a socket that an earlier service of that name left behind.
-bool ListenAt(int socket, const sockaddr_un& address) {
-    unlink(address.sun_path);
-    return bind(socket, reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0 &&
-           listen(socket, kBacklog) == 0;
+// Replaces the socket that an earlier service of that name left behind, but no other kind of file.
+bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::string& name) {
+    struct stat old = {};
+    if (fstatat(directory.get(), name.c_str(), &old, AT_SYMLINK_NOFOLLOW) == 0 &&
+        S_ISSOCK(old.st_mode)) {
+        unlinkat(directory.get(), name.c_str(), 0);
+    }
+    const sockaddr_un address = Address(directory, name);
+    return bind(listener.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) ==
+                   0 &&
+           listen(listener.get(), kBacklog) == 0;
 }
 
-// Serves each client on a thread of its own. Never returns.
-void AcceptClients(int listener, const sp<IBinder>& service) {
-    for (;;) {
-        const int connection = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
-        if (connection < 0) {
-            // Out of descriptors, for example: clients get time to close some.
-            std::this_thread::sleep_for(kNoDescriptorPause);
-        } else {
-            std::thread(ServeClient, connection, service).detach();
-        }
-    }
-}
-
-}  // namespace
-
-status_t PublishService(const std::string& driver, const std::string& name,
-                        const sp<IBinder>& binder) {
-    if (binder == nullptr) {
-        return android::BAD_VALUE;
-    }
-    sockaddr_un address;
-    int listener = NewSocket(driver, name, address);
-    if (listener < 0) {
-        return -errno;
-    }
-    const int high = fcntl(listener, F_DUPFD_CLOEXEC, kListenerDescriptor);
-    if (high >= 0) {
-        close(listener);
-        listener = high;
-    }
-    OpenDirectory(driver.substr(1), IfMissing::kMake);
-    if (!ListenAt(listener, address)) {
-        const status_t status = -errno;
-        close(listener);
-        return status;
-    }
-    std::thread(AcceptClients, listener, sp<IBinder>(new OneWayQueue(binder))).detach();
-    return android::OK;
-}
-
-void ServeClient(int connection, const sp<IBinder>& service) {
+// Serves one client until it hangs up or sends something that is not a request.
+void ServeClient(const UniqueFd& connection, const sp<IBinder>& service) {
     RequestHeader header = {};
-    while (Receive(connection, &header, sizeof(header)) && header.size <= kMaxTransactionBytes) {
+    while (Receive(connection.get(), &header, sizeof(header)) &&
+           header.size <= kMaxTransactionBytes) {
         Parcel request;
         Parcel reply;
-        if (!Receive(connection, request.resize(header.size), header.size)) {
+        if (!Receive(connection.get(), request.resize(header.size), header.size)) {
             break;
         }
         LookForTrace();
@@ -149,11 +135,49 @@ void ServeClient(int connection, const sp<IBinder>& service) {
             reply.resize(0);
         }
         const ReplyHeader answer = {status, static_cast<uint32_t>(reply.dataSize())};
-        if (!SendMessage(connection, &answer, sizeof(answer), reply)) {
+        if (!SendMessage(connection.get(), &answer, sizeof(answer), reply)) {
             break;
         }
     }
-    close(connection);
+}
+
+// Serves every client on its own thread. Never returns.
+[[noreturn]] void AcceptClients(const UniqueFd& listener, const sp<IBinder>& service) {
+    for (;;) {
+        UniqueFd connection(accept4(listener.get(), nullptr, nullptr, SOCK_CLOEXEC));
+        if (!connection.ok()) {
+            // Probably out of descriptors: wait until clients have closed some.
+            std::this_thread::sleep_for(kRetryPause);
+            continue;
+        }
+        StartThread([connection = std::move(connection), service] {
+            ServeClient(connection, service);
+        });
+    }
+}
+
+}  // namespace
+
+status_t PublishService(const std::string& driver, const std::string& name,
+                        const sp<IBinder>& binder) {
+    if (binder == nullptr || !IsServiceName(name)) {
+        return android::BAD_VALUE;
+    }
+    const UniqueFd directory = OpenDirectory(driver.substr(1), IfMissing::kMake);
+    if (!directory.ok()) {
+        return -errno;
+    }
+    UniqueFd listener = NewSocket();
+    if (const int high = fcntl(listener.get(), F_DUPFD_CLOEXEC, kListenerDescriptor); high >= 0) {
+        listener.reset(high);
+    }
+    if (!Listen(listener, directory, name)) {
+        return -errno;
+    }
+    const sp<OneWayQueue> queue = new OneWayQueue(binder);
+    StartThread([queue] { queue->Drain(); });
+    StartThread([listener = std::move(listener), queue] { AcceptClients(listener, queue); });
+    return android::OK;
 }
 
 }  // namespace host

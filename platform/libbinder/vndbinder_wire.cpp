@@ -7,8 +7,6 @@
 #include <cerrno>
 #include <cstdio>
 
-#include "platform/device_root.h"
-
 namespace host {
 
 bool SendMessage(int connection, const void* header, size_t headerSize,
@@ -53,19 +51,20 @@ bool Receive(int connection, void* buffer, size_t size) {
     return true;
 }
 
-int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address) {
-    address = {};
+UniqueFd NewSocket() { return UniqueFd(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)); }
+
+bool IsServiceName(const std::string& name) {
+    constexpr size_t kMaxLength = 64;
+    return !name.empty() && name.length() <= kMaxLength && name.front() != '.' &&
+           name.find('/') == std::string::npos;
+}
+
+sockaddr_un Address(const UniqueFd& fd, const std::string& name) {
+    sockaddr_un address = {};
     address.sun_family = AF_UNIX;
-    // Through the root's descriptor, so that no length of the root's path matters.
-    const int length = snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d%s/%s",
-                                DeviceRoot(), driver.c_str(), name.c_str());
-    if (DeviceRoot() < 0 || name.empty() || name.front() == '.' ||
-        name.find('/') != std::string::npos ||
-        static_cast<size_t>(length) >= sizeof(address.sun_path)) {
-        errno = EINVAL;
-        return -1;
-    }
-    return socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d%s%s", fd.get(),
+             name.empty() ? "" : "/", name.c_str());
+    return address;
 }
 
 }  // namespace host

@@ -9,6 +9,8 @@
 
 #include <binder/Parcel.h>
 
+#include "platform/unique_fd.h"
+
 namespace host {
 
 // A request: this header and `size` parcel bytes. All numbers are in the machine's byte order.
@@ -31,9 +33,14 @@ bool SendMessage(int connection, const void* header, size_t headerSize,
 // Receives exactly `size` bytes. False when the peer hangs up before.
 bool Receive(int connection, void* buffer, size_t size);
 
-// A new socket, which the caller closes; `address` becomes that of the service's socket in the
-// driver's folder. -1, with the reason in errno, when there is no device root, when the name is no
-// file name or too long, or when no socket can be made.
-int NewSocket(const std::string& driver, const std::string& name, sockaddr_un& address);
+// A new, unconnected socket.
+UniqueFd NewSocket();
+
+// Whether a service can have this name: that of a file, short enough for an address.
+bool IsServiceName(const std::string& name);
+
+// The address of the file `name` in the directory `fd`; without a name, of the file `fd` itself.
+// The length of the device root's path does not matter.
+sockaddr_un Address(const UniqueFd& fd, const std::string& name = "");
 
 }  // namespace host

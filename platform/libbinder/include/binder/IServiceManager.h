@@ -10,7 +10,7 @@ class IServiceManager : public IInterface {
     enum { DUMP_FLAG_PRIORITY_DEFAULT = 1 << 3 };
 
     // The service's binder, waiting up to 5 s for it; null when it does not appear. The environment
-    // variable TPD_GET_SERVICE_MS sets another limit in milliseconds.
+    // variable TPD_GET_SERVICE_MS sets another limit in milliseconds, up to a day.
     virtual sp<IBinder> getService(const String16& name) const = 0;
 
     // The service's binder, or null when it is not there now.

@@ -12,8 +12,8 @@ class ProcessState : public virtual RefBase {
     // The one object of the process, on "/dev/binder" unless initWithDriver() came first.
     static sp<ProcessState> self();
 
-    // Chooses the driver: the folder of this path in the device root. A later call with another
-    // path ends the process.
+    // Chooses the driver: the directory of this path in the device root. A later call with another
+    // path aborts the process.
     static sp<ProcessState> initWithDriver(const char* driver);
 
     const std::string& getDriverName() const { return mDriver; }
