@@ -249,10 +249,9 @@ class Bench:
 
     def measure_replies(self):
         rows = {}
-        set_property("sim.fault", "huge")
         for size in REPLY_BYTES:
             self.show_progress(f"reply: {size} bytes")
-            set_property("sim.fault_arg", size)
+            set_property("sim.fault", f"huge {size}")
             rows[size] = summarize(self.time_forwarded(), TIMES)
         set_property("sim.fault", "")
         return rows

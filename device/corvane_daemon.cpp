@@ -1,13 +1,8 @@
 // The simulated touch daemon: publishes its service on the vendor binder, answers commands, and
-// misbehaves on request. Its faults are properties, read for every call:
-//
-//   sim.boot_delay_ms  time it takes to come up
-//   sim.updating_fw    "true": it updates its firmware, until init restarts it for a new value
-//   sim.fault          the name of a fault; anything else is none
-//   sim.fault_arg      the fault's argument
-//   sim.fault_count    how many more calls have the fault; unset: all of them
+// misbehaves as the properties of keys.h and faults.h say.
 #include <android/log.h>
 #include <sys/system_properties.h>
+#include <sys/time.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -15,7 +10,6 @@
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
-#include <mutex>
 #include <string>
 #include <thread>
 
@@ -31,15 +25,15 @@
 
 namespace {
 
-using device::Fault;
+using device::FaultKind;
 using device::GetProperty;
 using device::GetPropertyNumber;
 using std::chrono::milliseconds;
 
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr uint32_t kExecuteCommandCode = 0;
-// Long enough for a reply to be on its way, far too short for anything else.
-constexpr milliseconds kDieAfterReplyDelay(2);
+// Long enough to send the reply, far too short for anything else.
+constexpr int kDieAfterReplyUs = 2000;
 // The names of a phone's commands, each between spaces.
 constexpr char kCommands[] = " " TPD_DAEMON_COMMANDS " ";
 
@@ -83,11 +77,11 @@ std::string Answer(const std::string& command, const std::string& params) {
         return "thplog: " + GetOrUnset("persist.odm.thp.thplog_enabled") +
                "\nafelog: " + GetOrUnset("odm.thp.debug.afelog") +
                "\nraw data: " + GetOrUnset("thp.debug.raw") +
-               "\nrestarts: " + GetOrUnset("odm.thp.dae_reboot_times");
+               "\nrestarts: " + GetOrUnset(device::kRestartCountKey);
     }
     if (command == "THP_GetVersion") {
-        return "corvane_daemon of " + GetOrUnset("ro.build.display.id") + ", firmware " +
-               GetOrUnset("odm.thp.ver_firmware");
+        return "corvane_daemon of " + GetOrUnset(device::kBuildIdKey) + ", firmware " +
+               GetOrUnset(device::kFirmwareVersionKey);
     }
     const bool isName = !command.empty() && command.find(' ') == std::string::npos;
     if (isName && strstr(kCommands, (" " + command + " ").c_str()) != nullptr) {
@@ -101,25 +95,11 @@ std::string Answer(const std::string& command, const std::string& params) {
     abort();
 }
 
-// The fault that a call of this command has, counted down.
-const Fault* TakeFault(const std::string& command) {
-    static std::mutex counting;
-    const std::lock_guard<std::mutex> lock(counting);
-    const Fault* const fault = device::FindFault(GetProperty("sim.fault"));
-    if (fault == nullptr || (fault == &device::kRestart && command != "captest")) {
-        return &device::kNoFault;
-    }
-    if (const std::string count = GetProperty("sim.fault_count"); !count.empty()) {
-        const int64_t left = strtoll(count.c_str(), nullptr, 10);
-        if (left <= 0) {
-            return &device::kNoFault;
-        }
-        __system_property_set("sim.fault_count", std::to_string(left - 1).c_str());
-    }
-    host::TraceEvent("fault")
-            .Add("name", fault->name)
-            .Add("argument", GetProperty("sim.fault_arg"));
-    return fault;
+// Kills the process once the reply of this call is on its way. A timer cannot fail for want of a
+// thread.
+void DieAfterReply() {
+    constexpr itimerval kDelay = {{0, 0}, {0, kDieAfterReplyUs}};
+    [[maybe_unused]] static const int started = setitimer(ITIMER_REAL, &kDelay, nullptr);
 }
 
 class DaemonService : public android::BBinder {
@@ -149,29 +129,31 @@ class DaemonService : public android::BBinder {
   private:
     static android::status_t Execute(const std::string& command, const std::string& params,
                                      android::Parcel* reply) {
-        const Fault* const fault = TakeFault(command);
-        const int64_t argument =
-                std::clamp(GetPropertyNumber("sim.fault_arg"), fault->min, fault->max);
-        if (fault == &device::kDieBefore) {
+        const device::Fault fault = device::TakeFault(command);
+        if (fault.kind == FaultKind::kDieBefore) {
             Die();
         }
         std::string text = Answer(command, params);
-        if (fault == &device::kDieDuring) {
-            Die();
-        }
-        if (fault == &device::kDieAfter || fault == &device::kRestart) {
-            std::thread([] {
-                std::this_thread::sleep_for(kDieAfterReplyDelay);
+        switch (fault.kind) {
+            case FaultKind::kNone:
+            case FaultKind::kDieBefore:
+                break;
+            case FaultKind::kDieDuring:
                 Die();
-            }).detach();
-        } else if (fault == &device::kHang) {
-            std::this_thread::sleep_for(milliseconds(argument));
-        } else if (fault == &device::kStatus) {
-            return static_cast<android::status_t>(argument);
-        } else if (fault == &device::kNoText) {
-            return android::OK;
-        } else if (fault == &device::kHuge) {
-            text.assign(static_cast<size_t>(argument), '#');
+            case FaultKind::kDieAfter:
+            case FaultKind::kCaptestRestart:
+                DieAfterReply();
+                break;
+            case FaultKind::kHang:
+                std::this_thread::sleep_for(milliseconds(fault.argument));
+                break;
+            case FaultKind::kStatus:
+                return static_cast<android::status_t>(fault.argument);
+            case FaultKind::kNoText:
+                return android::OK;
+            case FaultKind::kHuge:
+                text.assign(static_cast<size_t>(fault.argument), '#');
+                break;
         }
         return reply->writeCString(text.c_str());
     }
@@ -180,9 +162,9 @@ class DaemonService : public android::BBinder {
 }  // namespace
 
 int main() {
-    std::this_thread::sleep_for(milliseconds(GetPropertyNumber("sim.boot_delay_ms")));
+    std::this_thread::sleep_for(milliseconds(GetPropertyNumber(device::kBootDelayKey)));
     while (GetProperty(device::kUpdatingFirmwareKey) == "true") {
-        __system_property_set("odm.thp.is_updating_fw", "true");
+        __system_property_set(device::kIsUpdatingFirmwareKey, "true");
         pause();
     }
     android::ProcessState::initWithDriver("/dev/vndbinder");

@@ -365,41 +365,9 @@ int Trace(int argc, char** argv) {
     return Exec(device::PathBesideProgram("trace.py"), arguments);
 }
 
-int ListFaults() {
-    for (const device::Fault* const fault : device::kFaults) {
-        printf("%-16s the daemon %s", fault->name, fault->effect);
-        if (fault->argument != nullptr) {
-            printf("; %s: %jd to %jd", fault->argument, intmax_t{fault->min}, intmax_t{fault->max});
-        }
-        puts("");
-    }
-    return 0;
-}
-
 int Fault(int argc, char** argv) {
-    if (argc == 0) {
-        return ListFaults();
-    }
-    if (const int status = ExpectRunning(); status != 0) {
-        return status;
-    }
-    const device::Fault* const fault = device::FindFault(argv[0]);
-    const int arguments = fault != nullptr && fault->argument != nullptr ? 2 : 1;
-    const std::string argument = arguments == 2 && argc > 1 ? argv[1] : "";
-    const std::string count = argc > arguments ? argv[arguments] : "";
-    if (fault == nullptr || argc > arguments + (fault == &device::kNoFault ? 0 : 1) ||
-        (arguments == 2 && !device::IsNumberWithin(argument, fault->min, fault->max)) ||
-        (argc > arguments && !device::IsNumberWithin(count, 1, INT32_MAX))) {
-        Fail("no such fault, argument or count; `device fault` lists what there is");
-        return kUsageError;
-    }
-    // The fault comes last, so that no call meets it with another one's argument.
-    const bool isSet =
-            __system_property_set("sim.fault", "") == 0 &&
-            __system_property_set("sim.fault_arg", argument.c_str()) == 0 &&
-            __system_property_set("sim.fault_count", count.c_str()) == 0 &&
-            (fault == &device::kNoFault || __system_property_set("sim.fault", fault->name) == 0);
-    return isSet ? 0 : Fail("fault: the property is refused");
+    const int status = argc > 0 ? ExpectRunning() : 0;
+    return status != 0 ? status : device::SetOrListFaults(argc, argv);
 }
 
 constexpr struct {

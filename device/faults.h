@@ -1,4 +1,5 @@
-// The faults that the simulated daemon can have.
+// The faults of the simulated daemon. The one that is set is the property sim.fault:
+// NAME [ARGUMENT] [COUNT], as the arguments of `device fault`; anything else is no fault.
 #pragma once
 
 #include <cstdint>
@@ -6,37 +7,29 @@
 
 namespace device {
 
-struct Fault {
-    const char* name;
-    const char* effect;
-    const char* argument = nullptr;  // what it is, with its unit; null for a fault without one
-    int64_t min = 0;                 // of the argument
-    int64_t max = 0;
+enum class FaultKind {
+    kNone,
+    kDieBefore,
+    kDieDuring,
+    kDieAfter,
+    kCaptestRestart,
+    kHang,
+    kStatus,
+    kNoText,
+    kHuge,
 };
 
-inline constexpr Fault kNoFault = {"none", "behaves"};
-inline constexpr Fault kDieBefore = {"die_before", "dies before it works on the command"};
-inline constexpr Fault kDieDuring = {"die_during", "works, then dies before it replies"};
-inline constexpr Fault kDieAfter = {"die_after", "replies, then dies"};
-inline constexpr Fault kRestart = {"captest_restart", "replies, then dies, for captest only"};
-inline constexpr Fault kHang = {"hang", "replies late", "MILLISECONDS", 0, 1'000'000'000};
-inline constexpr Fault kStatus = {"status", "replies with a status", "STATUS", INT32_MIN,
-                                  INT32_MAX};
-inline constexpr Fault kNoText = {"no_text", "replies without a text"};
-inline constexpr Fault kHuge = {"huge", "replies with a long text", "BYTES", 0, 64 << 20};
+struct Fault {
+    FaultKind kind = FaultKind::kNone;
+    int64_t argument = 0;  // what it is depends on the kind
+    int64_t count = 0;     // the number of calls that it affects; 0: all of them
+};
 
-inline constexpr const Fault* kFaults[] = {&kNoFault,  &kDieBefore, &kDieDuring,
-                                           &kDieAfter, &kRestart,   &kHang,
-                                           &kStatus,   &kNoText,    &kHuge};
+// Returns the fault that affects a call of this command, and counts the call.
+Fault TakeFault(const std::string& command);
 
-// The fault of that name, or null.
-inline const Fault* FindFault(const std::string& name) {
-    for (const Fault* const fault : kFaults) {
-        if (name == fault->name) {
-            return fault;
-        }
-    }
-    return nullptr;
-}
+// `device fault`: sets the fault that the arguments name, or lists all faults when there are none.
+// Returns the exit status: 2 for a usage error.
+int SetOrListFaults(int argc, char** argv);
 
 }  // namespace device

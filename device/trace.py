@@ -34,7 +34,7 @@ DESCRIPTIONS = {
     "reply": "has its reply: status {status}, {bytes} bytes ({us} us)",
     "publish": "publishes {service}",
     "command": 'receives {command}, parameters "{params}"',
-    "fault": "has the fault {name} {argument}",
+    "fault": "has the fault {name}",
     "answer": "answers: status {status}, {bytes} bytes",
     "daemon_start": "starts the daemon, process {daemon}",
     "daemon_stop": "stops the daemon, process {daemon}",

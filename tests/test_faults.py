@@ -1,5 +1,7 @@
 """The tool when its peer, its files or its surroundings are not as they should be"""
+import fcntl
 import os
+import pathlib
 import signal
 import socketserver
 import struct
@@ -55,6 +57,74 @@ def test_prints_the_largest_answer_as_it_is(stopped_device, service):
     text = "%s%n\xff".ljust(1040384 - 1, "r")
     service.reply = reply(text.encode("latin-1") + b"\0")
     assert stopped_device.tpd("x") == text + "\n"
+
+
+# fault, result text, whether the daemon dies
+RESULTS = [
+    ("die_before 1", PASS, True),
+    ("die_before", TIMEOUT, True),
+    ("die_during 1", PASS, True),
+    ("die_during", TIMEOUT, True),
+    ("die_after", PASS, True),
+    ("captest_restart", PASS, True),
+    ("hang 100", PASS, False),
+    ("status -22", TIMEOUT, False),
+    ("status 7", "\n", False),
+    ("no_text", "\n", False),
+    ("huge 3", "###\n", False),
+    ("huge 1040384", TIMEOUT, False),
+]
+
+
+@pytest.mark.parametrize("fault, text, dies", RESULTS, ids=[row[0] for row in RESULTS])
+def test_gives_each_fault_its_result(device, fault, text, dies):
+    device.output("device", "fault", *fault.split())
+    assert device.tpd("captest") == text
+    assert device.events("fault")[0]["name"] == fault
+    wait_until(lambda: bool(device.events("daemon_exit")) == dies)
+
+
+def test_limits_captest_restart_to_captest(device):
+    device.output("device", "fault", "captest_restart")
+    device.tpd("THP_GetVersion")
+    assert device.events("fault") == []
+
+
+USAGE_ERRORS = {
+    "hangg": "unknown fault 'hangg'; 'device fault' lists them",
+    "hang": "fault hang: invalid MILLISECONDS ''; 0 to 1000000000",
+    "hang 1O0": "fault hang: invalid MILLISECONDS '1O0'; 0 to 1000000000",
+    "huge 67108865": "fault huge: invalid BYTES '67108865'; 0 to 67108864",
+    "no_text 0": "fault no_text: invalid COUNT '0'; 1 to 2147483647",
+    "none 1": "fault none: unexpected argument '1'",
+}
+
+
+@pytest.mark.parametrize("arguments", USAGE_ERRORS)
+def test_says_which_word_is_wrong(device, arguments):
+    done = device.run("device", "fault", *arguments.split())
+    assert (done.returncode, done.stdout) == (2, "")
+    assert done.stderr == f"device: {USAGE_ERRORS[arguments]}\n"
+    assert device.getprop("sim.fault") == ""
+
+
+def test_sets_no_fault_during_a_count_down(device):
+    device.output("device", "fault", "hang", "0", "9")
+    properties = os.open(device.root / "properties", os.O_RDONLY)
+    inode = f":{os.stat(properties).st_ino} "
+
+    def waiting():
+        locks = pathlib.Path("/proc/locks").read_text().splitlines()
+        return sum("->" in lock and inode in lock for lock in locks)
+
+    fcntl.flock(properties, fcntl.LOCK_EX)
+    tool = subprocess.Popen([*device.tool, "captest"], env=device.env)
+    wait_until(lambda: waiting() == 1)
+    setter = subprocess.Popen(["device", "fault", "no_text"], env=device.env)
+    wait_until(lambda: waiting() == 2)
+    os.close(properties)
+    assert (tool.wait(LIMIT_S), setter.wait(LIMIT_S)) == (0, 0)
+    assert device.getprop("sim.fault") == "no_text"
 
 
 def test_can_be_ended_while_the_daemon_hangs(device):

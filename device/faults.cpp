@@ -1,0 +1,157 @@
+#include "faults.h"
+
+#include <sys/file.h>
+#include <sys/system_properties.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <iterator>
+#include <sstream>
+
+#include "common.h"
+#include "platform/files.h"
+#include "platform/trace.h"
+#include "platform/unique_fd.h"
+
+namespace device {
+
+namespace {
+
+constexpr int kFailure = 1;
+constexpr int kUsageError = 2;
+
+struct Range {
+    const char* name;  // null when there is no number
+    int64_t min;
+    int64_t max;
+};
+
+constexpr Range kNoArgument = {nullptr, 0, 0};
+constexpr Range kCount = {"COUNT", 1, INT32_MAX};
+
+constexpr struct FaultRow {
+    FaultKind kind;
+    const char* name;
+    const char* effect;
+    Range argument;
+} kFaults[] = {
+        {FaultKind::kNone, "none", "behaves", kNoArgument},
+        {FaultKind::kDieBefore, "die_before", "dies before it works on the command", kNoArgument},
+        {FaultKind::kDieDuring, "die_during", "works, then dies before it replies", kNoArgument},
+        {FaultKind::kDieAfter, "die_after", "replies, then dies", kNoArgument},
+        {FaultKind::kCaptestRestart, "captest_restart", "replies, then dies, for captest only",
+         kNoArgument},
+        {FaultKind::kHang, "hang", "replies late", {"MILLISECONDS", 0, 1'000'000'000}},
+        {FaultKind::kStatus, "status", "replies with a status", {"STATUS", INT32_MIN, INT32_MAX}},
+        {FaultKind::kNoText, "no_text", "replies without a text", kNoArgument},
+        {FaultKind::kHuge, "huge", "replies with a long text", {"BYTES", 0, 64 << 20}},
+};
+
+int Fail(int status, const std::string& why) {
+    fprintf(stderr, "device: %s\n", why.c_str());
+    return status;
+}
+
+// Stores the number in `number`. Returns nothing, or why the word is not a number of this range.
+std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
+    number = strtoll(word.c_str(), nullptr, 10);
+    return IsNumberWithin(word, range.min, range.max)
+                   ? ""
+                   : std::string("invalid ") + range.name + " '" + word + "'; " +
+                             std::to_string(range.min) + " to " + std::to_string(range.max);
+}
+
+// Reads NAME [ARGUMENT] [COUNT]. Returns nothing, or which word is wrong.
+std::string ParseFault(const std::string& text, Fault& fault) {
+    std::istringstream words(text);
+    const auto nextWord = [&words] {
+        std::string word;
+        words >> word;
+        return word;
+    };
+    const std::string name = nextWord();
+    const auto* const row = std::find_if(std::begin(kFaults), std::end(kFaults),
+                                         [&](const FaultRow& each) { return name == each.name; });
+    if (row == std::end(kFaults)) {
+        return "unknown fault '" + name + "'; 'device fault' lists them";
+    }
+    fault.kind = row->kind;
+    std::string error;
+    std::string word = nextWord();
+    if (row->argument.name != nullptr) {
+        error = ParseNumber(word, row->argument, fault.argument);
+        word = nextWord();
+    }
+    if (error.empty() && !word.empty() && row->kind != FaultKind::kNone) {
+        error = ParseNumber(word, kCount, fault.count);
+        word = nextWord();
+    }
+    if (error.empty() && !word.empty()) {
+        error = "unexpected argument '" + word + "'";
+    }
+    return error.empty() ? "" : "fault " + name + ": " + error;
+}
+
+// Waits until no other process or thread reads and then writes the fault. The lock is on the
+// directory of properties and ends with the descriptor.
+host::UniqueFd LockFault() {
+    host::UniqueFd lock = host::OpenDirectory(host::kPropertiesDirectory);
+    if (lock.ok() && flock(lock.get(), LOCK_EX) != 0) {
+        lock.reset();
+    }
+    return lock;
+}
+
+int ListFaults() {
+    for (const FaultRow& fault : kFaults) {
+        printf("%-16s the daemon %s", fault.name, fault.effect);
+        if (fault.argument.name != nullptr) {
+            printf("; %s: %jd to %jd", fault.argument.name, intmax_t{fault.argument.min},
+                   intmax_t{fault.argument.max});
+        }
+        puts("");
+    }
+    return 0;
+}
+
+}  // namespace
+
+Fault TakeFault(const std::string& command) {
+    const host::UniqueFd lock = LockFault();
+    const std::string text = GetProperty(kFaultKey);
+    Fault fault;
+    if (!lock.ok() || !ParseFault(text, fault).empty() || fault.kind == FaultKind::kNone ||
+        (fault.kind == FaultKind::kCaptestRestart && command != "captest")) {
+        return {};
+    }
+    if (fault.count > 0) {
+        const std::string left = std::to_string(fault.count - 1);
+        const std::string rest = text.substr(0, text.rfind(' ') + 1) + left;
+        __system_property_set(kFaultKey, fault.count > 1 ? rest.c_str() : "none");
+    }
+    host::TraceEvent("fault").Add("name", text);
+    return fault;
+}
+
+int SetOrListFaults(int argc, char** argv) {
+    if (argc == 0) {
+        return ListFaults();
+    }
+    std::string text = argv[0];
+    for (int i = 1; i < argc; ++i) {
+        text.append(" ").append(argv[i]);
+    }
+    Fault fault;
+    if (const std::string error = ParseFault(text, fault); !error.empty()) {
+        return Fail(kUsageError, error);
+    }
+    const host::UniqueFd lock = LockFault();
+    if (!lock.ok() || __system_property_set(kFaultKey, text.c_str()) != 0) {
+        return Fail(kFailure, std::string("cannot set the fault: ") + strerror(errno));
+    }
+    return 0;
+}
+
+}  // namespace device
