@@ -10,6 +10,7 @@
 #include <csignal>
 #include <cstdlib>
 #include <cstring>
+#include <optional>
 #include <string>
 #include <thread>
 
@@ -19,6 +20,7 @@
 #include <binder/Parcel.h>
 #include <binder/ProcessState.h>
 
+#include "answers.h"
 #include "common.h"
 #include "faults.h"
 #include "platform/trace.h"
@@ -56,6 +58,9 @@ std::string Help() {
 
 // What the daemon answers to a command. Commands that only act answer that they are done.
 std::string Answer(const std::string& command, const std::string& params) {
+    if (const std::optional<std::string> recorded = device::FindAnswer(command, params)) {
+        return *recorded;
+    }
     if (command == "help") {
         return Help();
     }

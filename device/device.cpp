@@ -19,6 +19,7 @@
 #include <thread>
 #include <vector>
 
+#include "answers.h"
 #include "common.h"
 #include "faults.h"
 #include "platform/device_root.h"
@@ -55,7 +56,10 @@ constexpr char kUsage[] =
         "       device trace [--bytes] [--json | --mermaid] ARGUMENT...\n"
         "                                    runs the tool and shows what all processes did\n"
         "       device fault [NAME [ARGUMENT] [COUNT] | none]\n"
-        "                                    gives the daemon a fault; alone: lists them\n";
+        "                                    gives the daemon a fault; alone: lists them\n"
+        "       device answer [COMMAND TEXT | COMMAND - | --remove COMMAND]\n"
+        "                                    records an answer, `-` from standard input; alone:\n"
+        "                                    lists the commands that have one\n";
 
 int Usage() {
     fputs(kUsage, stderr);
@@ -374,9 +378,11 @@ constexpr struct {
     const char* name;
     int maxArguments;
     int (*run)(int argc, char** argv);
-} kVerbs[] = {{"start", 1, Start},   {"reboot", 0, Reboot},     {"stop", 0, Stop},
-              {"status", 0, Status}, {"root", 0, Root},         {"shell", INT_MAX, Shell},
-              {"run", INT_MAX, Run}, {"trace", INT_MAX, Trace}, {"fault", 3, Fault}};
+} kVerbs[] = {{"start", 1, Start},   {"reboot", 0, Reboot},
+              {"stop", 0, Stop},     {"status", 0, Status},
+              {"root", 0, Root},     {"shell", INT_MAX, Shell},
+              {"run", INT_MAX, Run}, {"trace", INT_MAX, Trace},
+              {"fault", 3, Fault},   {"answer", INT_MAX, device::ListOrRecordAnswers}};
 
 int RunVerb(int argc, char** argv) {
     const std::string name = argc > 1 ? argv[1] : "";

@@ -35,6 +35,7 @@ DESCRIPTIONS = {
     "publish": "publishes {service}",
     "command": 'receives {command}, parameters "{params}"',
     "fault": "has the fault {name}",
+    "recorded_answer": "has a recorded answer to {command}",
     "answer": "answers: status {status}, {bytes} bytes",
     "daemon_start": "starts the daemon, process {daemon}",
     "daemon_stop": "stops the daemon, process {daemon}",

@@ -5,7 +5,7 @@ from subprocess import PIPE, Popen
 
 import pytest
 
-from virtual_device import PASS
+from virtual_device import PASS, PERMISSIVE
 
 
 def test_takes_any_legal_name_for_a_property(device):
@@ -44,10 +44,38 @@ def test_follows_the_log(device):
         logcat.kill()
 
 
+def test_gives_recorded_answers(device):
+    device.output("device", "answer", "THP_GetVersion", "v%d")
+    device.output("device", "answer", "THP_SetFoldState 1", "-", input="\xff\n\n")
+    device.output("device", "stop")
+    device.start()
+    device.setprop(PERMISSIVE, "true")
+    assert device.tpd("THP_GetVersion", "x") == "v%d\n"
+    assert device.tpd("THP_SetFoldState", "1") == "\xff\n\n"
+    assert device.tpd("THP_SetFoldState", "0") == "THP_SetFoldState: done (0)\n"
+
+
+def test_forgets_removed_answers(device):
+    device.output("device", "answer", "captest a/b", "recorded")
+    assert device.output("device", "answer") == "captest a/b\n"
+    device.output("device", "answer", "--remove", "captest a/b")
+    assert device.output("device", "answer") == ""
+    assert device.tpd("captest") == PASS
+
+
+def test_records_only_what_a_daemon_can_answer(device):
+    largest = "r" * 1040383
+    device.output("device", "answer", "captest", "-", input=largest)
+    assert device.run("device", "answer", "captest", "-", input=largest + "r").returncode == 1
+    assert device.run("device", "answer", "captest", "-", input="a\0b").returncode == 1
+    assert device.tpd("captest") == largest + "\n"
+
+
 WRONG_USES = [
     "logcat -d -x",
     "setprop a",
     "adb push a b",
+    "device answer captest",
 ]
 
 

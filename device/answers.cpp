@@ -1,0 +1,140 @@
+#include "answers.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cctype>
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+
+#include "common.h"
+#include "platform/files.h"
+#include "platform/trace.h"
+#include "platform/unique_fd.h"
+
+namespace device {
+
+namespace {
+
+constexpr char kDirectory[] = "answers";
+// The largest that a reply has room for, with its terminator.
+constexpr size_t kMaxAnswerBytes = (1 << 20) - 2 * 4096 - 1;
+constexpr int kFailure = 1;
+constexpr int kUsageError = 2;
+
+int Fail(int status, const std::string& why) {
+    fprintf(stderr, "device: answer: %s\n", why.c_str());
+    return status;
+}
+
+// The file of a command's answer: a byte that is not a letter, a digit or '_' becomes %XX.
+std::string AnswerPath(const std::string& command) {
+    std::string path = std::string(kDirectory) + "/";
+    for (const char c : command) {
+        char escaped[4];
+        snprintf(escaped, sizeof(escaped), "%%%02X", static_cast<unsigned char>(c));
+        const bool isPlain = isalnum(static_cast<unsigned char>(c)) != 0 || c == '_';
+        path += isPlain ? std::string(1, c) : escaped;
+    }
+    return path;
+}
+
+std::string CommandOf(const std::string& file) {
+    std::string command;
+    for (size_t i = 0; i < file.length(); ++i) {
+        if (file[i] == '%') {
+            command += static_cast<char>(strtol(file.substr(i + 1, 2).c_str(), nullptr, 16));
+            i += 2;
+        } else {
+            command += file[i];
+        }
+    }
+    return command;
+}
+
+std::optional<std::string> ReadAnswer(const std::string& command) {
+    const host::UniqueFd file = host::OpenFile(AnswerPath(command), O_RDONLY);
+    struct stat status = {};
+    if (!file.ok() || fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode)) {
+        return std::nullopt;
+    }
+    std::string answer(static_cast<size_t>(status.st_size), '\0');
+    const ssize_t length = read(file.get(), answer.data(), answer.size());
+    answer.resize(length > 0 ? static_cast<size_t>(length) : 0);
+    host::TraceEvent("recorded_answer").Add("command", command);
+    return answer;
+}
+
+int ListAnswers() {
+    for (const std::string& file : FilesIn(kDirectory)) {
+        puts(CommandOf(file).c_str());
+    }
+    return 0;
+}
+
+// What standard input holds, without the newline that the tool prints after an answer.
+std::string ReadInput() {
+    std::string text(kMaxAnswerBytes + 2, '\0');
+    text.resize(fread(text.data(), 1, text.size(), stdin));
+    if (!text.empty() && text.back() == '\n') {
+        text.pop_back();
+    }
+    return text;
+}
+
+int RemoveAnswer(const std::string& command) {
+    return host::RemoveFile(AnswerPath(command))
+                   ? 0
+                   : Fail(kFailure, "'" + command + "': " + strerror(errno));
+}
+
+int RecordAnswer(const std::string& command, const std::string& answer) {
+    if (answer.length() > kMaxAnswerBytes) {
+        return Fail(kFailure, "longer than " + std::to_string(kMaxAnswerBytes) + " bytes");
+    }
+    if (answer.find('\0') != std::string::npos) {
+        return Fail(kFailure, "contains a NUL byte");
+    }
+    return host::ReplaceFile(AnswerPath(command), answer)
+                   ? 0
+                   : Fail(kFailure, "'" + command + "': " + strerror(errno));
+}
+
+}  // namespace
+
+std::optional<std::string> FindAnswer(const std::string& command, const std::string& params) {
+    const std::optional<std::string> answer =
+            params.empty() ? std::nullopt : ReadAnswer(command + " " + params);
+    return answer.has_value() ? answer : ReadAnswer(command);
+}
+
+size_t CountAnswers() { return FilesIn(kDirectory).size(); }
+
+int ListOrRecordAnswers(int argc, char** argv) {
+    if (argc == 0) {
+        return ListAnswers();
+    }
+    const std::string command = argv[0];
+    if (argc == 1) {
+        return Fail(kUsageError, "missing argument after '" + command + "'");
+    }
+    if (argc > 2) {
+        return Fail(kUsageError, "unexpected argument '" + std::string(argv[2]) +
+                                         "'; quote a command with its parameters");
+    }
+    if (command == "--remove") {
+        return RemoveAnswer(argv[1]);
+    }
+    if (command.empty() || command.front() == '-') {
+        return Fail(kUsageError, "invalid command '" + command + "'");
+    }
+    const bool isInput = strcmp(argv[1], "-") == 0;
+    const std::string answer = isInput ? ReadInput() : argv[1];
+    return ferror(stdin) == 0 ? RecordAnswer(command, answer)
+                              : Fail(kFailure, std::string("cannot read: ") + strerror(errno));
+}
+
+}  // namespace device
