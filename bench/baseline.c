@@ -31,7 +31,7 @@ static int logFile;
 static char value[kMaxValue + 1];
 static struct stat status;
 
-static _Noreturn void Fail(const char* what) {
+static void Fail(const char* what) {
     perror(what);
     _exit(1);
 }
