@@ -42,8 +42,13 @@ DESCRIPTIONS = {
     "daemon_exit": "sees the daemon end, process {daemon}: {end}",
     "restart_pause": "waits {ms} ms before it starts the daemon",
 }
-ARROWS = {"call": "tool->>daemon", "reply": "daemon-->>tool", "daemon_start": "init->>daemon",
-          "daemon_stop": "init-xdaemon", "daemon_exit": "daemon--xinit"}
+ARROWS = {
+    "call": "tool->>daemon",
+    "reply": "daemon-->>tool",
+    "daemon_start": "init->>daemon",
+    "daemon_stop": "init-xdaemon",
+    "daemon_exit": "daemon--xinit",
+}
 
 
 def shown(text):
@@ -74,9 +79,9 @@ def describe(event):
 
 def hexdump(request):
     for at in range(0, len(request), 32):
-        line = request[at:at + 32]
+        line = request[at : at + 32]
         text = "".join(chr(c) if 32 <= c < 127 else "." for c in bytes.fromhex(line))
-        groups = " ".join(line[i:i + 4] for i in range(0, len(line), 4))
+        groups = " ".join(line[i : i + 4] for i in range(0, len(line), 4))
         print(f"{'':19}{at // 2:08x}: {groups:39}  {text}")
 
 
@@ -116,10 +121,14 @@ def is_complete(trace):
 
 def is_idle(events):
     """Whether nothing happens any more and no daemon is on its way up"""
-    life = [event["what"] for event in events
-            if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")]
-    return (life[-1:] not in (["restart_pause"], ["daemon_start"])
-            and (not events or time.monotonic() - events[-1]["time"] > QUIET_S))
+    life = [
+        event["what"]
+        for event in events
+        if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")
+    ]
+    return life[-1:] not in (["restart_pause"], ["daemon_start"]) and (
+        not events or time.monotonic() - events[-1]["time"] > QUIET_S
+    )
 
 
 def record(trace, arguments):
