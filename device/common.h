@@ -1,7 +1,6 @@
 // What the programs of the virtual device share.
 #pragma once
 
-#include <dirent.h>
 #include <sys/system_properties.h>
 
 #include <cerrno>
@@ -60,19 +59,14 @@ inline std::string SelinuxMode() { return ReadText(host::kSelinuxFile, "Enforcin
 
 // The names in a directory of the device root, sorted. Empty when it cannot be read.
 inline std::set<std::string> FilesIn(const std::string& path) {
+    const host::UniqueFd directory = host::OpenDirectory(path);
+    const std::string opened = "/proc/self/fd/" + std::to_string(directory.get());
     std::set<std::string> names;
-    host::UniqueFd opened = host::OpenDirectory(path);
-    DIR* const directory = opened.ok() ? fdopendir(opened.get()) : nullptr;
-    if (directory == nullptr) {
-        return names;
+    std::error_code error;
+    std::filesystem::directory_iterator file(opened, error);
+    for (; file != std::filesystem::directory_iterator(); file.increment(error)) {
+        names.insert(file->path().filename());
     }
-    (void)opened.release();
-    while (const dirent* const entry = readdir(directory)) {
-        names.insert(entry->d_name);
-    }
-    closedir(directory);
-    names.erase(".");
-    names.erase("..");
     return names;
 }
 

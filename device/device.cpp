@@ -66,10 +66,17 @@ int Usage() {
     return kUsageError;
 }
 
+int Say(const std::string& what) {
+    fprintf(stderr, "device: %s\n", what.c_str());
+    return 0;
+}
+
 int Fail(const std::string& why) {
-    fprintf(stderr, "device: %s\n", why.c_str());
+    Say(why);
     return 1;
 }
+
+int FailForErrno(const std::string& what) { return Fail(what + ": " + strerror(errno)); }
 
 bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(limitMs);
@@ -82,79 +89,55 @@ bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
     return true;
 }
 
-struct Init {
-    enum class State { kRunning, kStopped, kUnknown };
-    State state;
-    pid_t pid;           // of a running one, else 0
-    std::string reason;  // why its state is unknown
-};
-
 std::filesystem::path ProgramOf(pid_t process, std::error_code& error) {
     return std::filesystem::read_symlink("/proc/" + std::to_string(process) + "/exe", error);
 }
 
-// Looks once which process holds init's lock.
-Init LookForInit() {
-    const auto unknown = [](const std::string& reason) {
-        return Init{Init::State::kUnknown, 0, reason};
-    };
+// One look at who holds init's lock: the process, 0 for nobody, or -1 and the reason why that
+// cannot be found out.
+pid_t LookForInit(std::string& reason) {
     const UniqueFd lock = host::OpenFile(host::kInitLockFile, O_RDONLY);
     if (!lock.ok() && errno == ENOENT) {
-        return {Init::State::kStopped, 0, ""};
+        return 0;
     }
     struct flock holder = {};
     holder.l_type = F_WRLCK;
-    if (!lock.ok() || fcntl(lock.get(), F_GETLK, &holder) != 0) {
-        return unknown(std::string(host::kInitLockFile) + ": " + strerror(errno));
-    }
-    if (holder.l_type == F_UNLCK) {
-        return {Init::State::kStopped, 0, ""};
-    }
-    if (holder.l_pid <= 0) {
-        return unknown("init runs in another process namespace");
-    }
-    const std::string process = "process " + std::to_string(holder.l_pid);
     std::error_code error;
-    const std::filesystem::path program = ProgramOf(holder.l_pid, error);
-    if (error) {
-        return unknown(process + ": " + error.message());
+    if (!lock.ok() || fcntl(lock.get(), F_GETLK, &holder) != 0) {
+        reason = std::string(host::kInitLockFile) + ": " + strerror(errno);
+    } else if (holder.l_type == F_UNLCK) {
+        return 0;
+    } else if (holder.l_pid <= 0) {
+        reason = "init runs in another process namespace";
+    } else if (const auto program = ProgramOf(holder.l_pid, error); error) {
+        reason = "process " + std::to_string(holder.l_pid) + ": " + error.message();
+    } else if (program.filename().string().rfind("init", 0) != 0) {
+        reason = program.string() + ", which is not init, holds " + host::kInitLockFile;
+    } else {
+        return holder.l_pid;
     }
-    // The name of a replaced file is followed by " (deleted)".
-    if (program.filename().string().rfind("init", 0) != 0) {
-        return unknown(process + ", which is not init, holds " + host::kInitLockFile);
-    }
-    return {Init::State::kRunning, holder.l_pid, ""};
+    return -1;
 }
 
-// Looks again while the state is unknown, as it is for a moment when init exits: it still has its
-// lock then, but no executable.
-Init FindInit() {
-    Init init = {};
-    WaitUntil(kFindLimitMs, [&init] {
-        init = LookForInit();
-        return init.state != Init::State::kUnknown;
-    });
+// The process that runs the device, or 0; -1 after a message. Looks again for a while: an init that
+// exits loses its executable before its lock.
+pid_t FindInit() {
+    pid_t init = -1;
+    std::string reason;
+    WaitUntil(kFindLimitMs, [&init, &reason] { return (init = LookForInit(reason)) >= 0; });
+    if (init < 0) {
+        Fail("cannot find out whether the device runs: " + reason);
+    }
     return init;
 }
 
-bool IsRunning() { return FindInit().state == Init::State::kRunning; }
-
-int FailUnknown(const Init& init) {
-    return Fail("cannot find out whether the device runs: " + init.reason);
-}
-
-// Returns 0 when the device runs, else 1 after a message.
-int ExpectRunning() {
-    const Init init = FindInit();
-    switch (init.state) {
-        case Init::State::kRunning:
-            return 0;
-        case Init::State::kStopped:
-            return Fail("the device is stopped; `device start` boots it");
-        case Init::State::kUnknown:
-            break;
+// Whether the device runs; a message says why not.
+bool ExpectRunning() {
+    const pid_t init = FindInit();
+    if (init == 0) {
+        Fail("the device is stopped; `device start` boots it");
     }
-    return FailUnknown(init);
+    return init > 0;
 }
 
 // Whether the process, unless it has just exited, runs the init that was built last.
@@ -167,20 +150,16 @@ bool IsCurrentBuild(pid_t init) {
 // Sends SIGTERM, then SIGKILL after a time-out. The descriptor stands for this one process even
 // when its number passes to another.
 int Stop(int argc, char** argv) {
-    const Init init = FindInit();
-    if (init.state == Init::State::kUnknown) {
-        return FailUnknown(init);
+    const pid_t init = FindInit();
+    if (init <= 0) {
+        return init < 0 ? 1 : Say("already stopped");
     }
-    if (init.state == Init::State::kStopped) {
-        fputs("device: already stopped\n", stderr);
-        return 0;
-    }
-    const std::string name = "process " + std::to_string(init.pid);
-    const UniqueFd process(pidfd_open(init.pid, 0));
+    const std::string name = "process " + std::to_string(init);
+    const UniqueFd process(pidfd_open(init, 0));
     if (!process.ok() && errno != ESRCH) {
-        return Fail(name + ": " + strerror(errno));
+        return FailForErrno(name);
     }
-    const bool isInit = process.ok() && FindInit().pid == init.pid;
+    const bool isInit = process.ok() && FindInit() == init;
     if (!isInit) {
         return Stop(argc, argv);
     }
@@ -193,19 +172,19 @@ int Stop(int argc, char** argv) {
     if (exited.revents == 0) {
         return Fail(name + " does not exit");
     }
-    fputs("device: stopped\n", stderr);
-    return 0;
+    return Say("stopped");
 }
 
-bool IsBootCompleted() { return device::GetProperty(device::kBootCompletedKey) == "1"; }
-
 int AwaitDaemon() {
-    WaitUntil(kStartLimitMs, [] {
-        return (device::IsDaemonAlive() && IsBootCompleted()) || !device::IsDaemonEnabled() ||
-               !IsRunning();
+    pid_t init = 0;
+    WaitUntil(kStartLimitMs, [&init] {
+        const bool isUp =
+                device::IsDaemonAlive() && device::GetProperty(device::kBootCompletedKey) == "1";
+        init = FindInit();
+        return init <= 0 || isUp || !device::IsDaemonEnabled();
     });
-    if (const int status = ExpectRunning(); status != 0) {
-        return status;
+    if (init <= 0) {
+        return init < 0 ? 1 : Fail("the device was stopped");
     }
     return device::IsDaemonAlive()
                    ? 0
@@ -217,75 +196,53 @@ int AwaitDaemon() {
 int Boot(const char* selinuxMode) {
     int report[2];
     if (pipe2(report, O_CLOEXEC) != 0) {
-        return Fail(std::string("cannot make a pipe: ") + strerror(errno));
+        return FailForErrno("cannot make a pipe");
     }
     const UniqueFd reader(report[0]);
     UniqueFd writer(report[1]);
     const std::string program = device::PathBesideProgram("init");
     const pid_t init = fork();
     if (init < 0) {
-        return Fail(std::string("cannot fork: ") + strerror(errno));
+        return FailForErrno("cannot fork");
     }
     if (init == 0) {
         dup2(writer.get(), STDOUT_FILENO);
         execl(program.c_str(), program.c_str(), selinuxMode, nullptr);
-        _exit(Fail(program + ": " + strerror(errno)));
+        _exit(FailForErrno(program));
     }
     writer.reset();
     char byte = 0;
     if (read(reader.get(), &byte, 1) != 1) {
         return Fail("did not start");
     }
-    fprintf(stderr, "device: started in %s, SELinux is %s\n", host::DeviceRootPath().c_str(),
-            selinuxMode);
+    Say("started in " + host::DeviceRootPath() + ", SELinux is " + selinuxMode);
     return AwaitDaemon();
 }
 
-// Waits for a start in progress. The lock lasts as long as the descriptor.
-UniqueFd LockStart() {
-    UniqueFd root = host::OpenDirectory(".");
-    int error = root.ok() ? EWOULDBLOCK : errno;
-    WaitUntil(2 * kStartLimitMs, [&root, &error] {
-        if (error == EWOULDBLOCK) {
-            error = flock(root.get(), LOCK_EX | LOCK_NB) == 0 ? 0 : errno;
+// Boots the device unless it runs already, from this build. Waits for a start in progress, which
+// holds a lock on the root.
+int BringUp(const char* selinuxMode) {
+    const UniqueFd root = host::OpenDirectory(".");
+    const auto isFree = [&root] {
+        return flock(root.get(), LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK;
+    };
+    const bool isLocked = root.ok() && WaitUntil(2 * kStartLimitMs, isFree) &&
+                          flock(root.get(), LOCK_EX | LOCK_NB) == 0;
+    if (!isLocked) {
+        return FailForErrno("cannot lock the device root");
+    }
+    const pid_t init = FindInit();
+    const bool isOther = init > 0 && !IsCurrentBuild(init);
+    if (init != 0 && !isOther) {
+        return init < 0 ? 1 : 0;
+    }
+    if (isOther) {
+        Say("runs another build");
+        if (Stop(0, nullptr) != 0) {
+            return 1;
         }
-        return error != EWOULDBLOCK;
-    });
-    if (error == 0) {
-        return root;
     }
-    Fail(error == EWOULDBLOCK ? "another start does not finish"
-                              : std::string("cannot lock the device root: ") + strerror(error));
-    return UniqueFd();
-}
-
-enum class IfRunning { kLeave, kSayAndLeave, kReboot };
-
-// Boots the device. One that runs from an older build is booted again; `ifRunning` is for one that
-// runs from this build.
-int BringUp(const char* selinuxMode, IfRunning ifRunning) {
-    const UniqueFd lock = LockStart();
-    if (!lock.ok()) {
-        return 1;
-    }
-    const Init init = FindInit();
-    if (init.state == Init::State::kUnknown) {
-        return FailUnknown(init);
-    }
-    const bool isRunning = init.state == Init::State::kRunning;
-    const bool isCurrent = isRunning && IsCurrentBuild(init.pid);
-    if (isCurrent && ifRunning != IfRunning::kReboot) {
-        if (ifRunning == IfRunning::kSayAndLeave) {
-            fprintf(stderr, "device: already running, left as it is; SELinux is %s\n",
-                    device::SelinuxMode().c_str());
-        }
-        return 0;
-    }
-    if (isRunning && !isCurrent) {
-        fputs("device: runs another build\n", stderr);
-    }
-    const int status = isRunning ? Stop(0, nullptr) : 0;
-    return status != 0 ? status : Boot(selinuxMode);
+    return Boot(selinuxMode);
 }
 
 int Start(int argc, char** argv) {
@@ -293,27 +250,24 @@ int Start(int argc, char** argv) {
     if (argc > 0 && !isPermissive) {
         return Usage();
     }
-    const int status = BringUp(isPermissive ? "Permissive" : "Enforcing", IfRunning::kSayAndLeave);
+    const pid_t init = FindInit();
+    const int status = BringUp(isPermissive ? "Permissive" : "Enforcing");
+    if (init > 0 && status == 0 && FindInit() == init) {
+        Say("already running, left as it is; SELinux is " + device::SelinuxMode());
+    }
     return status != 0 ? status : AwaitDaemon();
 }
 
-int Reboot(int, char**) { return BringUp("Enforcing", IfRunning::kReboot); }
+int Reboot(int, char**) { return Stop(0, nullptr) == 0 ? Start(0, nullptr) : 1; }
 
 int Status(int, char**) {
-    const Init init = FindInit();
-    switch (init.state) {
-        case Init::State::kUnknown:
-            puts("unknown");
-            FailUnknown(init);
-            return kExitUnknown;
-        case Init::State::kStopped:
-            puts("stopped");
-            return kExitStopped;
-        case Init::State::kRunning:
-            break;
+    const pid_t init = FindInit();
+    if (init <= 0) {
+        puts(init < 0 ? "unknown" : "stopped");
+        return init < 0 ? kExitUnknown : kExitStopped;
     }
-    printf("running in %s, process %d%s\n", host::DeviceRootPath().c_str(), init.pid,
-           IsCurrentBuild(init.pid) ? "" : ", another build");
+    printf("running in %s, process %d%s\n", host::DeviceRootPath().c_str(), init,
+           IsCurrentBuild(init) ? "" : ", another build");
     printf("daemon alive: %s, binder: %s, SELinux: %s\n",
            device::GetProperty(device::kDaemonAliveKey).c_str(),
            device::GetProperty(device::kDaemonBinderKey).c_str(), device::SelinuxMode().c_str());
@@ -334,7 +288,7 @@ int Exec(const std::string& program, std::vector<const char*> arguments) {
     setenv("TPD_DEVICE_ROOT", host::DeviceRootPath().c_str(), 1);
     arguments.push_back(nullptr);
     execv(program.c_str(), const_cast<char* const*>(arguments.data()));
-    return Fail(program + ": " + strerror(errno));
+    return FailForErrno(program);
 }
 
 // The arguments, joined by spaces, are one shell command, as for `adb shell`.
@@ -346,32 +300,31 @@ int Shell(int argc, char** argv) {
     return Exec("/bin/sh", {"sh", "-c", "--", command.c_str()});
 }
 
-int ExecSibling(const char* name, int argc, char** argv) {
-    std::vector<const char*> arguments = {name};
-    arguments.insert(arguments.end(), argv, argv + argc);
-    return Exec(device::PathBesideProgram(name), arguments);
+int ExecSibling(const char* name, std::vector<const char*> arguments) {
+    arguments.insert(arguments.begin(), name);
+    return Exec(device::PathBesideProgram(name), std::move(arguments));
 }
 
 int Run(int argc, char** argv) {
-    const int status = BringUp("Permissive", IfRunning::kLeave);
-    return status != 0 ? status : ExecSibling("bin/tpd", argc, argv);
+    const int status = BringUp("Permissive");
+    return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
 }
 
 // The recorder gets the device root as a descriptor, whose number is its first argument.
 int Trace(int argc, char** argv) {
-    if (const int status = ExpectRunning(); status != 0) {
-        return status;
+    if (!ExpectRunning()) {
+        return 1;
     }
     host::LookForTrace();  // removes what a killed recorder left behind
     const std::string root = std::to_string(dup(host::DeviceRoot()));
-    std::vector<const char*> arguments = {"trace.py", root.c_str()};
+    std::vector<const char*> arguments = {root.c_str()};
     arguments.insert(arguments.end(), argv, argv + argc);
-    return Exec(device::PathBesideProgram("trace.py"), arguments);
+    return ExecSibling("trace.py", arguments);
 }
 
 int Fault(int argc, char** argv) {
-    const int status = argc > 0 ? ExpectRunning() : 0;
-    return status != 0 ? status : device::SetOrListFaults(argc, argv);
+    const bool isPossible = argc == 0 || ExpectRunning();
+    return isPossible ? device::SetOrListFaults(argc, argv) : 1;
 }
 
 constexpr struct {
@@ -403,5 +356,5 @@ int RunVerb(int argc, char** argv) {
 int main(int argc, char** argv) {
     const int status = RunVerb(argc, argv);
     const bool isFlushed = fflush(stdout) == 0 && ferror(stdout) == 0;
-    return isFlushed ? status : Fail(std::string("cannot write: ") + strerror(errno));
+    return isFlushed ? status : FailForErrno("cannot write");
 }

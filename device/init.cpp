@@ -40,22 +40,20 @@ constexpr char kDriverDirectory[] = "dev/vndbinder";
 constexpr int kMinRestartPauseMs = 50;
 constexpr int kMaxRestartPauseMs = 5000;
 
-constexpr const char* kBootProperties[][2] = {
-        {device::kBuildIdKey, "VIRTUAL-11.0"},
-        {"ro.build.version.release", "11"},
-        {"ro.build.version.sdk", "30"},
-        {"ro.debuggable", "1"},
-        {"ro.logsystem.usertype", "1"},
-        {"ro.product.cpu.abi", "arm64-v8a"},
-        {"ro.serialno", "virtual"},
-        {device::kFirmwareVersionKey, "virtual-1"},
-        {"odm.thp.dae_bootflag", "true"},
-        {device::kDaemonAliveKey, "false"},
-        {device::kDaemonBinderKey, "0"},
-        {device::kRestartCountKey, "0"},
-        {device::kIsUpdatingFirmwareKey, "false"},
-        {device::kServiceEnableKey, "1"},
-};
+constexpr const char* kBootProperties[][2] = {{device::kBuildIdKey, "VIRTUAL-11.0"},
+                                              {"ro.build.version.release", "11"},
+                                              {"ro.build.version.sdk", "30"},
+                                              {"ro.debuggable", "1"},
+                                              {"ro.logsystem.usertype", "1"},
+                                              {"ro.product.cpu.abi", "arm64-v8a"},
+                                              {"ro.serialno", "virtual"},
+                                              {device::kFirmwareVersionKey, "virtual-1"},
+                                              {"odm.thp.dae_bootflag", "true"},
+                                              {device::kDaemonAliveKey, "false"},
+                                              {device::kDaemonBinderKey, "0"},
+                                              {device::kRestartCountKey, "0"},
+                                              {device::kIsUpdatingFirmwareKey, "false"},
+                                              {device::kServiceEnableKey, "1"}};
 
 // Says what failed and, from errno, why.
 int Fail(const char* what) {
@@ -63,13 +61,14 @@ int Fail(const char* what) {
     return 1;
 }
 
-bool PersistsReboot(const std::string& property) { return property.rfind("persist.", 0) == 0; }
-
-// Removes the files of a directory, which is made when it is missing. Returns whether it is there.
-bool Empty(const char* path) {
+// Removes files of a directory, which is made when it is missing. Returns whether it could be
+// opened.
+bool Empty(const char* path, const std::string& keptPrefix = "/") {
     const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
     for (const std::string& name : device::FilesIn(path)) {
-        unlinkat(directory.get(), name.c_str(), 0);
+        if (name.rfind(keptPrefix, 0) != 0) {
+            unlinkat(directory.get(), name.c_str(), 0);
+        }
     }
     return directory.ok();
 }
@@ -83,31 +82,31 @@ bool LockDevice() {
     return file.ok() && fcntl(file.get(), F_SETLK, &whole) == 0;
 }
 
-// Clears the properties, except those that persist, and sets those of a boot: read-only ones, too,
-// that another process has just written.
-bool BootProperties() {
-    const int properties = host::PropertiesDirectory();
-    for (const std::string& name : device::FilesIn(host::kPropertiesDirectory)) {
-        if (!PersistsReboot(name)) {
-            unlinkat(properties, name.c_str(), 0);
-        }
-    }
-    return std::all_of(std::begin(kBootProperties), std::end(kBootProperties),
-                       [properties](const auto& property) {
-                           return host::ReplaceFileAt(properties, property[0], property[1]);
-                       });
+// Also replaces read-only ones that another process has just written.
+bool SetBootProperties() {
+    return std::all_of(
+            std::begin(kBootProperties), std::end(kBootProperties), [](const auto& each) {
+                return host::ReplaceFileAt(host::PropertiesDirectory(), each[0], each[1]);
+            });
 }
 
-// Brings the root into the state of a device that has just been switched on. Returns null, or what
-// failed.
+// The state of a device that has just been switched on. Returns what could not be prepared, or
+// null.
 const char* Boot(const char* selinuxMode) {
     const host::TraceEvent event("boot");
-    return !Empty(host::kTemporaryDirectory)                     ? "cannot empty tmp"
-           : !Empty(kDriverDirectory)                            ? "cannot empty dev/vndbinder"
-           : !BootProperties()                                   ? "cannot set the boot properties"
-           : !host::WriteFile(host::kLogFile, "")                ? "cannot empty the log"
-           : !host::ReplaceFile(host::kSelinuxFile, selinuxMode) ? "cannot set SELinux's mode"
-                                                                 : nullptr;
+    if (!Empty(host::kTemporaryDirectory)) {
+        return host::kTemporaryDirectory;
+    }
+    if (!Empty(kDriverDirectory)) {
+        return kDriverDirectory;
+    }
+    if (!Empty(host::kPropertiesDirectory, "persist.") || !SetBootProperties()) {
+        return host::kPropertiesDirectory;
+    }
+    if (!host::WriteFile(host::kLogFile, "")) {
+        return host::kLogFile;
+    }
+    return host::ReplaceFile(host::kSelinuxFile, selinuxMode) ? nullptr : host::kSelinuxFile;
 }
 
 // Whether a property that init follows was written since the last call.
@@ -240,7 +239,7 @@ UniqueFd OpenWatch() {
         const std::string path = "/proc/self/fd/" + std::to_string(directory);
         return inotify_add_watch(watch.get(), path.c_str(), events) >= 0;
     };
-    const bool isWatching = add(host::PropertiesDirectory(), IN_MOVED_TO) &&
+    const bool isWatching = watch.ok() && add(host::PropertiesDirectory(), IN_MOVED_TO) &&
                             add(host::DeviceRoot(), IN_MOVED_FROM | IN_DELETE);
     return isWatching ? std::move(watch) : UniqueFd();
 }
@@ -307,8 +306,8 @@ int main(int argc, char** argv) {
     if (!null.ok()) {
         return Fail("/dev/null");
     }
-    if (const char* const failure = Boot(argv[1]); failure != nullptr) {
-        return Fail(failure);
+    if (const char* const unprepared = Boot(argv[1]); unprepared != nullptr) {
+        return Fail(unprepared);
     }
     const UniqueFd signals = OpenSignals();
     const UniqueFd watch = OpenWatch();

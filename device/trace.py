@@ -114,11 +114,6 @@ def read_trace(trace):
     return sorted(events, key=lambda event: event["time"])
 
 
-def is_complete(trace):
-    """Whether all events were written. Who cannot write one takes the write permission away."""
-    return os.fstat(trace).st_mode & stat.S_IWUSR != 0
-
-
 def is_idle(events):
     """Whether nothing happens any more and no daemon is on its way up"""
     life = [
@@ -176,7 +171,7 @@ def main():
     with recording(root) as trace:
         start = time.monotonic()
         events, result = record(trace, options.arguments)
-        if not is_complete(trace):
+        if not os.fstat(trace).st_mode & stat.S_IWUSR:
             print("device: events were lost; is the file system full?", file=sys.stderr)
     signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     if options.json:

@@ -53,25 +53,18 @@ bool IsMarked(int root) {
     return fstatat(root, kMark, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
 }
 
-bool IsEmpty(DIR* directory) {
-    const dirent* entry = nullptr;
-    do {
-        entry = readdir(directory);
-    } while (entry != nullptr &&
-             (strcmp(entry->d_name, ".") == 0 || strcmp(entry->d_name, "..") == 0));
-    return entry == nullptr;
-}
-
 // Marks an empty directory as a device's. Returns why the directory cannot be one, or null.
 const char* Mark(int root) {
-    UniqueFd content(openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    DIR* const directory = content.ok() ? fdopendir(content.get()) : nullptr;
+    DIR* const directory = fdopendir(openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (directory == nullptr) {
         return strerror(errno);
     }
-    (void)content.release();
-    const bool isEmpty = IsEmpty(directory);
+    int entries = 0;
+    while (readdir(directory) != nullptr) {
+        ++entries;
+    }
     closedir(directory);
+    const bool isEmpty = entries == 2;  // "." and ".."
     if (isEmpty) {
         const UniqueFd mark(openat(root, kMark, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
         return mark.ok() || errno == EEXIST ? nullptr : strerror(errno);

@@ -28,17 +28,17 @@ UniqueFd OpenDirectory(const std::string& path, IfMissing ifMissing = IfMissing:
 // The directory of properties, which is made when it is missing and then stays open. -1 on failure.
 int PropertiesDirectory();
 
-// Opens a file with these flags of open(). O_CREAT also makes missing directories.
+// Opens a file with these flags of open().
 UniqueFd OpenFile(const std::string& path, int flags);
+UniqueFd OpenFileAt(int directory, const std::string& name, int flags);
 
-// Opens a regular file to append to it. The caller closes the descriptor. A pipe is rejected:
-// writing to it terminates the process once its reader is gone. O_CREAT in `flags` makes a missing
-// file.
-int OpenForAppending(const char* path, int flags);
+// Opens a regular file of the root itself to append to it. The caller closes the descriptor. A pipe
+// is rejected: writing to it terminates the process once its reader is gone. O_CREAT in `flags`
+// makes a missing file.
+int OpenForAppending(const char* name, int flags);
 
 // Reads at most `size` bytes from the beginning of a file. Returns how many, or -1.
 ssize_t ReadFile(const std::string& path, char* buffer, size_t size);
-ssize_t ReadFileAt(int directory, const std::string& name, char* buffer, size_t size);
 
 // Overwrites a file, or makes it when it is missing. Other processes may see it empty or half
 // written meanwhile.

@@ -20,21 +20,18 @@ std::atomic<int> gTraced{-1};  // negative until this process has looked
 
 constexpr char kHexDigits[] = "0123456789abcdef";
 
-// Whether a recorder holds the lock of the file. Whoever gets the lock instead removes the file; as
-// nobody else does then, its name does not pass to another file meanwhile.
+// Whether a recorder holds the lock of the file. A process that gets the lock instead removes the
+// file, unless another one did that before it: the name may be a new recorder's then.
 bool IsRecorded() {
-    const UniqueFd trace = DeviceRoot() < 0 ? UniqueFd() : OpenFile(kTraceFile, O_RDONLY);
+    const UniqueFd trace = OpenFileAt(DeviceRoot(), kTraceFile, O_RDONLY);
     if (!trace.ok()) {
         return false;
     }
     if (flock(trace.get(), LOCK_EX | LOCK_NB) != 0) {
         return errno == EWOULDBLOCK;
     }
-    struct stat locked = {};
-    struct stat named = {};
-    if (fstat(trace.get(), &locked) == 0 &&
-        fstatat(DeviceRoot(), kTraceFile, &named, AT_SYMLINK_NOFOLLOW) == 0 &&
-        locked.st_ino == named.st_ino) {
+    struct stat status = {};
+    if (fstat(trace.get(), &status) == 0 && status.st_nlink > 0) {
         unlinkat(DeviceRoot(), kTraceFile, 0);
     }
     return false;

@@ -3,6 +3,7 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cctype>
 #include <cstdio>
@@ -65,7 +66,8 @@ bool IsWriteProtected(int properties, const std::string& name) {
 int Get(const std::string& name, char* value) {
     ssize_t length = -1;
     if (host::DeviceRoot() >= 0 && IsLegalName(name)) {
-        length = host::ReadFileAt(host::PropertiesDirectory(), name, value, PROP_VALUE_MAX - 1);
+        const host::UniqueFd file = host::OpenFileAt(host::PropertiesDirectory(), name, O_RDONLY);
+        length = file.ok() ? read(file.get(), value, PROP_VALUE_MAX - 1) : -1;
     }
     value[length > 0 ? length : 0] = '\0';
     return static_cast<int>(strlen(value));
