@@ -65,12 +65,15 @@ int Fail(const char* what) {
 // opened.
 bool Empty(const char* path, const std::string& keptPrefix = "/") {
     const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
+    if (!directory.ok()) {
+        return false;
+    }
     for (const std::string& name : device::FilesIn(path)) {
         if (name.rfind(keptPrefix, 0) != 0) {
             unlinkat(directory.get(), name.c_str(), 0);
         }
     }
-    return directory.ok();
+    return true;
 }
 
 // Makes this process the device's one init. The kernel releases a record lock when the process
