@@ -55,7 +55,8 @@ bool IsMarked(int root) {
 
 // Marks an empty directory as a device's. Returns why the directory cannot be one, or null.
 const char* Mark(int root) {
-    DIR* const directory = fdopendir(openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    const int opened = openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    DIR* const directory = opened < 0 ? nullptr : fdopendir(opened);
     if (directory == nullptr) {
         return strerror(errno);
     }
