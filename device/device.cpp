@@ -26,6 +26,7 @@
 #include "platform/files.h"
 #include "platform/trace.h"
 #include "platform/unique_fd.h"
+#include "shell.h"
 
 // The C library's header declares them without the C linkage that they have.
 extern "C" {
@@ -207,6 +208,7 @@ int Boot(const char* selinuxMode) {
     }
     if (init == 0) {
         dup2(writer.get(), STDOUT_FILENO);
+        device::EnterDevice();
         execl(program.c_str(), program.c_str(), selinuxMode, nullptr);
         _exit(FailForErrno(program));
     }
@@ -279,30 +281,13 @@ int Root(int, char**) {
     return 0;
 }
 
-// Executes a program that finds the device's commands and the tool before those of the machine.
-int Exec(const std::string& program, std::vector<const char*> arguments) {
-    const char* const path = getenv("PATH");
-    const bool hasPath = path != nullptr && *path != '\0';
-    const std::string bin = device::PathBesideProgram("bin");
-    setenv("PATH", (bin + ":" + (hasPath ? path : "/usr/bin:/bin")).c_str(), 1);
-    setenv("TPD_DEVICE_ROOT", host::DeviceRootPath().c_str(), 1);
-    arguments.push_back(nullptr);
-    execv(program.c_str(), const_cast<char* const*>(arguments.data()));
-    return FailForErrno(program);
-}
-
-// The arguments, joined by spaces, are one shell command, as for `adb shell`.
 int Shell(int argc, char** argv) {
-    std::string command = argc > 0 ? argv[0] : "exec sh";
-    for (int i = 1; i < argc; ++i) {
-        command.append(" ").append(argv[i]);
-    }
-    return Exec("/bin/sh", {"sh", "-c", "--", command.c_str()});
+    return ExpectRunning() ? device::Shell(argc, argv) : 1;
 }
 
 int ExecSibling(const char* name, std::vector<const char*> arguments) {
     arguments.insert(arguments.begin(), name);
-    return Exec(device::PathBesideProgram(name), std::move(arguments));
+    return device::Exec(device::PathBesideProgram(name), std::move(arguments));
 }
 
 int Run(int argc, char** argv) {

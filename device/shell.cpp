@@ -1,0 +1,84 @@
+#include "shell.h"
+
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+
+#include "common.h"
+#include "platform/device_root.h"
+
+namespace device {
+
+namespace {
+
+constexpr char kShell[] = "/usr/bin/mksh";
+
+int Fail(const std::string& why) {
+    fprintf(stderr, "device: %s\n", why.c_str());
+    return 1;
+}
+
+int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
+                 const std::string& path) {
+    EnterDevice();
+    setenv("PATH", path.c_str(), 1);
+    arguments.push_back(nullptr);
+    execv(program.c_str(), const_cast<char* const*>(arguments.data()));
+    return Fail(program + ": " + strerror(errno));
+}
+
+// The directory of the device's commands. Empty, after a message, when PATH cannot contain it.
+std::string CommandDirectory() {
+    const std::string bin = PathBesideProgram("bin");
+    if (bin.find(':') != std::string::npos) {
+        Fail("'" + bin + "' cannot be in PATH because of its ':'; use another build directory");
+        return "";
+    }
+    return bin;
+}
+
+}  // namespace
+
+void EnterDevice() {
+    const std::string root = host::DeviceRootPath();
+    setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
+    setenv("TPD_DEVICE_PROCESS", root.c_str(), 1);
+}
+
+int Exec(const std::string& program, std::vector<const char*> arguments) {
+    const std::string bin = CommandDirectory();
+    const char* const path = getenv("PATH");
+    const bool hasPath = path != nullptr && *path != '\0';
+    return bin.empty() ? 1
+                       : ExecWithPath(program, std::move(arguments),
+                                      bin + ":" + (hasPath ? path : "/usr/bin:/bin"));
+}
+
+int Shell(int argc, char** argv) {
+    for (const char* const program : {kShell, "/usr/bin/toybox", "/usr/bin/original-awk"}) {
+        if (access(program, X_OK) != 0) {
+            return Fail(std::string(program) + ": " + strerror(errno) +
+                        "; the shell needs the packages mksh, toybox and original-awk");
+        }
+    }
+    const std::string bin = CommandDirectory();
+    if (bin.empty()) {
+        return 1;
+    }
+    // What an interactive shell reads and shows.
+    setenv("ENV", "/dev/null", 1);
+    setenv("PS1", "virtual:$PWD # ", 1);
+    if (argc == 0) {
+        return ExecWithPath(kShell, {"sh"}, bin);
+    }
+    std::string command = argv[0];
+    for (int i = 1; i < argc; ++i) {
+        command.append(" ").append(argv[i]);
+    }
+    return ExecWithPath(kShell, {"sh", "-c", "--", command.c_str()}, bin);
+}
+
+}  // namespace device
