@@ -22,7 +22,6 @@
 #include <string>
 
 #include "common.h"
-#include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/log_file.h"
 #include "platform/unique_fd.h"
@@ -149,8 +148,7 @@ class LogReader {
   public:
     // Leaves the reason in errno.
     bool Open() {
-        mLog.reset(openat(host::DeviceRoot(), host::kLogFile,
-                          O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+        mLog = host::OpenFile(host::kLogFile, O_RDONLY);
         struct stat status = {};
         if (!mLog.ok() || fstat(mLog.get(), &status) != 0) {
             return false;

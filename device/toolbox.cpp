@@ -32,7 +32,7 @@ int Fail(const char* what) {
 std::string WholeProperty(const std::string& name) {
     const std::string value = device::GetProperty(name.c_str());
     const bool isCut = value.length() == PROP_VALUE_MAX - 1;
-    return isCut ? device::ReadText("properties/" + name, "") : value;
+    return isCut ? device::ReadText(std::string(host::kPropertiesDirectory) + "/" + name, "") : value;
 }
 
 int Getprop(int argc, char** argv) {
@@ -42,7 +42,7 @@ int Getprop(int argc, char** argv) {
         puts(usesDefault ? argv[2] : value.c_str());
         return 0;
     }
-    for (const std::string& name : device::FilesIn("properties")) {
+    for (const std::string& name : device::FilesIn(host::kPropertiesDirectory)) {
         printf("[%s]: [%s]\n", name.c_str(), WholeProperty(name).c_str());
     }
     return 0;
@@ -56,7 +56,9 @@ int Setprop(int /* argc */, char** argv) {
         __system_property_set(name, value.c_str()) == 0) {
         return 0;
     }
-    fprintf(stderr, "Failed to set property '%s' to '%s'.\n", name, value.c_str());
+    const char* const brokenRule = host::BrokenPropertyRule(name, value);
+    fprintf(stderr, "Failed to set property '%s' to '%s'.%s%s\n", name, value.c_str(),
+            brokenRule != nullptr ? " " : "", brokenRule != nullptr ? brokenRule : "");
     return 1;
 }
 
@@ -72,7 +74,7 @@ int Setenforce(int /* argc */, char** argv) {
     if (!isPermissive && !isEnforcing) {
         return kUsageError;
     }
-    return host::ReplaceFile("selinux", isPermissive ? "Permissive" : "Enforcing")
+    return host::ReplaceFile(host::kSelinuxFile, isPermissive ? "Permissive" : "Enforcing")
                    ? 0
                    : Fail("cannot set the mode");
 }
@@ -105,7 +107,7 @@ int Settings(int argc, char** argv) {
         return 0;
     }
     if (verb == "delete" && argc == 4) {
-        printf("Deleted %d rows\n", unlinkat(host::DeviceRoot(), path.c_str(), 0) == 0 ? 1 : 0);
+        printf("Deleted %d rows\n", host::RemoveFile(path) ? 1 : 0);
         return 0;
     }
     if (verb == "put" && argc == 5) {

@@ -5,7 +5,7 @@ from subprocess import PIPE, Popen
 
 import pytest
 
-from virtual_device import PASS, PERMISSIVE
+from virtual_device import PASS, PERMISSIVE, SOURCE, wait_until
 
 
 def test_takes_any_legal_name_for_a_property(device):
@@ -22,8 +22,15 @@ def test_leaves_nothing_of_a_write_that_fails(device):
     assert os.listdir(device.root / "tmp") == []
 
 
+def test_shows_a_long_property_whole_and_a_default(device):
+    device.setprop("ro.long", "x" * 200)
+    assert device.getprop("ro.long") == "x" * 200
+    assert f"[ro.long]: [{'x' * 200}]\n" in device.output("getprop")
+    assert device.output("getprop", "unset", "default") == "default\n"
+
+
 @pytest.mark.parametrize("key", ["system/../.. selinux", "system ../../selinux"])
-def test_keeps_settings_in_their_folder(device, key):
+def test_keeps_settings_in_their_directory(device, key):
     device.run("settings", "put", *key.split(), "Permissive")
     assert device.output("getenforce") == "Enforcing\n"
 
@@ -71,22 +78,122 @@ def test_records_only_what_a_daemon_can_answer(device):
     assert device.tpd("captest") == largest + "\n"
 
 
-WRONG_USES = [
+def test_starts_over_when_the_log_was_emptied(device):
+    device.output("log", "-t", "life", "first")
+    command = ["logcat", "-v", "raw", "-s", "life"]
+    with Popen(command, env=device.env, stdout=PIPE) as logcat:
+        assert logcat.stdout.readline() == b"first\n"
+        device.output("logcat", "-c")
+        device.output("log", "-t", "life", "a text longer than first")
+        assert b"longer" in logcat.stdout.readline()
+        logcat.kill()
+
+
+LOG_SELECTIONS = {
+    "-v tag": "E/one     : first\nI/two     : second\n",
+    "-v raw -e d$": "second\n",
+    "-v raw -t 1 -b main,crash": "second\n",
+    "-v raw --pid 1": "",
+}
+
+
+@pytest.mark.parametrize("options", LOG_SELECTIONS)
+def test_selects_from_the_log(device, options):
+    device.output("logcat", "-c")
+    device.output("log", "-p", "e", "-t", "one", "first")
+    device.output("log", "-t", "two", "second")
+    logged = device.output("logcat", "-d", *options.split(), "one", "two", "*:s")
+    assert logged == LOG_SELECTIONS[options]
+
+
+def test_refuses_a_fifo_as_the_log(stopped_device):
+    stopped_device.root.mkdir(mode=0o700)
+    os.mkfifo(stopped_device.root / "log")
+    assert stopped_device.run("logcat", "-d").returncode == 1
+
+
+USAGE_ERRORS = [
     "logcat -d -x",
+    "logcat -d -b none",
+    "log -p q text",
     "setprop a",
     "adb push a b",
     "device answer captest",
+=======
+    "adb -s other shell true",
+    "adb -d shell true",
 ]
 
 
-@pytest.mark.parametrize("command", WRONG_USES)
-def test_refuses_wrong_use(device, command):
+@pytest.mark.parametrize("command", USAGE_ERRORS)
+def test_refuses_wrong_arguments(device, command):
     done = device.run(*command.split())
     assert done.returncode in (1, 2)
     assert done.stdout == ""
     assert done.stderr != ""
 
 
+def shell(device, command, **options):
+    return device.run("adb", "shell", command, **options).stdout
+
+
+def test_refuses_the_shell_of_a_stopped_device(stopped_device):
+    done = stopped_device.run("device", "shell", "echo", "hi")
+    assert (done.returncode, done.stdout) == (1, "")
+    assert "device is stopped" in done.stderr
+
+
 def test_serves_adb_shell(device):
     done = device.run("adb", "shell", "tpd", "captest;", "exit", "3")
     assert (done.returncode, done.stdout) == (3, PASS)
+    array = "a=(1 2); [[ ${#a[@]} = 2 ]] && echo ${a[1]}"
+    assert shell(device, array) == "2\n"
+
+
+def test_finds_the_listed_commands_and_no_others(device):
+    lines = (SOURCE / "device/commands").read_text().splitlines()
+    listed = {
+        name
+        for line in lines
+        if not line.startswith("#")
+        for name in line.split()[1:]
+    }
+    found = shell(device, 'IFS=:; for d in $PATH; do ls "$d"; done')
+    assert set(found.split()) == listed
+    for name in ["mount", "python3", "top", "toybox"]:
+        assert shell(device, f"type {name}") == f"{name} not found\n"
+
+
+def test_sees_the_processes_of_this_device_only(device):
+    daemon = device.processes("corvane_daemon")
+    init = device.processes("init")
+    both = "".join(f"{process}\n" for process in sorted(init + daemon))
+    assert shell(device, "pidof corvane_daemon") == f"{daemon[0]}\n"
+    assert shell(device, "pgrep '^(init|corvane)'") == both
+    assert shell(device, "timeout 9 pgrep python; ps -p 1") == ""
+    assert "init" in shell(device, "ps -A -o NAME=")
+    assert "python" not in shell(device, "ps -ef")
+    shell(device, "pkill -9 corvane_daemon")
+    wait_until(lambda: device.restarts() == 1)
+
+
+@pytest.mark.parametrize("option, count", [("", 1), ("-n", 3)])
+def test_reads_all_standard_input_unless_told(device, option, count):
+    loop = f"while read -r x; do echo $x; adb shell {option} true; done"
+    done = device.run("bash", "-c", loop, input="a\nb\nc\n")
+    assert len(done.stdout.split()) == count
+
+
+def test_says_once_that_a_root_is_refused(device):
+    device.root.chmod(0o755)
+    done = device.run("adb", "wait-for-device")
+    device.root.chmod(0o700)
+    assert done.returncode == 1
+    assert done.stderr.count("its mode must be 0700") == 1
+
+
+def test_writes_the_log_to_a_file_with_any_name(device, tmp_path):
+    file = tmp_path / "a\tb c"
+    device.output("log", "-t", "life", "text")
+    device.output("adb", "logcat", "-d", "-v", "raw", "-s", "-f", str(file), "life")
+    assert file.read_text() == "text\n"
