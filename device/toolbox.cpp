@@ -17,6 +17,7 @@
 #include "logcat.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
+#include "platform/libc/properties.h"
 #include "platform/log_file.h"
 
 namespace {
@@ -32,7 +33,8 @@ int Fail(const char* what) {
 std::string WholeProperty(const std::string& name) {
     const std::string value = device::GetProperty(name.c_str());
     const bool isCut = value.length() == PROP_VALUE_MAX - 1;
-    return isCut ? device::ReadText(std::string(host::kPropertiesDirectory) + "/" + name, "") : value;
+    return isCut ? device::ReadText(std::string(host::kPropertiesDirectory) + "/" + name, "")
+                 : value;
 }
 
 int Getprop(int argc, char** argv) {
@@ -56,9 +58,10 @@ int Setprop(int /* argc */, char** argv) {
         __system_property_set(name, value.c_str()) == 0) {
         return 0;
     }
-    const char* const brokenRule = host::BrokenPropertyRule(name, value);
-    fprintf(stderr, "Failed to set property '%s' to '%s'.%s%s\n", name, value.c_str(),
-            brokenRule != nullptr ? " " : "", brokenRule != nullptr ? brokenRule : "");
+    fprintf(stderr, "Failed to set property '%s' to '%s'.\n", name, value.c_str());
+    if (const char* const rule = host::BrokenPropertyRule(name, value); rule != nullptr) {
+        fprintf(stderr, "%s\n", rule);
+    }
     return 1;
 }
 

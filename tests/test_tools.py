@@ -8,6 +8,10 @@ import pytest
 from virtual_device import PASS, PERMISSIVE, SOURCE, wait_until
 
 
+def shell(device, command, **options):
+    return device.run("adb", "shell", command, **options).stdout
+
+
 def test_takes_any_legal_name_for_a_property(device):
     device.setprop("-e", "value")
     assert device.getprop("-e") == "value"
@@ -41,6 +45,21 @@ def test_prints_what_passes_the_filter(device):
     logged = device.output("logcat", "-d", "-s", "-v", "brief", "tpd:E")
     texts = re.findall(r"^E/tpd *\( *\d+\): (.*)\n", logged, re.M)
     assert texts == ["enter", "ThpGetBinder ret = 0"]
+
+
+@pytest.mark.parametrize(
+    "name, value, rule",
+    [(".a", "1", "name"), ("a", "x" * 92, "91 bytes"), ("a", b"\xff", "UTF-8")],
+)
+def test_says_which_rule_a_property_breaks(device, name, value, rule):
+    assert rule in device.run("setprop", name, value).stderr
+
+
+def test_reboots_from_the_shell(device):
+    shell(device, "setenforce 0; setprop persist.a 1; setprop a 1")
+    assert shell(device, "reboot; getenforce; getprop a") == "Enforcing\n\n"
+    assert device.getprop("persist.a") == "1"
+    assert device.is_up()
 
 
 def test_follows_the_log(device):
@@ -106,10 +125,10 @@ def test_selects_from_the_log(device, options):
     assert logged == LOG_SELECTIONS[options]
 
 
-def test_refuses_a_fifo_as_the_log(stopped_device):
-    stopped_device.root.mkdir(mode=0o700)
-    os.mkfifo(stopped_device.root / "log")
-    assert stopped_device.run("logcat", "-d").returncode == 1
+def test_refuses_a_fifo_as_the_log(device):
+    (device.root / "log").unlink()
+    os.mkfifo(device.root / "log")
+    assert device.run("logcat", "-d").returncode == 1
 
 
 USAGE_ERRORS = [
@@ -131,10 +150,6 @@ def test_refuses_wrong_arguments(device, command):
     assert done.returncode in (1, 2)
     assert done.stdout == ""
     assert done.stderr != ""
-
-
-def shell(device, command, **options):
-    return device.run("adb", "shell", command, **options).stdout
 
 
 def test_refuses_the_shell_of_a_stopped_device(stopped_device):

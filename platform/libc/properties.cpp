@@ -12,6 +12,7 @@
 
 #include "platform/device_root.h"
 #include "platform/files.h"
+#include "platform/libc/properties.h"
 #include "platform/trace.h"
 
 namespace {
@@ -74,8 +75,7 @@ int Get(const std::string& name, char* value) {
 }
 
 bool Set(const std::string& name, const std::string& value) {
-    const bool isTooLong = value.length() >= PROP_VALUE_MAX && !IsReadOnlyKey(name);
-    if (host::DeviceRoot() < 0 || !IsLegalName(name) || isTooLong || !IsUtf8(value)) {
+    if (host::DeviceRoot() < 0 || host::BrokenPropertyRule(name, value) != nullptr) {
         return false;
     }
     const int properties = host::PropertiesDirectory();
@@ -84,6 +84,16 @@ bool Set(const std::string& name, const std::string& value) {
 }
 
 }  // namespace
+
+const char* host::BrokenPropertyRule(const std::string& name, const std::string& value) {
+    if (!IsLegalName(name)) {
+        return "The name is illegal.";
+    }
+    if (value.length() >= PROP_VALUE_MAX && !IsReadOnlyKey(name)) {
+        return "The value is longer than 91 bytes.";
+    }
+    return IsUtf8(value) ? nullptr : "The value is not UTF-8.";
+}
 
 int __system_property_get(const char* name, char* value) {
     host::TraceEvent event("property_read");
