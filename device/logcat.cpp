@@ -55,14 +55,9 @@ struct Options {
 // Adds a filter TAG[:PRIORITY]. False when it is invalid.
 bool AddFilter(const std::string& filter, Options& options) {
     const size_t colon = filter.rfind(':');
-    const std::string letter = colon == std::string::npos ? "V" : filter.substr(colon + 1);
-    for (int priority = ANDROID_LOG_VERBOSE; priority <= ANDROID_LOG_SILENT; ++priority) {
-        if (letter.length() == 1 && toupper(letter[0]) == host::LogPriorityLetter(priority)) {
-            options.filters[filter.substr(0, colon)] = priority;
-            return colon != 0;
-        }
-    }
-    return false;
+    const int priority = PriorityOf(colon == std::string::npos ? "V" : filter.substr(colon + 1));
+    options.filters[filter.substr(0, colon)] = priority;
+    return priority >= 0 && colon != 0;
 }
 
 // Whether a device has all these buffers. One log serves them.
@@ -177,15 +172,14 @@ class LogReader {
         struct stat status = {};
         fstat(mLog.get(), &status);
         const size_t size = entry.header.size;
-        std::string bytes;
         if (size < 3 || status.st_size - body < static_cast<off_t>(size)) {
             return false;
         }
-        bytes.resize(size);
+        std::string bytes(size, '\0');
         if (pread(mLog.get(), bytes.data(), size, body) != static_cast<ssize_t>(size)) {
             return false;
         }
-        entry.priority = bytes[0];
+        entry.priority = static_cast<unsigned char>(bytes[0]);
         entry.tag = bytes.c_str() + 1;
         entry.text = bytes.c_str() + std::min(size - 1, entry.tag.length() + 2);
         mNext = body + static_cast<off_t>(size);
@@ -256,6 +250,15 @@ int Fail(const char* what) {
 }
 
 }  // namespace
+
+int PriorityOf(const std::string& letter) {
+    for (int priority = ANDROID_LOG_VERBOSE; priority <= ANDROID_LOG_SILENT; ++priority) {
+        if (letter.length() == 1 && toupper(letter[0]) == host::LogPriorityLetter(priority)) {
+            return priority;
+        }
+    }
+    return -1;
+}
 
 int Logcat(int argc, char** argv) {
     Options options;

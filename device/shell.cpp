@@ -32,7 +32,7 @@ int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
 
 // The directory of the device's commands. Empty, after a message, when PATH cannot contain it.
 std::string CommandDirectory() {
-    const std::string bin = PathBesideProgram("bin");
+    std::string bin = PathBesideProgram("bin");
     if (bin.find(':') != std::string::npos) {
         Fail("'" + bin + "' cannot be in PATH because of its ':'; use another build directory");
         return "";

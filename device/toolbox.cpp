@@ -6,7 +6,6 @@
 #include <sys/system_properties.h>
 #include <unistd.h>
 
-#include <cctype>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
@@ -18,7 +17,6 @@
 #include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/libc/properties.h"
-#include "platform/log_file.h"
 
 namespace {
 
@@ -119,16 +117,6 @@ int Settings(int argc, char** argv) {
     return kUsageError;
 }
 
-// The priority with this letter, or -1.
-int PriorityOf(const char* letter) {
-    for (int priority = ANDROID_LOG_VERBOSE; priority <= ANDROID_LOG_SILENT; ++priority) {
-        if (toupper(letter[0]) == host::LogPriorityLetter(priority) && letter[1] == '\0') {
-            return priority;
-        }
-    }
-    return -1;
-}
-
 int Log(int argc, char** argv) {
     int priority = ANDROID_LOG_INFO;
     const char* tag = "log";
@@ -136,7 +124,7 @@ int Log(int argc, char** argv) {
     for (int name = 0; (name = getopt(argc, argv, "+p:t:")) != -1;) {
         switch (name) {
             case 'p':
-                priority = PriorityOf(optarg);
+                priority = device::PriorityOf(optarg);
                 valid = valid && priority >= 0;
                 break;
             case 't':
