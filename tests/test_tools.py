@@ -138,7 +138,6 @@ USAGE_ERRORS = [
     "setprop a",
     "adb push a b",
     "device answer captest",
-=======
     "adb -s other shell true",
     "adb -d shell true",
 ]
