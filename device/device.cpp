@@ -281,9 +281,7 @@ int Root(int, char**) {
     return 0;
 }
 
-int Shell(int argc, char** argv) {
-    return ExpectRunning() ? device::Shell(argc, argv) : 1;
-}
+int Shell(int argc, char** argv) { return ExpectRunning() ? device::Shell(argc, argv) : 1; }
 
 int ExecSibling(const char* name, std::vector<const char*> arguments) {
     arguments.insert(arguments.begin(), name);

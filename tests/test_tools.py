@@ -166,12 +166,7 @@ def test_serves_adb_shell(device):
 
 def test_finds_the_listed_commands_and_no_others(device):
     lines = (SOURCE / "device/commands").read_text().splitlines()
-    listed = {
-        name
-        for line in lines
-        if not line.startswith("#")
-        for name in line.split()[1:]
-    }
+    listed = {name for line in lines if not line.startswith("#") for name in line.split()[1:]}
     found = shell(device, 'IFS=:; for d in $PATH; do ls "$d"; done')
     assert set(found.split()) == listed
     for name in ["mount", "python3", "top", "toybox"]:
