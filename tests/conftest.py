@@ -1,10 +1,12 @@
 """Fixtures: a virtual device, running or stopped
 
 TPD_BUILD_DIR names the build under test. TPD_COMMAND names another tool to drive on its device,
-for example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK selects the long forms, too.
+for example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK selects the long forms, too. TPD_SEED
+repeats the choices of a random test, which prints its seed.
 """
 import os
 import pathlib
+import random
 import shlex
 import tempfile
 
@@ -24,6 +26,14 @@ def build():
 
 
 @pytest.fixture
+def chance():
+    """The random choices of a test; the output of one that fails tells the seed"""
+    seed = int(os.environ.get("TPD_SEED", random.randrange(1 << 32)))
+    print(f"TPD_SEED={seed}")
+    return random.Random(seed)
+
+
+@pytest.fixture
 def stopped_device(build):
     """A device that was never started and has no root yet. Nothing is left behind."""
     tool = shlex.split(os.environ.get("TPD_COMMAND", f"{build}/tpd"))
@@ -36,7 +46,7 @@ def stopped_device(build):
 
 @pytest.fixture
 def device(stopped_device):
-    """A running device that is watched and lets commands through."""
+    """A running device, with tracing on, that forwards commands."""
     stopped_device.watch()
     stopped_device.start()
     stopped_device.setprop(PERMISSIVE, "true")

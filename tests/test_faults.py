@@ -148,6 +148,17 @@ def test_sends_the_command_whatever_its_output(device, redirection):
     script = f'exec {redirection}; "$@"'
     device.output("bash", "-c", script, "bash", *device.tool, "captest")
     assert len(device.events("command")) == 1
+    assert not (device.root / "log").read_bytes().endswith(PASS.encode())
+
+
+def test_daemon_survives_a_client_that_goes_away(device):
+    device.output("device", "fault", "hang", "200")
+    with subprocess.Popen([*device.tool, "captest"], env=device.env) as tool:
+        wait_until(lambda: device.events("fault"))
+        tool.kill()
+    wait_until(lambda: device.events("answer"))
+    assert device.tpd("captest") == PASS
+    assert device.restarts() == 0
 
 
 def test_takes_a_pipe_for_no_log(device):

@@ -2,13 +2,11 @@
 import concurrent.futures
 import fcntl
 import os
-import random
 import shutil
-import subprocess
 
 import pytest
 
-from virtual_device import LIMIT_S, PASS, wait_until
+from virtual_device import PASS, wait_until
 
 
 @pytest.fixture
@@ -24,21 +22,10 @@ def in_parallel(device, commands):
         return list(pool.map(lambda run: device.run(*run), runs))
 
 
-def test_stops_no_stranger(device):
-    device.start()
-    device.output("device", "stop")
-    with subprocess.Popen(["sleep", str(LIMIT_S)]) as stranger:
-        (device.root / "init.lock").write_text(f"{stranger.pid}\n")
-        asked = in_parallel(device, ["status", "stop"] * 8)
-        assert {done.stdout for done in asked} == {"stopped\n", ""}
-        assert stranger.poll() is None
-        stranger.kill()
-
-
 @pytest.mark.parametrize("repeats", [3, pytest.param(100, marks=pytest.mark.soak)])
-def test_is_one_device_or_none_whatever_is_asked(device, repeats):
+def test_is_one_device_or_none_whatever_is_asked(device, chance, repeats):
     for _ in range(repeats):
-        in_parallel(device, random.choices(["start", "stop", "status"], k=20))
+        in_parallel(device, chance.choices(["start", "stop", "status"], k=20))
         assert len(device.processes("/init")) <= 1
     device.start()
     assert device.is_up()
@@ -114,6 +101,24 @@ def test_says_what_it_cannot_find_out(device):
         asked = in_parallel(device, ["status", "start", "stop", "run x", "fault none"])
     assert [done.returncode for done in asked] == [4, 1, 1, 1, 1]
     assert all("which is not init" in done.stderr for done in asked)
+
+
+def test_has_one_init(device, build):
+    device.start()
+    second = device.run(build / "device/init", "Permissive")
+    assert second.returncode == 1
+    assert "init.lock" in second.stderr
+    assert len(device.processes("/init")) == 1
+
+
+def test_restarts_a_device_of_another_build(device, build, tmp_path):
+    shutil.copytree(build / "device", tmp_path / "device", symlinks=True)
+    device.output(tmp_path / "device/device", "start")
+    (old,) = device.processes("/init")
+    device.start()
+    (new,) = device.processes("/init")
+    assert new != old
+    assert device.is_up()
 
 
 def test_says_once_that_the_daemon_cannot_live(device):

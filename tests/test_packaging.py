@@ -78,7 +78,7 @@ def fenced(text):
     return re.search(r"^```\w*\n(.*?)^```", text, re.S | re.M)[1]
 
 
-def is_at_rest(device):
+def is_idle(device):
     is_enabled = device.getprop("odm.thp.service_enable") == "1"
     return device.is_up() == is_enabled or not device.processes("/init")
 
@@ -93,13 +93,14 @@ def test_replays_the_session_of_the_readme(stopped_device):
         command, _, expected = step.partition("\n")
         stdout = run_in_source(stopped_device, command)
         assert stdout.rstrip("\n") == expected.rstrip("\n"), command
-        wait_until(lambda: is_at_rest(stopped_device))
+        wait_until(lambda: is_idle(stopped_device))
 
 
 def test_runs_the_ci_example(stopped_device):
     page = source("docs/automation.md")
     example = page.partition("<!-- ci-example -->\n")[2]
-    run_in_source(stopped_device, fenced(example))
+    done = stopped_device.run("bash", "-xc", fenced(example), cwd=SOURCE)
+    assert done.returncode == 0, done.stderr
 
 
 def test_client_passes_any_argument_unchanged(device):

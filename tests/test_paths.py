@@ -35,6 +35,14 @@ def test_forwards_in_upgrade_mode(device):
     assert device.tpd("captest") == PASS
 
 
+def test_follows_no_link_to_a_kernel_command_line(device, tmp_path):
+    device.setprop(PERMISSIVE, "null")
+    (tmp_path / "cmdline").write_text("enter_recovery=1\n")
+    (device.root / "proc").mkdir()
+    (device.root / "proc/cmdline").symlink_to(tmp_path / "cmdline")
+    assert device.tpd("captest").startswith("please exe 'adb shell setenforce 0'")
+
+
 def test_reports_a_firmware_update(device):
     device.setprop("sim.updating_fw", "true")
     wait_until(lambda: device.getprop("odm.thp.is_updating_fw") == "true")
@@ -44,5 +52,6 @@ def test_reports_a_firmware_update(device):
 
 def test_restarts_a_daemon_without_a_service(device):
     (device.root / SERVICE).unlink()
-    assert device.tpd("captest") == NO_SERVICE
+    answer = device.tpd("captest", env=device.env | {"TPD_GET_SERVICE_MS": "300"})
+    assert answer == NO_SERVICE
     assert device.written() == RESTART

@@ -33,6 +33,10 @@ def test_shows_a_long_property_whole_and_a_default(device):
     assert device.output("getprop", "unset", "default") == "default\n"
 
 
+def test_shows_a_missing_setting_as_null(device):
+    assert device.output("settings", "get", "system", "missing") == "null\n"
+
+
 @pytest.mark.parametrize("key", ["system/../.. selinux", "system ../../selinux"])
 def test_keeps_settings_in_their_directory(device, key):
     device.run("settings", "put", *key.split(), "Permissive")

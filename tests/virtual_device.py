@@ -39,7 +39,6 @@ class Device:
             "PATH": ":".join([*programs, os.environ["PATH"]]),
             "TPD_BUILD_DIR": str(build),
             "TPD_DEVICE_ROOT": str(self.root),
-            "TPD_GET_SERVICE_MS": "300",
         }
 
     def run(self, *command, **options):
