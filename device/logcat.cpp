@@ -16,6 +16,7 @@
 #include <cstring>
 #include <deque>
 #include <map>
+#include <memory>
 #include <optional>
 #include <set>
 #include <sstream>
@@ -40,6 +41,13 @@ struct LogEntry {
     std::string text;
 };
 
+struct FreePattern {
+    void operator()(regex_t* pattern) const {
+        regfree(pattern);
+        delete pattern;
+    }
+};
+
 struct Options {
     bool follow = true;
     bool clear = false;
@@ -47,7 +55,7 @@ struct Options {
     const char* file = nullptr;
     std::string format = "threadtime";
     std::optional<int64_t> pid;
-    std::optional<regex_t> pattern;  // is never freed: the process exits soon
+    std::unique_ptr<regex_t, FreePattern> pattern;
     // The lowest priority that is shown of a tag.
     std::map<std::string, int> filters = {{kOtherTags, ANDROID_LOG_VERBOSE}};
 };
@@ -97,8 +105,8 @@ bool ParseOptions(int argc, char** argv, Options& options) {
                 options.follow = false;
                 break;
             case 'e':
-                options.pattern.emplace();
-                valid = regcomp(&*options.pattern, optarg, REG_EXTENDED | REG_NOSUB) == 0;
+                options.pattern.reset(new regex_t());
+                valid = regcomp(options.pattern.get(), optarg, REG_EXTENDED | REG_NOSUB) == 0;
                 break;
             case 'f':
                 options.file = optarg;
@@ -136,7 +144,8 @@ bool IsShown(const LogEntry& entry, const Options& options) {
     const bool passesFilter = entry.priority >= lowest && lowest != ANDROID_LOG_SILENT;
     const bool isOfProcess = !options.pid || *options.pid == entry.header.pid;
     return passesFilter && isOfProcess &&
-           (!options.pattern || regexec(&*options.pattern, entry.text.c_str(), 0, nullptr, 0) == 0);
+           (!options.pattern ||
+            regexec(options.pattern.get(), entry.text.c_str(), 0, nullptr, 0) == 0);
 }
 
 class LogReader {
