@@ -8,7 +8,7 @@
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size);
 
-// Stops the run and keeps the input when the condition is false.
+// Aborts the run and keeps the input when the condition is false.
 inline void Check(bool condition) {
     if (!condition) {
         abort();

@@ -1,5 +1,5 @@
 // The tool with any arguments, on any device. The bits of the input's first two bytes choose the
-// state of the device; the arguments follow, each with a terminating zero. The last one is also
+// state of the device; the arguments follow as zero-terminated strings. The last one is also
 // the kernel command line, getenforce's output and the daemon's answer.
 #include <algorithm>
 #include <bitset>

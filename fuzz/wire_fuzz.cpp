@@ -1,4 +1,4 @@
-// A published service and a client's proxy, each with a peer that sends the input and hangs up.
+// Tests a published service and a client's proxy. Their peer sends the input and hangs up.
 #include <binder/Parcel.h>
 #include <sys/socket.h>
 #include <sys/time.h>
@@ -31,14 +31,14 @@ struct Recipient : IBinder::DeathRecipient {
     int deaths = 0;
 };
 
-// The device root of this process.
+// This process's device root.
 const struct TemporaryRoot {
     TemporaryRoot() { setenv("TPD_DEVICE_ROOT", mkdtemp(path), 1); }
     ~TemporaryRoot() { std::filesystem::remove_all(path); }
     char path[32] = "/tmp/tpd-fuzz-XXXXXX";
 } kRoot;
 
-// A socket's buffer takes every input that scripts/fuzz makes.
+// Every input from scripts/fuzz fits into a socket's buffer.
 void SendAndHangUp(int socket, const uint8_t* data, size_t size) {
     Check(send(socket, data, size, MSG_NOSIGNAL) == static_cast<ssize_t>(size));
     shutdown(socket, SHUT_WR);
@@ -57,7 +57,7 @@ void CallService(const uint8_t* data, size_t size) {
     }
     close(peer);
 
-    // The next client is served.
+    // The service still accepts clients.
     const sp<IBinder> proxy = host::ConnectService("/driver", "echo");
     Parcel request, reply;
     request.writeInt32(4);
@@ -71,8 +71,7 @@ void AnswerProxy(const uint8_t* data, size_t size) {
     int ends[2];
     Check(socketpair(AF_UNIX, SOCK_STREAM, 0, ends) == 0);
     SendAndHangUp(ends[1], data, size);
-    // A few hundred requests fill the buffer of the peer, which never reads. Then it counts as
-    // gone.
+    // The peer never reads. A few hundred requests fill its buffer; then it counts as dead.
     const timeval shortest = {0, 1};
     Check(setsockopt(ends[0], SOL_SOCKET, SO_SNDTIMEO, &shortest, sizeof(shortest)) == 0);
 

@@ -26,7 +26,7 @@ std::string Utf16(const std::u16string& text) {
     return Padded({reinterpret_cast<const char*>(text.c_str()), bytes});
 }
 
-TEST_F(BinderTest, WritesTheRequestAsTheDaemonReadsIt) {
+TEST_F(BinderTest, WritesTheRequestInTheDaemonsFormat) {
     RunCmdParms("[TPD]TSA_ExecuteCommand", "captest");
     const std::string strictMode = Int32(INT32_MIN), workSource = Int32(-1);
     const std::string descriptor =
@@ -57,7 +57,7 @@ TEST_F(BinderTest, SendsMarkedCommandsTwoWayAndNamedOnesOneWay) {
     EXPECT_EQ(device.calls({kLog}).back(), UntaggedLog(ERROR, "Async"));
 }
 
-TEST_F(BinderTest, SendsTheseNamesOneWay) {
+TEST_F(BinderTest, SendsListedNamesOneWay) {
     EXPECT_THAT(g_asyncCmds, ElementsAre("aftouch"));
     EXPECT_THAT(
             g_asyncThpCmds,
@@ -80,7 +80,7 @@ TEST_F(BinderTest, SendsTheseNamesOneWay) {
                         "THP_SetVolumeGUIInfo", "THP_SetXCoreArea", "THP_UpdateViewsLocation"));
 }
 
-TEST_F(BinderTest, LooksTheServiceUpOnce) {
+TEST_F(BinderTest, LooksUpTheServiceOnce) {
     RunCmdParms("[TPD]a", "");
     RunCmdParms("[TPD]b", "");
     EXPECT_THAT(
@@ -90,12 +90,12 @@ TEST_F(BinderTest, LooksTheServiceUpOnce) {
     EXPECT_EQ(android::ProcessState::self()->getDriverName(), "/dev/vndbinder");
 }
 
-TEST_F(BinderTest, TakesAReplyWithoutATextForEmpty) {
+TEST_F(BinderTest, TreatsAReplyWithoutTextAsEmpty) {
     device.answers = {{android::OK, nullptr}};
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), "");
 }
 
-TEST_F(BinderTest, TriesAFailedCallOnceMoreOnAFreshLookup) {
+TEST_F(BinderTest, RetriesAFailedCallOnceAfterANewLookup) {
     device.lookups = {true, false, true};
     device.answers = {{DEAD_OBJECT}};
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), "answer");
@@ -119,7 +119,7 @@ TEST_F(BinderTest, RestartsTheDaemonAfterTwoFailedCalls) {
                             TransactOneWay("aftouch"), UnlinkToDeath(1), kStop, kStart));
 }
 
-TEST_F(BinderTest, RestartsTheDaemonWhoseServiceIsMissing) {
+TEST_F(BinderTest, RestartsTheDaemonWhenItsServiceIsMissing) {
     device.lookups = {false, false};
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
     const std::string write = "retry:1, odm.thp.service_enable, ";
@@ -130,7 +130,7 @@ TEST_F(BinderTest, RestartsTheDaemonWhoseServiceIsMissing) {
                             UntaggedLog(ERROR, write + "[new]1, [old]0")));
 }
 
-TEST_F(BinderTest, TakesAMissingServiceManagerForAMissingService) {
+TEST_F(BinderTest, TreatsAMissingServiceManagerAsAMissingService) {
     android::setDefaultServiceManager(nullptr);
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), kServiceMissing);
     EXPECT_EQ(device.calls({kLog})[1],

@@ -3,7 +3,7 @@
 
 #include <cerrno>
 
-TEST(BoundedLibcTest, MemsetWritesNothingWhenTheCountIsBeyondTheBuffer) {
+TEST(BoundedLibcTest, MemsetWritesNothingWhenTheCountExceedsTheBuffer) {
     char buffer[] = "abc";
     EXPECT_EQ(memset_s(buffer, 2, 'x', 3), ERANGE);
     EXPECT_STREQ(buffer, "abc");
@@ -33,7 +33,7 @@ static int Format(char* dest, size_t destMax, size_t count, const char* format, 
     return length;
 }
 
-TEST(BoundedLibcTest, VsnprintfCutsAResultThatIsTooLong) {
+TEST(BoundedLibcTest, VsnprintfTruncatesLongResults) {
     char buffer[] = "before";
     EXPECT_EQ(Format(buffer, 4, 4, "%d", 1), -1);
     EXPECT_STREQ(buffer, "before");

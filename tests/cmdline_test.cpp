@@ -6,7 +6,7 @@
 
 namespace test {
 
-TEST(SplitTest, KeepsWhatIsBetweenWholeDelimiters) {
+TEST(SplitTest, SplitsOnlyAtWholeDelimiters) {
     EXPECT_THAT(Split("  a b  c ", " "), ElementsAre("a", "b", "c"));
     EXPECT_THAT(Split("a<>b<c>d", "<>"), ElementsAre("a", "b<c>d"));
     EXPECT_THAT(Split("", ""), ElementsAre(""));
@@ -21,7 +21,7 @@ TEST(StringPairParserTest, KeepsTheFirstValueOfAKey) {
     EXPECT_THAT(std::vector({a, b, c}), ElementsAre("1", "3", " 5"));
 }
 
-TEST(StringPairParserTest, IgnoresWhatIsNoPair) {
+TEST(StringPairParserTest, IgnoresFieldsThatAreNotPairs) {
     StringPairParser pairs;
     pairs.Init("flag quiet= =value x=y=z", " ", "=");
     std::string value = "before";
@@ -62,7 +62,7 @@ TEST(StringPairParserTest, ReadsNumbersWithinTheRangeOfInt) {
 
 using CmdLineTest = DeviceTest;
 
-TEST_F(CmdLineTest, ReportsHowTheDeviceWasBooted) {
+TEST_F(CmdLineTest, ReportsTheBootMode) {
     const struct {
         const char* line;
         bool upgradeMode;

@@ -27,7 +27,7 @@ def build():
 
 @pytest.fixture
 def chance():
-    """The random choices of a test; the output of one that fails tells the seed"""
+    """A test's random choices. A failing test prints the seed."""
     seed = int(os.environ.get("TPD_SEED", random.randrange(1 << 32)))
     print(f"TPD_SEED={seed}")
     return random.Random(seed)
@@ -35,10 +35,10 @@ def chance():
 
 @pytest.fixture
 def stopped_device(build):
-    """A device that was never started and has no root yet. Nothing is left behind."""
+    """A device that was never started and has no root yet. Removed after the test."""
     tool = shlex.split(os.environ.get("TPD_COMMAND", f"{build}/tpd"))
-    with tempfile.TemporaryDirectory(prefix="tpd-") as folder:
-        device = Device(pathlib.Path(folder), build, tool)
+    with tempfile.TemporaryDirectory(prefix="tpd-") as directory:
+        device = Device(pathlib.Path(directory), build, tool)
         yield device
         device.output("device", "stop")
         wait_until(lambda: not device.processes())
@@ -47,7 +47,7 @@ def stopped_device(build):
 @pytest.fixture
 def device(stopped_device):
     """A running device, with tracing on, that forwards commands."""
-    stopped_device.watch()
+    stopped_device.start_tracing()
     stopped_device.start()
     stopped_device.setprop(PERMISSIVE, "true")
     return stopped_device

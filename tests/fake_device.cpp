@@ -139,7 +139,7 @@ static FILE* OpenString(std::optional<std::string>& content, const char* mode) {
     return stream;
 }
 
-// No test reaches a device on disk.
+// Unit tests must not use a device on disk.
 int host::DeviceRoot() { return -1; }
 
 int __system_property_get(const char* name, char* value) {

@@ -1,5 +1,5 @@
 // A device in memory. It implements the calls that the tool makes to the platform and to the C
-// library, and records each of them.
+// library, and records them.
 #pragma once
 
 #include <android/log.h>
@@ -17,7 +17,7 @@
 
 namespace test {
 
-// A recorded call: the function and its arguments. The functions below make those that a test
+// A recorded call: the function and its arguments. The functions below make the calls that a test
 // expects.
 using Call = std::pair<std::string, std::string>;
 
@@ -46,12 +46,12 @@ inline Call Pause(std::chrono::microseconds time) {
 }
 inline Call Shell(const std::string& command) { return {kShell, command}; }
 
-// The daemon's service is numbered by the lookups that found it.
+// A service is numbered by the lookup that found it.
 inline Call GetService() { return {kGetService, "service.corvaneinterfaceservice"}; }
 inline Call LinkToDeath(int service) { return {kLinkToDeath, std::to_string(service)}; }
 inline Call UnlinkToDeath(int service) { return {kUnlinkToDeath, std::to_string(service)}; }
 
-// `request` is the command; when parameters are sent, a comma, a space and they follow.
+// `request` is "COMMAND" or "COMMAND, PARAMETERS".
 inline Call Transact(const std::string& request) { return {kTransact, request}; }
 inline Call TransactOneWay(const std::string& request) { return {kTransactOneWay, request}; }
 
@@ -61,7 +61,7 @@ struct Answer {
     const char* text = "answer";  // null: the reply has no text
 };
 
-// A device whose daemon is alive, and the tool's process as it is before main. One at a time.
+// A device with a living daemon, and the tool's process state before main. One instance at a time.
 class FakeDevice {
   public:
     FakeDevice();
@@ -74,13 +74,13 @@ class FakeDevice {
             {"odm.thp.is_updating_fw", "false"},
     };
     std::set<std::string> rejectedWrites;               // writes to these properties are rejected
-    std::optional<std::string> kernelCommandLine = "";  // none: it cannot be opened
-    std::optional<std::string> getenforce = "Enforcing\n";  // its output; none: it cannot be run
+    std::optional<std::string> kernelCommandLine = "";  // nullopt: cannot be opened
+    std::optional<std::string> getenforce = "Enforcing\n";  // its output; nullopt: cannot be run
     int getenforceStatus = 0;                               // what closing its output returns
-    int failingAllocation = 0;  // of those that may fail, counted from 1
-    std::deque<bool> lookups;   // whether each finds the service; all later ones do
-    // To the calls, in order; all later ones get the default. With DEAD_OBJECT the service's death
-    // recipient is told first.
+    int failingAllocation = 0;  // the nothrow allocation that fails, counted from 1
+    std::deque<bool> lookups;   // whether they find the service; later ones do
+    // The answers to the first calls; later calls get the default. DEAD_OBJECT first notifies the
+    // service's death recipient.
     std::deque<Answer> answers;
     // The property that changes during a call, and its new value.
     std::map<Call, std::pair<std::string, std::string>> changes;
@@ -90,7 +90,7 @@ class FakeDevice {
     std::string request;          // the bytes of the last call's parcel
     std::set<FILE*> openStreams;  // of the kernel command line and of getenforce
 
-    // For the functions that end here.
+    // For the redirected functions.
     void Record(const Call& call);
     int servicesFound = 0;
 

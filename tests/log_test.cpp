@@ -6,7 +6,7 @@ namespace test {
 
 using LogTest = DeviceTest;
 
-// Writes debug lines, too, and keeps messages in memory.
+// Also writes debug lines and keeps messages in memory.
 class DebugLog : public LogBase {
   public:
     DebugLog() : LogBase("debug") {}
@@ -23,7 +23,7 @@ TEST_F(LogTest, WritesLevelsUpToItsThreshold) {
                                             Log(INFO, "f[3] text")));
 }
 
-TEST_F(LogTest, WritesDebugLinesWithThePriorityOfInformation) {
+TEST_F(LogTest, WritesDebugLinesWithInfoPriority) {
     DebugLog().Printf(LOG_DEBUG, "f", 1, "%d", 7);
     EXPECT_THAT(device.calls(), ElementsAre(Log(INFO, "f[1] 7")));
 }
@@ -38,7 +38,7 @@ TEST_F(LogTest, WritesAnEmptyMessage) {
     EXPECT_THAT(device.calls(), ElementsAre(Log(INFO, "f[1] ")));
 }
 
-TEST_F(LogTest, SaysThatAMessageIsTooLong) {
+TEST_F(LogTest, ReportsAMessageThatIsTooLong) {
     const std::string longest(2047, 'x');
     gSysLog.Printf(LOG_INFO, "f", 1, "%s", longest.c_str());
     gSysLog.Printf(LOG_INFO, "f", 2, "%sy", longest.c_str());
@@ -46,7 +46,7 @@ TEST_F(LogTest, SaysThatAMessageIsTooLong) {
                                             Log(INFO, "f[2] " + longest)));
 }
 
-TEST_F(LogTest, KeepsOnlyWhatIsAppended) {
+TEST_F(LogTest, KeepsOnlyAppendedMessages) {
     DebugLog log;
     log.Printf(LOG_ERROR, "f", 1, "written");
     EXPECT_EQ(log.GetLog(), "");

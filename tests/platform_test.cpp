@@ -1,4 +1,4 @@
-// The host implementation of the platform, over a device root of this process's own.
+// The host implementation of the platform, on this process's own device root.
 #include <android/log.h>
 #include <binder/Parcel.h>
 #include <gmock/gmock.h>
@@ -26,32 +26,32 @@ using android::wp;
 
 constexpr char kDriver[] = "/dev/vndbinder";
 
-// Tests in one process share it; each uses names of its own.
+// Shared by all tests of a process; every test uses its own names.
 const struct TemporaryRoot {
     TemporaryRoot() { setenv("TPD_DEVICE_ROOT", mkdtemp(path.data()), 1); }
     ~TemporaryRoot() { std::filesystem::remove_all(path); }
     std::string path = testing::TempDir() + "tpd-XXXXXX";
 } kRoot;
 
-// Ends a child of the test with 0 when this root is refused.
+// Exits with 0 when this root is refused; for a death test's child process.
 void ExpectRefusal(const std::string& root) {
     setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
     _exit(host::DeviceRoot() == -1 ? 0 : 1);
 }
 
-TEST(DeviceRootDeathTest, RefusesFoldersThatAreNotThisUsersAlone) {
-    const std::string folder = kRoot.path + "/folder";
+TEST(DeviceRootDeathTest, RefusesDirectoriesThatAreNotPrivate) {
+    const std::string directory = kRoot.path + "/directory";
     const std::string link = kRoot.path + "/link";
-    std::filesystem::create_directory(folder);
-    chmod(folder.c_str(), 0750);
+    std::filesystem::create_directory(directory);
+    chmod(directory.c_str(), 0750);
     std::filesystem::create_symlink(kRoot.path, link);
     const auto refused = testing::ExitedWithCode(0);
-    EXPECT_EXIT(ExpectRefusal(folder), refused, "is open to other users; its mode must be 0700");
+    EXPECT_EXIT(ExpectRefusal(directory), refused, "is open to other users; its mode must be 0700");
     EXPECT_EXIT(ExpectRefusal(link + "/"), refused, "link: Not a directory");
     EXPECT_EXIT(ExpectRefusal("relative"), refused, "absolute");
 }
 
-TEST(DeviceRootDeathTest, IsADirectoryThatWasEmptyOnce) {
+TEST(DeviceRootDeathTest, RefusesUnmarkedDirectoriesWithFiles) {
     const std::string root = kRoot.path + "/other";
     std::filesystem::create_directory(root);
     chmod(root.c_str(), 0700);
@@ -62,7 +62,7 @@ TEST(DeviceRootDeathTest, IsADirectoryThatWasEmptyOnce) {
     EXPECT_EXIT(ExpectRefusal(root), testing::ExitedWithCode(1), "");
 }
 
-TEST(FilesTest, FollowNoLinkAtAnyDepth) {
+TEST(FilesTest, RefusesLinksAtAnyDepth) {
     const std::string outside = kRoot.path + "-outside";
     std::filesystem::create_directory(outside);
     EXPECT_TRUE(host::OpenDirectory("links", host::IfMissing::kMake).ok());
@@ -76,14 +76,14 @@ bool SetProperty(const std::string& name, const std::string& value) {
     return __system_property_set(name.c_str(), value.c_str()) == 0;
 }
 
-TEST(PropertiesTest, HaveLegalNames) {
+TEST(PropertiesTest, RejectsInvalidNames) {
     for (const char* name : {"", ".a", "a.", "a..b", "a/b", "a b", "a=b"}) {
         EXPECT_FALSE(SetProperty(name, "1")) << name;
     }
     EXPECT_TRUE(SetProperty("a.B_9@:-", "1"));
 }
 
-TEST(PropertiesTest, HoldAtMost91Bytes) {
+TEST(PropertiesTest, AcceptsValuesUpTo91Bytes) {
     const std::string longest(91, 'v');
     EXPECT_TRUE(SetProperty("limited", longest));
     EXPECT_FALSE(SetProperty("limited", longest + "v"));
@@ -92,14 +92,14 @@ TEST(PropertiesTest, HoldAtMost91Bytes) {
     EXPECT_EQ(value, longest);
 }
 
-TEST(PropertiesTest, HoldUtf8) {
+TEST(PropertiesTest, AcceptsOnlyUtf8) {
     for (const char* value : {"\xff", "\xc3", "\xc0\xaf", "\xed\xa0\x80", "\xf4\x90\x80\x80"}) {
         EXPECT_FALSE(SetProperty("text", value)) << testing::PrintToString(value);
     }
     EXPECT_TRUE(SetProperty("text", "a\u00e9\u20ac\U0001f600"));
 }
 
-TEST(PropertiesTest, RejectWritesWhenReadOnly) {
+TEST(PropertiesTest, RejectsWritesToReadOnlyProperties) {
     EXPECT_TRUE(SetProperty("ro.once", "1"));
     EXPECT_FALSE(SetProperty("ro.once", "2"));
     EXPECT_TRUE(SetProperty("protected", "1"));
@@ -107,7 +107,7 @@ TEST(PropertiesTest, RejectWritesWhenReadOnly) {
     EXPECT_FALSE(SetProperty("protected", "2"));
 }
 
-// What follows the header of the next record.
+// Reads the next record and returns its text without the header.
 std::string ReadLogRecord(std::istream& log) {
     host::LogEntryHeader header = {};
     log.read(reinterpret_cast<char*>(&header), sizeof(header));
@@ -128,7 +128,7 @@ TEST(LogTest, AppendsARecord) {
     EXPECT_EQ(ReadLogRecord(log), "\4platform_test" + zero + std::string(1023, 'x') + zero);
 }
 
-// Its status is the call's code. Each call takes some time.
+// Returns the call's code as the status. A call takes some time.
 class TestService : public android::BBinder {
   public:
     std::atomic<int> running = 0;
@@ -159,7 +159,7 @@ struct TestRecipient : IBinder::DeathRecipient {
     int deaths = 0;
 };
 
-TEST(VndBinderTest, TakesAPositiveStatusForSuccessWithoutAReply) {
+TEST(VndBinderTest, TreatsAPositiveStatusAsSuccessWithoutAReply) {
     Parcel request, reply;
     EXPECT_EQ(host::PublishService(kDriver, "status", new TestService), android::OK);
     const sp<IBinder> proxy = host::ConnectService(kDriver, "status");
@@ -174,7 +174,7 @@ TEST(VndBinderTest, ReplacesOnlyTheSocketOfAnEarlierService) {
     EXPECT_EQ(host::PublishService(kDriver, "file", new TestService), -EADDRINUSE);
 }
 
-TEST(VndBinderTest, FollowsNoLink) {
+TEST(VndBinderTest, RefusesLinks) {
     EXPECT_EQ(host::PublishService(kDriver, "target", new TestService), android::OK);
     std::filesystem::create_symlink("target", kRoot.path + kDriver + "/link");
     std::filesystem::create_symlink("vndbinder", kRoot.path + "/dev/linked");
@@ -228,7 +228,7 @@ TEST(VndBinderTest, NotifiesLinkedRecipientsOfTheOwnersDeath) {
     EXPECT_EQ(proxy->linkToDeath(unlinked), android::DEAD_OBJECT);
 }
 
-TEST(VndBinderTest, RejectsAnotherInterfaceOfTheSameLength) {
+TEST(VndBinderTest, RejectsAnInterfaceNameOfTheSameLength) {
     Parcel request;
     request.writeInterfaceToken(android::String16("interface.a"));
     EXPECT_FALSE(request.enforceInterface(android::String16("interface.b")));
@@ -236,7 +236,7 @@ TEST(VndBinderTest, RejectsAnotherInterfaceOfTheSameLength) {
     EXPECT_TRUE(request.enforceInterface(android::String16("interface.a")));
 }
 
-TEST(VndBinderTest, CarriesOutOneWayCallsOfAllClientsOneAfterAnother) {
+TEST(VndBinderTest, ExecutesOneWayCallsOfAllClientsInSequence) {
     const sp<TestService> service = new TestService;
     EXPECT_EQ(host::PublishService(kDriver, "queue", service), android::OK);
     const sp<IBinder> first = host::ConnectService(kDriver, "queue");

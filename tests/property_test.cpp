@@ -48,8 +48,8 @@ TEST_F(PropertyTest, FindsARowByItsExactAlias) {
     EXPECT_EQ(property.GetItem("rotate").alias, "VerSys");
 }
 
-// Without properties, a getter leaves its default in the property of its row. The tests of the
-// units that call setters and flag getters hold theirs.
+// A getter stores its default in an unset property. The callers' tests cover setters and flag
+// getters.
 TEST_F(PropertyTest, TextGettersUseTheirOwnProperty) {
     const struct {
         const char* key;

@@ -1,4 +1,4 @@
-"""The tool when its peer, its files or its surroundings are not as they should be"""
+"""The tool with a faulty peer, unusable files or a broken environment"""
 import fcntl
 import os
 import pathlib
@@ -21,8 +21,8 @@ class Call(socketserver.BaseRequestHandler):
 
 @pytest.fixture
 def service(stopped_device):
-    """A service without init and daemon, which answers each call with its `reply`."""
-    stopped_device.watch()
+    """A service without init or daemon. It answers every call with `reply`."""
+    stopped_device.start_tracing()
     for key in (PERMISSIVE, "odm.thp.dae_alive", "odm.thp.binder"):
         stopped_device.setprop(key, "1")
     path = stopped_device.root / SERVICE
@@ -34,8 +34,8 @@ def service(stopped_device):
 
 
 def reply(body=b"", status=0, size=None):
-    """A reply as it travels through a socket of the host's binder driver."""
-    return struct.pack("<iI", status, len(body) if size is None else size) + body
+    """The bytes of a reply on a socket of the host's binder driver."""
+    return struct.pack("<iI", status, size or len(body)) + body
 
 
 FAILED_CALLS = {
@@ -53,7 +53,7 @@ def test_restarts_the_daemon_after_two_failed_calls(stopped_device, service, raw
     assert stopped_device.written()[-2:] == RESTART
 
 
-def test_prints_the_largest_answer_as_it_is(stopped_device, service):
+def test_prints_the_largest_answer_unchanged(stopped_device, service):
     text = "%s%n\xff".ljust(1040384 - 1, "r")
     service.reply = reply(text.encode("latin-1") + b"\0")
     assert stopped_device.tpd("x") == text + "\n"
@@ -77,14 +77,14 @@ RESULTS = [
 
 
 @pytest.mark.parametrize("fault, text, dies", RESULTS, ids=[row[0] for row in RESULTS])
-def test_gives_each_fault_its_result(device, fault, text, dies):
+def test_fault_has_its_documented_result(device, fault, text, dies):
     device.output("device", "fault", *fault.split())
     assert device.tpd("captest") == text
     assert device.events("fault")[0]["name"] == fault
     wait_until(lambda: bool(device.events("daemon_exit")) == dies)
 
 
-def test_limits_captest_restart_to_captest(device):
+def test_captest_restart_applies_to_captest_only(device):
     device.output("device", "fault", "captest_restart")
     device.tpd("THP_GetVersion")
     assert device.events("fault") == []
@@ -101,14 +101,14 @@ USAGE_ERRORS = {
 
 
 @pytest.mark.parametrize("arguments", USAGE_ERRORS)
-def test_says_which_word_is_wrong(device, arguments):
+def test_names_the_invalid_argument(device, arguments):
     done = device.run("device", "fault", *arguments.split())
     assert (done.returncode, done.stdout) == (2, "")
     assert done.stderr == f"device: {USAGE_ERRORS[arguments]}\n"
     assert device.getprop("sim.fault") == ""
 
 
-def test_sets_no_fault_during_a_count_down(device):
+def test_new_fault_waits_for_a_count_down(device):
     device.output("device", "fault", "hang", "0", "9")
     properties = os.open(device.root / "properties", os.O_RDONLY)
     inode = f":{os.stat(properties).st_ino} "
@@ -127,7 +127,7 @@ def test_sets_no_fault_during_a_count_down(device):
     assert device.getprop("sim.fault") == "no_text"
 
 
-def test_can_be_ended_while_the_daemon_hangs(device):
+def test_tool_can_be_interrupted_while_the_daemon_hangs(device):
     device.output("device", "fault", "hang", "60000", "1")
     tool = subprocess.Popen([*device.tool, "captest"], env=device.env)
     wait_until(lambda: device.events("fault"))
@@ -144,14 +144,14 @@ OUTPUTS = {
 
 
 @pytest.mark.parametrize("redirection", OUTPUTS.values(), ids=OUTPUTS)
-def test_sends_the_command_whatever_its_output(device, redirection):
+def test_sends_the_command_when_output_fails(device, redirection):
     script = f'exec {redirection}; "$@"'
     device.output("bash", "-c", script, "bash", *device.tool, "captest")
     assert len(device.events("command")) == 1
     assert not (device.root / "log").read_bytes().endswith(PASS.encode())
 
 
-def test_daemon_survives_a_client_that_goes_away(device):
+def test_daemon_survives_a_killed_client(device):
     device.output("device", "fault", "hang", "200")
     with subprocess.Popen([*device.tool, "captest"], env=device.env) as tool:
         wait_until(lambda: device.events("fault"))
@@ -161,7 +161,7 @@ def test_daemon_survives_a_client_that_goes_away(device):
     assert device.restarts() == 0
 
 
-def test_takes_a_pipe_for_no_log(device):
+def test_writes_no_log_to_a_pipe(device):
     (device.root / "log").unlink()
     os.mkfifo(device.root / "log")
     reader = os.open(device.root / "log", os.O_RDONLY | os.O_NONBLOCK)

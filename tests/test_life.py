@@ -1,4 +1,4 @@
-"""The life of the virtual device: who runs it, how it starts and how it ends"""
+"""The life cycle of the virtual device: start, supervision, reboot and stop"""
 import concurrent.futures
 import fcntl
 import os
@@ -11,7 +11,7 @@ from virtual_device import PASS, wait_until
 
 @pytest.fixture
 def device(stopped_device):
-    """Never started: each test here does that itself."""
+    """A stopped device; the tests here start it themselves."""
     return stopped_device
 
 
@@ -23,7 +23,7 @@ def in_parallel(device, commands):
 
 
 @pytest.mark.parametrize("repeats", [3, pytest.param(100, marks=pytest.mark.soak)])
-def test_is_one_device_or_none_whatever_is_asked(device, chance, repeats):
+def test_concurrent_commands_leave_at_most_one_init(device, chance, repeats):
     for _ in range(repeats):
         in_parallel(device, chance.choices(["start", "stop", "status"], k=20))
         assert len(device.processes("/init")) <= 1
@@ -31,18 +31,18 @@ def test_is_one_device_or_none_whatever_is_asked(device, chance, repeats):
     assert device.is_up()
 
 
-def test_runs_the_commands_of_all_who_start_it_at_once(device):
+def test_concurrent_starters_all_run_their_commands(device):
     ran = in_parallel(device, ["run captest"] * 4)
     assert [done.stdout for done in ran] == [PASS] * 4
 
 
-def test_restarts_a_daemon_whose_caller_ignored_signals(device):
+def test_restarts_the_daemon_when_the_caller_ignored_sigchld(device):
     device.output("env", "--ignore-signal=CHLD", "device", "start")
     device.kill("corvane_daemon")
     wait_until(lambda: device.restarts() == 1 and device.is_up())
 
 
-def test_keeps_nothing_of_its_caller(device, tmp_path):
+def test_init_is_detached_from_its_caller(device, tmp_path):
     with open(tmp_path / "file", "w") as file:
         device.start(cwd=tmp_path, pass_fds=[file.fileno()])
     (init,) = device.processes("/init")
@@ -51,7 +51,7 @@ def test_keeps_nothing_of_its_caller(device, tmp_path):
     assert os.getsid(init) == init
 
 
-def test_boots_whatever_was_there_before(device):
+def test_boots_after_an_unclean_stop(device):
     device.tpd("stop")
     device.setprop("ro.build.version.sdk", "29")
     device.start()
@@ -63,13 +63,13 @@ def test_boots_whatever_was_there_before(device):
     assert device.getprop("ro.build.version.sdk") == "30"
 
 
-def test_makes_files_for_its_user_alone_whatever_the_umask(device):
+def test_files_are_private_under_any_umask(device):
     device.output("sh", "-c", "umask 0777; exec device start")
     device.output("device", "reboot")
     assert (device.root / "properties").stat().st_mode & 0o777 == 0o700
 
 
-def test_reboots_with_what_persists(device):
+def test_reboot_keeps_persistent_properties_only(device):
     device.start()
     device.setprop("persist.a", "1")
     device.setprop("b", "1")
@@ -80,7 +80,7 @@ def test_reboots_with_what_persists(device):
     assert device.output("getenforce") == "Enforcing\n"
 
 
-def test_stays_in_a_root_that_was_renamed(device):
+def test_device_stays_in_a_renamed_root(device):
     device.start()
     moved = device.root.rename(device.root.with_name("moved"))
     letter = device.root / "dev/vndbinder/letter"
@@ -94,7 +94,7 @@ def test_stays_in_a_root_that_was_renamed(device):
     shutil.rmtree(device.root)
 
 
-def test_says_what_it_cannot_find_out(device):
+def test_reports_a_lock_that_init_does_not_hold(device):
     device.output("device", "root")
     with open(device.root / "init.lock", "w") as lock:
         fcntl.lockf(lock, fcntl.LOCK_EX)
@@ -103,7 +103,7 @@ def test_says_what_it_cannot_find_out(device):
     assert all("which is not init" in done.stderr for done in asked)
 
 
-def test_has_one_init(device, build):
+def test_second_init_fails(device, build):
     device.start()
     second = device.run(build / "device/init", "Permissive")
     assert second.returncode == 1
@@ -121,11 +121,11 @@ def test_restarts_a_device_of_another_build(device, build, tmp_path):
     assert device.is_up()
 
 
-def test_says_once_that_the_daemon_cannot_live(device):
-    device.watch()
+def test_reports_once_that_the_daemon_cannot_start(device):
+    device.start_tracing()
     device.start()
     (device.root / "dev").rename(device.root / "away")
-    (device.root / "dev").write_text("no folder for a service")
+    (device.root / "dev").write_text("not a directory")
     device.kill("corvane_daemon")
     wait_until(lambda: len(device.events("restart_pause")) > 4)
     pauses = [event["ms"] for event in device.events("restart_pause")]
@@ -133,7 +133,7 @@ def test_says_once_that_the_daemon_cannot_live(device):
     assert len(device.events("log", who="init")) == 1
 
 
-def test_boots_through_no_link(device, tmp_path):
+def test_refuses_to_boot_through_a_link(device, tmp_path):
     letter = tmp_path / "letter"
     letter.write_text("Dear")
     device.output("device", "root")

@@ -11,14 +11,14 @@ COMMANDS = [300, pytest.param(9000, marks=pytest.mark.soak)]
 
 
 def run_clients(commands, check):
-    """Has 16 clients check the commands, each with other parameters."""
+    """Runs 16 clients that check the commands with different parameters."""
     states = [f"version:3+main,{number},{number}" for number in range(commands)]
     with concurrent.futures.ThreadPoolExecutor(16) as pool:
         list(pool.map(check, states))
 
 
 def descriptors(device):
-    """How many descriptors each process has."""
+    """The number of open descriptors of every process."""
     return {process: len(os.listdir(f"/proc/{process}/fd")) for process in device.processes()}
 
 
@@ -44,7 +44,7 @@ FAULTS = [
 
 
 @pytest.mark.parametrize("commands", COMMANDS)
-def test_fails_only_in_known_ways(device, chance, commands):
+def test_fails_only_with_known_results(device, chance, commands):
     def check(state):
         text = device.tpd("captest", state)
         known = f"captest {state}: PASS\n", TIMEOUT, NO_SERVICE

@@ -1,4 +1,4 @@
-"""What is shipped beside the program, and what must agree with it"""
+"""The files shipped with the program, and their agreement with it"""
 import re
 import subprocess
 
@@ -29,14 +29,14 @@ def source(path):
 
 @pytest.fixture(params=COMPLETIONS)
 def complete(request, build):
-    """What a shell offers for the last of some arguments, which is empty."""
+    """The shell's completions of an empty last argument."""
     script = COMPLETIONS[request.param]
     shell = [request.param, "-f", "-c", script, "complete"]
-    folder = build / "completions"
-    return lambda *words: subprocess.check_output([*shell, *words], cwd=folder, text=True).split()
+    path = build / "completions"
+    return lambda *words: subprocess.check_output([*shell, *words], cwd=path, text=True).split()
 
 
-def test_completes_the_commands_of_the_help(device, complete):
+def test_completes_the_commands_in_the_help(device, complete):
     commands = re.findall(r"^\w+$", device.tpd("help"), re.M)
     assert sorted(complete("")) == sorted(commands)
 
@@ -67,10 +67,10 @@ def test_manual_describes_the_local_commands(device, manual):
 
 
 def test_builds_the_same_sources_for_a_device():
-    folders = "binder bounded_libc cmdline daemon log main property".split()
+    directories = "binder bounded_libc cmdline daemon log main property".split()
     for_device = re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp"))
     here = [str(path.relative_to(SOURCE)) for path in SOURCE.glob("*/*.cpp")]
-    assert sorted(for_device) == sorted(path for path in here if path.split("/")[0] in folders)
+    assert sorted(for_device) == sorted(path for path in here if path.split("/")[0] in directories)
 
 
 def fenced(text):

@@ -1,4 +1,4 @@
-"""Each path that a command can take through the tool, with the simulated daemon"""
+"""Every path of a command through the tool, with the simulated daemon"""
 from virtual_device import NO_SERVICE, PASS, PERMISSIVE, RESTART, SERVICE
 from virtual_device import wait_until
 
@@ -21,7 +21,7 @@ def test_switches_the_touch_display(device):
     assert listed == "pointer_location=1\nshow_touches=1\n"
 
 
-def test_forwards_while_selinux_permits(device):
+def test_forwards_while_selinux_is_permissive(device):
     device.setprop(PERMISSIVE, "null")
     device.output("setenforce", "0")
     assert device.tpd("captest") == PASS
@@ -35,7 +35,7 @@ def test_forwards_in_upgrade_mode(device):
     assert device.tpd("captest") == PASS
 
 
-def test_follows_no_link_to_a_kernel_command_line(device, tmp_path):
+def test_ignores_a_linked_kernel_command_line(device, tmp_path):
     device.setprop(PERMISSIVE, "null")
     (tmp_path / "cmdline").write_text("enter_recovery=1\n")
     (device.root / "proc").mkdir()

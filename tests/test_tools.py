@@ -12,13 +12,13 @@ def shell(device, command, **options):
     return device.run("adb", "shell", command, **options).stdout
 
 
-def test_takes_any_legal_name_for_a_property(device):
+def test_accepts_any_valid_property_name(device):
     device.setprop("-e", "value")
     assert device.getprop("-e") == "value"
     assert "[-e]: [value]\n" in device.output("getprop")
 
 
-def test_leaves_nothing_of_a_write_that_fails(device):
+def test_failed_write_leaves_no_file(device):
     done = device.run("sh", "-c", "trap '' XFSZ; ulimit -f 0; setprop key value")
     assert done.returncode == 1
     assert done.stderr.startswith("Failed to set property 'key' to 'value'.\n")
@@ -26,7 +26,7 @@ def test_leaves_nothing_of_a_write_that_fails(device):
     assert os.listdir(device.root / "tmp") == []
 
 
-def test_shows_a_long_property_whole_and_a_default(device):
+def test_getprop_prints_long_values_and_defaults(device):
     device.setprop("ro.long", "x" * 200)
     assert device.getprop("ro.long") == "x" * 200
     assert f"[ro.long]: [{'x' * 200}]\n" in device.output("getprop")
@@ -43,7 +43,7 @@ def test_keeps_settings_in_their_directory(device, key):
     assert device.output("getenforce") == "Enforcing\n"
 
 
-def test_prints_what_passes_the_filter(device):
+def test_logcat_filters_by_tag_and_priority(device):
     device.output("logcat", "-c")
     device.tpd("captest")
     logged = device.output("logcat", "-d", "-s", "-v", "brief", "tpd:E")
@@ -55,7 +55,7 @@ def test_prints_what_passes_the_filter(device):
     "name, value, rule",
     [(".a", "1", "name"), ("a", "x" * 92, "91 bytes"), ("a", b"\xff", "UTF-8")],
 )
-def test_says_which_rule_a_property_breaks(device, name, value, rule):
+def test_setprop_names_the_broken_rule(device, name, value, rule):
     assert rule in device.run("setprop", name, value).stderr
 
 
@@ -66,7 +66,7 @@ def test_reboots_from_the_shell(device):
     assert device.is_up()
 
 
-def test_follows_the_log(device):
+def test_logcat_follows_the_log(device):
     command = ["logcat", "-v", "raw", "-s", "corvane_daemon:E"]
     with Popen(command, env=device.env, stdout=PIPE) as logcat:
         device.tpd("debugRawEnable")
@@ -74,7 +74,7 @@ def test_follows_the_log(device):
         logcat.kill()
 
 
-def test_gives_recorded_answers(device):
+def test_daemon_returns_recorded_answers(device):
     device.output("device", "answer", "THP_GetVersion", "v%d")
     device.output("device", "answer", "THP_SetFoldState 1", "-", input="\xff\n\n")
     device.output("device", "stop")
@@ -93,7 +93,7 @@ def test_forgets_removed_answers(device):
     assert device.tpd("captest") == PASS
 
 
-def test_records_only_what_a_daemon_can_answer(device):
+def test_rejects_answers_that_the_daemon_cannot_send(device):
     largest = "r" * 1040383
     device.output("device", "answer", "captest", "-", input=largest)
     assert device.run("device", "answer", "captest", "-", input=largest + "r").returncode == 1
@@ -101,7 +101,7 @@ def test_records_only_what_a_daemon_can_answer(device):
     assert device.tpd("captest") == largest + "\n"
 
 
-def test_starts_over_when_the_log_was_emptied(device):
+def test_logcat_follows_a_cleared_log(device):
     device.output("log", "-t", "life", "first")
     command = ["logcat", "-v", "raw", "-s", "life"]
     with Popen(command, env=device.env, stdout=PIPE) as logcat:
@@ -121,7 +121,7 @@ LOG_SELECTIONS = {
 
 
 @pytest.mark.parametrize("options", LOG_SELECTIONS)
-def test_selects_from_the_log(device, options):
+def test_logcat_selects_entries(device, options):
     device.output("logcat", "-c")
     device.output("log", "-p", "e", "-t", "one", "first")
     device.output("log", "-t", "two", "second")
@@ -148,7 +148,7 @@ USAGE_ERRORS = [
 
 
 @pytest.mark.parametrize("command", USAGE_ERRORS)
-def test_refuses_wrong_arguments(device, command):
+def test_reports_usage_errors(device, command):
     done = device.run(*command.split())
     assert done.returncode in (1, 2)
     assert done.stdout == ""
@@ -177,7 +177,7 @@ def test_finds_the_listed_commands_and_no_others(device):
         assert shell(device, f"type {name}") == f"{name} not found\n"
 
 
-def test_sees_the_processes_of_this_device_only(device):
+def test_shell_sees_only_processes_of_its_device(device):
     daemon = device.processes("corvane_daemon")
     init = device.processes("init")
     both = "".join(f"{process}\n" for process in sorted(init + daemon))
@@ -191,13 +191,13 @@ def test_sees_the_processes_of_this_device_only(device):
 
 
 @pytest.mark.parametrize("option, count", [("", 1), ("-n", 3)])
-def test_reads_all_standard_input_unless_told(device, option, count):
+def test_adb_shell_reads_standard_input_without_n(device, option, count):
     loop = f"while read -r x; do echo $x; adb shell {option} true; done"
     done = device.run("bash", "-c", loop, input="a\nb\nc\n")
     assert len(done.stdout.split()) == count
 
 
-def test_says_once_that_a_root_is_refused(device):
+def test_reports_a_refused_root_once(device):
     device.root.chmod(0o755)
     done = device.run("adb", "wait-for-device")
     device.root.chmod(0o700)

@@ -1,4 +1,4 @@
-"""scripts/device trace: what it shows of a command"""
+"""The output of scripts/device trace"""
 import json
 import re
 import signal
@@ -11,7 +11,7 @@ from virtual_device import LIMIT_S, PASS, wait_until
 
 @pytest.fixture
 def trace(stopped_device):
-    """Traces a command on a running device that nobody watches, and returns what is shown."""
+    """Traces a command on a running device without a recorder, and returns the output."""
     stopped_device.output("device", "start", "--permissive")
     return lambda *arguments: stopped_device.output("device", "trace", *arguments)
 
@@ -20,7 +20,7 @@ def assert_in_order(shown, *parts):
     assert re.search(".*".join(map(re.escape, parts)), shown, re.S), shown
 
 
-def test_shows_who_did_what(trace):
+def test_shows_the_steps_of_a_command(trace):
     assert_in_order(
         trace("captest"),
         "tool runs getenforce",
@@ -49,7 +49,7 @@ def test_draws_a_sequence_diagram(trace):
     assert_in_order(shown, "sequenceDiagram\n", "tool->>", '"#35;#59;"', "daemon-->>")
 
 
-def test_ends_with_its_terminal(trace, stopped_device):
+def test_recorder_exits_with_its_terminal(trace, stopped_device):
     stopped_device.output("device", "fault", "hang", "60000")
     command = ["device", "trace", "captest"]
     recorder = subprocess.Popen(command, env=stopped_device.env, stdout=subprocess.DEVNULL)
@@ -60,6 +60,6 @@ def test_ends_with_its_terminal(trace, stopped_device):
     assert not (stopped_device.root / "trace").exists()
 
 
-def test_clears_the_file_of_a_recorder_that_was_killed(trace, stopped_device):
+def test_clears_the_file_of_a_killed_recorder(trace, stopped_device):
     (stopped_device.root / "trace").write_text("{}\n")
     assert_in_order(trace("captest"), "tool calls", PASS)

@@ -99,7 +99,7 @@ TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
 constexpr char kCaptestFailure[] =
         "captest fail due to corvane_daemon is not alive or unexpected reboot. ";
 
-TEST(IsCaptestInRtTest, KnowsAnyFragmentOfTheModeNames) {
+TEST(IsCaptestInRtTest, AcceptsAnySubstringOfTheModeNames) {
     for (const char* fragment : {"running_testrunning", "running_test_lasttime", "g"}) {
         EXPECT_TRUE(TpdClient::IsCaptestInRt("captest", fragment)) << fragment;
     }

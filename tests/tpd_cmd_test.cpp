@@ -6,7 +6,7 @@ namespace test {
 
 using TpdCmdTest = DeviceTest;
 
-TEST_F(TpdCmdTest, KnowsWhetherTheThplogIsOn) {
+TEST_F(TpdCmdTest, ReportsWhetherTheThplogIsOn) {
     const struct {
         const char* thplog;
         const char* userType;
@@ -48,7 +48,7 @@ TEST_F(TpdCmdTest, StoresThatSelinuxIsPermissive) {
                             Write(kPermissiveKey, "true")));
 }
 
-TEST_F(TpdCmdTest, ReadsTheStoredFlagBeforeHowTheDeviceWasBooted) {
+TEST_F(TpdCmdTest, ReadsTheStoredFlagBeforeTheBootMode) {
     for (const char* line : {"enter_recovery=1", "androidboot.swtype=factory"}) {
         device.kernelCommandLine = line;
         device.properties.erase(kPermissiveKey);

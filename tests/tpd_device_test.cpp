@@ -1,4 +1,4 @@
-// The proxy and the platform's binder objects within one process: a device can run this as it is.
+// The proxy and the platform's binder objects in one process. It also runs on a device.
 #include <binder/Binder.h>
 #include <binder/Parcel.h>
 #include <gtest/gtest.h>
@@ -20,7 +20,7 @@ class EchoService : public android::BBinder {
     }
 };
 
-TEST(TpdDeviceTest, CarriesACommandAndItsAnswer) {
+TEST(TpdDeviceTest, DeliversACommandAndItsAnswer) {
     const auto daemon = ICorvaneInterfaceClient::asInterface(new EchoService);
     std::string reply;
     EXPECT_EQ(daemon->ExecuteCommand(reply, "[TPD]captest", "x"), android::OK);

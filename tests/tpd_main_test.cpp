@@ -61,7 +61,7 @@ TEST(TpdMainTest, DoesNothingWithOtherArguments) {
     }
 }
 
-TEST(TpdMainTest, CarriesOutLocalCommands) {
+TEST(TpdMainTest, ExecutesLocalCommands) {
     const std::string show = "settings put system show_touches ";
     const std::string point = "settings put system pointer_location ";
     const Call logOn = Write(kThplogKey, "true");
@@ -125,7 +125,7 @@ TEST(TpdMainTest, LogsAForwardedCommand) {
                             Log(INFO, "CmdsToStr[130] +\n")));
 }
 
-TEST(TpdMainTest, SendsNothingWhileSelinuxEnforces) {
+TEST(TpdMainTest, SendsNothingWhileSelinuxIsEnforcing) {
     FakeDevice device;
     EXPECT_EQ(RunTool({"tpd"}),
               std::string("please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n") +
@@ -135,7 +135,7 @@ TEST(TpdMainTest, SendsNothingWhileSelinuxEnforces) {
     EXPECT_THAT(gTpdCmds, IsEmpty());
 }
 
-TEST(TpdMainTest, SaysThatThereIsNoMemory) {
+TEST(TpdMainTest, ReportsThatMemoryIsExhausted) {
     FakeDevice device;
     device.failingAllocation = 1;
     EXPECT_EQ(RunTool({"tpd", "start"}), "can NOT alloc memory for g_tpdCmd");

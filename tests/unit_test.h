@@ -1,4 +1,4 @@
-// What all unit tests need: GoogleMock, and a fresh fake device for each test.
+// For all unit tests: GoogleMock, and a new fake device for every test.
 #pragma once
 
 #include <gmock/gmock.h>

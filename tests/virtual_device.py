@@ -1,4 +1,4 @@
-"""What the tests do with a virtual device"""
+"""Helpers for tests that use a virtual device"""
 import contextlib
 import fcntl
 import json
@@ -8,7 +8,7 @@ import subprocess
 import time
 
 SOURCE = pathlib.Path(__file__).resolve().parent.parent
-LIMIT_S = 60  # for whatever must end: a busy machine with sanitizers is slow
+LIMIT_S = 60  # for every wait; sanitizers on a busy machine are slow
 SERVICE = "dev/vndbinder/service.corvaneinterfaceservice"
 PERMISSIVE = "odm.thp.debug.selinux.permissive"
 
@@ -29,10 +29,10 @@ def wait_until(condition):
 
 
 class Device:
-    """A device root of its own in `folder`, and the programs of a build that work on it."""
+    """A device root in `directory`, and the programs of a build that use it."""
 
-    def __init__(self, folder, build, tool):
-        self.root = folder / "device"
+    def __init__(self, directory, build, tool):
+        self.root = directory / "device"
         self.tool = tool
         programs = f"{build}/device/bin", f"{build}/device", f"{SOURCE}/device/host"
         self.env = os.environ | {
@@ -42,7 +42,7 @@ class Device:
         }
 
     def run(self, *command, **options):
-        """Runs a program on the device to its end. Each byte is read as one character."""
+        """Runs a program on the device until it exits. Decodes its output as Latin-1."""
         options = {"env": self.env, "encoding": "latin-1", "capture_output": True} | options
         return subprocess.run(command, check=False, timeout=LIMIT_S, **options)
 
@@ -70,14 +70,14 @@ class Device:
     def restarts(self):
         return int(self.getprop("odm.thp.dae_reboot_times"))
 
-    def watch(self):
-        """Turns tracing on, for as long as the file is locked."""
+    def start_tracing(self):
+        """Turns tracing on while the file is locked."""
         self.output("device", "root")
         self.recorder = open(self.root / "trace", "w")
         fcntl.flock(self.recorder, fcntl.LOCK_EX)
 
     def events(self, what, who=""):
-        """What was recorded of one kind, by one program or by all."""
+        """The recorded events of one kind, of one program or of all."""
         lines = (self.root / "trace").read_text().splitlines()
         events = [json.loads(line) for line in lines]
         return [event for event in events if event["what"] == what and who in event["who"]]
@@ -85,10 +85,10 @@ class Device:
     def written(self):
         """The properties that the tool wrote, in order."""
         writes = self.events("property_write", who="tpd")
-        return [(each["name"], each["new"]) for each in writes]
+        return [(write["name"], write["new"]) for write in writes]
 
     def processes(self, program=""):
-        """The processes that know this device and run the program."""
+        """The processes of this device that run the program."""
         known = f"TPD_DEVICE_ROOT={self.root}".encode()
         found = []
         for process in pathlib.Path("/proc").glob("[0-9]*"):
