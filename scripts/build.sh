@@ -1,5 +1,5 @@
 # shellcheck shell=bash disable=SC2034
-# For the other scripts: their usage and the build.
+# Functions of the other scripts: usage messages and the build.
 tree=$(CDPATH='' cd -- "$(dirname -- "$(readlink -f -- "${BASH_SOURCE[0]}")")/.." && pwd)
 script=$(readlink -f -- "$0")
 export TPD_BUILD_DIR
@@ -8,7 +8,7 @@ TPD_BUILD_DIR=$(realpath -m -- "${TPD_BUILD_DIR:-$tree/build}")
 # Prints the comment that the script begins with.
 usage() { sed -n '2,/^[^#]/s/^# \{0,1\}//p' "$script"; }
 
-# answer_help ARGUMENT...: prints the usage and ends the script when the first argument asks for it.
+# answer_help ARGUMENT...: prints the usage and exits when the first argument asks for it.
 answer_help() {
     if [[ ${1-} == -h || ${1-} == --help ]]; then
         usage
@@ -16,13 +16,13 @@ answer_help() {
     fi
 }
 
-# usage_error MESSAGE: ends the script, which was called with wrong arguments.
+# usage_error MESSAGE: reports a usage error and exits.
 usage_error() {
     echo "${script##*/}: $1; see --help" >&2
     exit 2
 }
 
-# locked COMMAND...: runs it while no other script configures or builds TPD_BUILD_DIR.
+# locked COMMAND...: runs it with the lock on TPD_BUILD_DIR, so that builds do not overlap.
 locked() {
     mkdir -p "$TPD_BUILD_DIR"
     (
@@ -34,7 +34,7 @@ locked() {
     ) 9>"$TPD_BUILD_DIR/lock"
 }
 
-# quietly COMMAND...: its output goes to a file in TPD_BUILD_DIR and is shown when it fails.
+# quietly COMMAND...: runs it and shows its output, kept in TPD_BUILD_DIR, only when it fails.
 quietly() {
     if ! "$@" >"$TPD_BUILD_DIR/build.log" 2>&1; then
         cat "$TPD_BUILD_DIR/build.log" >&2
@@ -52,7 +52,7 @@ configure() {
 # up_to_date TARGET...: whether there is nothing to build.
 up_to_date() { ninja -C "$TPD_BUILD_DIR" -n "$@" | grep -q "no work to do"; }
 
-# On a terminal, what is built is shown.
+# Shows the build's progress on a terminal.
 build_targets() {
     [[ -f $TPD_BUILD_DIR/build.ninja ]] || configure
     if [[ -t 2 ]] && ! up_to_date "$@"; then
@@ -62,5 +62,5 @@ build_targets() {
     fi
 }
 
-# build TARGET...: configures when that was not done yet, and builds.
+# build TARGET...: configures TPD_BUILD_DIR when necessary, then builds.
 build() { locked build_targets "$@"; }
