@@ -1,4 +1,4 @@
-// The tool's baseline: its system calls in its order with its bytes, and nothing else.
+// The tool's baseline: the same system calls in the same order with the same data, nothing else.
 //   baseline THP_GetVersion   as tpd forwards it, or refuses it while SELinux is enforcing
 //   baseline stop             as tpd stops the daemon
 #define _GNU_SOURCE
@@ -59,7 +59,7 @@ static void Log(uint8_t priority, const char* tag, const char* text) {
     }
 }
 
-// The first use opens the directory of properties.
+// Opens the properties directory on first use.
 static void ReadProperty(const char* name) {
     if (properties == 0) {
         properties = openat(root, "properties", kDirectory);
@@ -162,7 +162,7 @@ static void BeginOutput(void) {
     fstat(STDOUT_FILENO, &status);
 }
 
-// As a buffered stream writes it: whole blocks at once, the rest when the program ends.
+// Writes as a buffered stream does: whole blocks at once, the rest when the program exits.
 static void Print(int connection, char* text) {
     BeginOutput();
     const size_t size = strlen(text);

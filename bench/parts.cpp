@@ -1,4 +1,4 @@
-// Times the tool's parts inside one process, each beside a baseline that does the same work.
+// Times the tool's parts in one process. Every part has a baseline that does the same work.
 // Needs a new device root. Pin the process to one processor (taskset): otherwise the results
 // depend on where the scheduler runs the service's thread.
 #include <benchmark/benchmark.h>
@@ -36,7 +36,7 @@ constexpr char kKey[] = "odm.thp.dae_alive";
 constexpr int kLargestReply =
         host::kMaxTransactionBytes - 4;  // bytes; the rest is terminator and padding
 
-// The daemon: the command is the number of bytes of its answer.
+// The daemon. The command is the size of its answer in bytes.
 class Service : public android::BBinder {
     android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
                                  android::Parcel* reply, uint32_t /* flags */) override {
@@ -48,7 +48,7 @@ class Service : public android::BBinder {
     std::string mText;
 };
 
-// The system calls of one read of a property.
+// The system calls that read one property.
 void ReadBaseline(State& state) {
     char value[PROP_VALUE_MAX];
     for (auto _ : state) {
@@ -78,7 +78,7 @@ void SetSameTpd(State& state) {
 }
 BENCHMARK(SetSameTpd)->Name("Set, no change/tpd");
 
-// The processor time includes that of the service's thread.
+// The processor time includes the service's thread.
 void EachReply(benchmark::internal::Benchmark* run) {
     run->MeasureProcessCPUTime()->Arg(16)->Arg(4096)->Arg(kLargestReply);
 }

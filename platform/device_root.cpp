@@ -16,7 +16,7 @@ namespace host {
 
 namespace {
 
-// The file that tells a device root from other directories.
+// This file marks a directory as a device root.
 constexpr char kMark[] = ".tpd-device";
 
 bool IsSet(const char* value) { return value != nullptr && *value != '\0'; }
@@ -26,8 +26,8 @@ int Refuse(const std::string& path, const char* why) {
     return -1;
 }
 
-// Opens closed standard descriptors. A file of the device must not get the number of one, since the
-// program's output would go to that file.
+// Opens closed standard descriptors. Otherwise a file of the device could get such a number, and
+// the program's output would go to that file.
 void FillStandardDescriptors() {
     UniqueFd null(open("/dev/null", O_RDWR));
     while (null.ok() && null.get() <= STDERR_FILENO) {
@@ -36,7 +36,7 @@ void FillStandardDescriptors() {
     }
 }
 
-// Makes a directory and those above it. Returns 0 or an errno value.
+// Makes a directory and its missing parents. Returns 0 or an errno value.
 int MakeDirectories(const std::string& path) {
     size_t end = 0;
     do {
@@ -53,7 +53,7 @@ bool IsMarked(int root) {
     return fstatat(root, kMark, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
 }
 
-// Marks an empty directory as a device's. Returns why the directory cannot be one, or null.
+// Marks an empty directory as a device root. Returns null, or why that is impossible.
 const char* Mark(int root) {
     const int opened = openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
     DIR* const directory = opened < 0 ? nullptr : fdopendir(opened);
@@ -70,11 +70,11 @@ const char* Mark(int root) {
         const UniqueFd mark(openat(root, kMark, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
         return mark.ok() || errno == EEXIST ? nullptr : strerror(errno);
     }
-    // Another process may have marked it since this one looked.
+    // Another process may have marked it meanwhile.
     return IsMarked(root) ? nullptr : "contains files that do not belong to a device";
 }
 
-// Why the directory cannot be the device root, or null.
+// Returns null, or why the directory cannot be the device root.
 const char* Check(int root) {
     struct stat status = {};
     if (fstat(root, &status) != 0) {
@@ -94,7 +94,7 @@ int OpenRoot() {
     umask(077);
     const std::string path = DeviceRootPath();
     if (path.empty()) {
-        return Refuse("", "neither TPD_DEVICE_ROOT, XDG_STATE_HOME nor HOME names a place for it");
+        return Refuse("", "none of TPD_DEVICE_ROOT, XDG_STATE_HOME and HOME is set");
     }
     if (path.front() != '/') {
         return Refuse(path, "is not an absolute path");
@@ -125,7 +125,7 @@ std::string DeviceRootPath() {
     } else if (const char* const home = getenv("HOME"); IsSet(home)) {
         path = std::string(home) + "/.local/state/tpd-device";
     }
-    // With a trailing slash open() would follow a symbolic link.
+    // open() follows a symbolic link with a trailing slash.
     while (path.length() > 1 && path.back() == '/') {
         path.pop_back();
     }

@@ -5,15 +5,14 @@
 
 namespace host {
 
-// Its path: the environment variable TPD_DEVICE_ROOT, else a directory of the user's own state
-// directory. Empty when the environment names neither.
+// Its path: the environment variable TPD_DEVICE_ROOT, otherwise a directory in the user's state
+// directory. Empty when the environment defines neither.
 std::string DeviceRootPath();
 
-// A descriptor of that directory for the *at() calls; the process keeps it open. A missing
-// directory is made. One that is empty is marked as a device's. -1, after one message on standard
-// error, when the path is not absolute, when the directory cannot be opened, does not belong to
-// this user alone, or contains files without being marked. Sets the process's umask, so that other
-// users are kept out of new files.
+// Returns a descriptor of that directory for the *at() calls; the process keeps it open. Makes a
+// missing directory and marks an empty one. Prints one message and returns -1 when the path is not
+// absolute or the directory cannot be opened, is not private to this user, or contains files but no
+// mark. Sets the process's umask, so that other users cannot access new files.
 int DeviceRoot();
 
 }  // namespace host

@@ -1,5 +1,5 @@
-// Files of the device, by their paths below the device root. No component of a path is followed
-// when it is a symbolic link. A function that fails leaves the reason in errno.
+// Files of the device, by their paths below the device root. Symbolic links are not followed in any
+// component of a path. A function that fails sets errno.
 #pragma once
 
 #include <sys/types.h>
@@ -11,9 +11,9 @@
 
 namespace host {
 
-// What the device root contains, besides "settings/SPACE/KEY" and the driver of the binder.
+// The contents of the device root, except "settings/SPACE/KEY" and the binder driver.
 constexpr char kCommandLineFile[] = "proc/cmdline";
-constexpr char kInitLockFile[] = "init.lock";  // init holds a record lock on it for its life
+constexpr char kInitLockFile[] = "init.lock";  // init holds a record lock on it while it runs
 constexpr char kLogFile[] = "log";
 constexpr char kPropertiesDirectory[] = "properties";
 constexpr char kSelinuxFile[] = "selinux";
@@ -22,26 +22,26 @@ constexpr char kTraceFile[] = "trace";
 
 enum class IfMissing { kFail, kMake };
 
-// Opens a directory, for reading and for the *at() calls. "." is the device root.
+// Opens a directory for reading and for the *at() calls. "." is the device root.
 UniqueFd OpenDirectory(const std::string& path, IfMissing ifMissing = IfMissing::kFail);
 
-// The directory of properties, which is made when it is missing and then stays open. -1 on failure.
+// The properties directory, made when missing. It stays open. -1 on failure.
 int PropertiesDirectory();
 
 // Opens a file with these flags of open().
 UniqueFd OpenFile(const std::string& path, int flags);
 UniqueFd OpenFileAt(int directory, const std::string& name, int flags);
 
-// Opens a regular file of the root itself to append to it. The caller closes the descriptor. A pipe
-// is rejected: writing to it terminates the process once its reader is gone. O_CREAT in `flags`
-// makes a missing file.
+// Opens a regular file in the root itself for appending. The caller closes the descriptor. Rejects
+// a pipe: a write to one without a reader would kill the process. O_CREAT in `flags` makes a
+// missing file.
 int OpenForAppending(const char* name, int flags);
 
 // Reads at most `size` bytes from the beginning of a file. Returns how many, or -1.
 ssize_t ReadFile(const std::string& path, char* buffer, size_t size);
 
-// Overwrites a file, or makes it when it is missing. Other processes may see it empty or half
-// written meanwhile.
+// Overwrites a file or makes a missing one. Meanwhile other processes may see it empty or half
+// written.
 bool WriteFile(const std::string& path, std::string_view content);
 
 // Replaces a file atomically, or makes it and its missing directories. `flags` are those of

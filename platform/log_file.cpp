@@ -34,7 +34,7 @@ int AppendLogEntry(int priority, const char* tag, const char* text) {
     const iovec parts[] = {
             {&header, sizeof(header)}, {&level, sizeof(level)}, Bytes(tag), Bytes(text)};
     header.size = static_cast<uint32_t>(parts[1].iov_len + parts[2].iov_len + parts[3].iov_len);
-    // In one write, so that no entry of another process comes in between.
+    // One write keeps the entry in one piece when other processes append.
     const ssize_t written = writev(log, parts, std::size(parts));
     return written < 0 ? -errno : static_cast<int>(written);
 }

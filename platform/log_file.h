@@ -1,6 +1,6 @@
 // An entry of the device's log, which is the file `log` in the device root: this header, then
 // `size` bytes with the priority (one byte), the tag and the text, both with a terminating zero.
-// Writers append each entry in one call.
+// Writers append an entry in one call.
 #pragma once
 
 #include <android/log.h>

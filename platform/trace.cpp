@@ -16,12 +16,12 @@ namespace host {
 
 namespace {
 
-std::atomic<int> gTraced{-1};  // negative until this process has looked
+std::atomic<int> gTraced{-1};  // negative until the first check
 
 constexpr char kHexDigits[] = "0123456789abcdef";
 
-// Whether a recorder holds the lock of the file. A process that gets the lock instead removes the
-// file, unless another one did that before it: the name may be a new recorder's then.
+// Whether a recorder holds the lock on the file. A process that gets the lock removes the file,
+// unless another process was faster: then the name may belong to a new recorder.
 bool IsRecorded() {
     const UniqueFd trace = OpenFileAt(DeviceRoot(), kTraceFile, O_RDONLY);
     if (!trace.ok()) {
@@ -67,7 +67,7 @@ TraceEvent::~TraceEvent() {
     }
     const int error = errno;
     mLine += "}\n";
-    // Opened for each event: the file may be gone, and threads share no descriptor.
+    // Opened for every event: the file may be gone, and threads do not share a descriptor.
     const UniqueFd file(OpenForAppending(kTraceFile, 0));
     const bool isWritten = file.ok() && write(file.get(), mLine.data(), mLine.size()) ==
                                                 static_cast<ssize_t>(mLine.size());

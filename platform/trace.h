@@ -1,11 +1,11 @@
-// A record of what the device's processes do. Tracing is on while a recorder holds the file `trace`
-// of the device root locked with flock(): every process appends one JSON object a line to the file:
+// A record of what the device's processes do. Tracing is on while a recorder holds a flock() on the
+// file `trace` in the device root. Every process appends its events, one JSON object a line:
 //
 //   {"time":12.345678,"pid":7,"who":"tpd","what":"pause","us":100}
 //
 // "time" is when the event began, in seconds of CLOCK_MONOTONIC; the lines are in the order in
-// which events ended. A byte that is not printable ASCII is written as \u00XX. The process that
-// cannot append an event, on a full disk for example, takes the write permission from the file.
+// which events ended. A byte that is not printable ASCII is written as \u00XX. A process that
+// cannot append an event, for example on a full disk, removes the file's write permission.
 #pragma once
 
 #include <cstdint>
@@ -14,19 +14,16 @@
 
 namespace host {
 
-// Whether tracing is on, as this process last saw it: at its first event or at the last
-// LookForTrace().
+// Whether tracing was on when this process last checked: at its first event or in LookForTrace().
 bool IsTraced();
 
-// Looks again, for processes that live longer than one command. Removes a file that a killed
-// recorder left behind.
+// Checks again, for processes that outlive one command. Removes the file of a killed recorder.
 void LookForTrace();
 
 // CLOCK_MONOTONIC in microseconds.
 int64_t MonotonicUs();
 
-// One event, appended when the object is destroyed. Does nothing while tracing is off; keeps
-// errno.
+// One event. The destructor appends it. Does nothing while tracing is off; preserves errno.
 class TraceEvent {
   public:
     explicit TraceEvent(const char* what);

@@ -8,7 +8,7 @@
 
 namespace host {
 
-// Closes its descriptor, if it has one, and keeps errno.
+// Closes its descriptor, if any, and preserves errno.
 class UniqueFd {
   public:
     UniqueFd() = default;
@@ -20,7 +20,7 @@ class UniqueFd {
     }
     ~UniqueFd() { reset(); }
 
-    int get() const { return mFd; }  // -1 when it has none
+    int get() const { return mFd; }  // -1 when empty
     bool ok() const { return mFd >= 0; }
 
     // Hands the descriptor to the caller, who closes it.

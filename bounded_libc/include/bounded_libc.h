@@ -12,12 +12,12 @@ typedef int errno_t;
 extern "C" {
 #endif
 
-// Returns 0, or ERANGE with nothing written when `count` is beyond `destMax`.
+// Returns 0. Writes nothing and returns ERANGE when `count` exceeds `destMax`.
 errno_t memset_s(void* dest, size_t destMax, int c, size_t count);
 
-// Reads one word and the white space character after it. Knows the format "%s", whose arguments are
-// the buffer and its size in bytes (size_t), the terminator included. Returns 1, or EOF when there
-// is no word, when it does not fit and for any other format.
+// Reads one word and the white-space character after it. Supports only the format "%s"; its
+// arguments are the buffer and its size in bytes (size_t), including the terminator. Returns 1, or
+// EOF when there is no word, when the word does not fit, or for any other format.
 int fscanf_s(FILE* stream, const char* format, ...);
 
 // Returns the length of the result, or -1 when it is longer than `count` characters (the buffer

@@ -15,15 +15,15 @@ namespace host {
 constexpr size_t kMaxTransactionBytes = (1 << 20) - 2 * 4096;
 constexpr size_t kMaxOneWayBytes = kMaxTransactionBytes / 2;
 
-// Returns a proxy of the service; null when it is not published, or when it has too many clients to
-// accept another one now. `driver` is the driver's path on the device.
+// Returns a proxy of the service, or null when the service is not published or too busy to accept
+// another client. `driver` is the driver's path on the device.
 android::sp<android::IBinder> ConnectService(const std::string& driver, const std::string& name);
 
 // Returns a proxy over a connected socket.
 android::sp<android::IBinder> NewProxy(UniqueFd connection);
 
-// Publishes a binder of this process, in place of an earlier one of that name, and serves its
-// clients on other threads from then on. Returns 0 or a negative status.
+// Publishes a binder of this process, replaces an earlier one of that name, and serves its clients
+// on other threads. Returns 0 or a negative status.
 android::status_t PublishService(const std::string& driver, const std::string& name,
                                  const android::sp<android::IBinder>& binder);
 

@@ -22,11 +22,11 @@ namespace host {
 
 namespace {
 
-// Added to a caller's flags, as the platform's library does: the client accepts file descriptors in
-// the reply.
+// The platform's library adds this flag to every call: the client accepts file descriptors in the
+// reply.
 constexpr uint32_t kAcceptFds = 0x10;
 
-// A client's proxy of one service. For one thread at a time, like the process that uses it.
+// A client's proxy of one service. Not thread-safe.
 class RemoteBinder : public IBinder {
   public:
     explicit RemoteBinder(UniqueFd connection) : mConnection(std::move(connection)) {}
@@ -94,7 +94,7 @@ class RemoteBinder : public IBinder {
             return OwnerDied();
         }
         if (header.size > kMaxTransactionBytes) {
-            // Where the next reply begins is unknown: the connection is unusable.
+            // The start of the next reply is unknown, so the connection is unusable.
             OwnerDied();
             return android::FAILED_TRANSACTION;
         }
@@ -147,7 +147,7 @@ class RemoteBinder : public IBinder {
     std::vector<Link> mLinks;
 };
 
-// Does not wait for a service that is too busy to accept: the next lookup may reach it.
+// Does not wait for a busy service; the next lookup may reach it.
 bool Connect(const UniqueFd& connection, const sockaddr_un& address) {
     return fcntl(connection.get(), F_SETFL, O_NONBLOCK) == 0 &&
            connect(connection.get(), reinterpret_cast<const sockaddr*>(&address),

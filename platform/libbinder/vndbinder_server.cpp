@@ -32,11 +32,11 @@ namespace {
 constexpr int kBacklog = 128;
 constexpr std::chrono::milliseconds kRetryPause(10);
 // The kernel closes the descriptors of a dying process from the highest down. The listener is above
-// the connections: a client whose call fails finds no listener any more, as with a real driver.
+// the connections, so a client whose call fails cannot find it again, as with a real driver.
 constexpr int kListenerDescriptor = 900;
 
-// Runs `work` on a detached thread. While the system cannot make a thread, waits and tries again;
-// std::thread would abort the process.
+// Runs `work` on a detached thread. Retries until the system can make one; std::thread would abort
+// the process instead.
 template <typename Work>
 void StartThread(Work work) {
     const auto run = [](void* argument) -> void* {
@@ -52,8 +52,8 @@ void StartThread(Work work) {
     pthread_detach(thread);
 }
 
-// Executes the one-way calls of all clients of a service one after another, in the order in which
-// they were read. Two-way calls do not wait for them. The queue has no limit.
+// Executes the one-way calls of all clients of a service in sequence, in the order of their
+// arrival. Two-way calls do not wait for them. The queue is unbounded.
 class OneWayQueue : public android::BBinder {
   public:
     explicit OneWayQueue(const sp<IBinder>& service) : mService(service) {}
@@ -100,7 +100,7 @@ class OneWayQueue : public android::BBinder {
     std::deque<Call> mCalls;
 };
 
-// Replaces the socket that an earlier service of that name left behind, but no other kind of file.
+// Replaces the socket of an earlier service of that name, but no other kind of file.
 bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::string& name) {
     struct stat old = {};
     if (fstatat(directory.get(), name.c_str(), &old, AT_SYMLINK_NOFOLLOW) == 0 &&
@@ -146,7 +146,7 @@ void ServeClient(const UniqueFd& connection, const sp<IBinder>& service) {
     for (;;) {
         UniqueFd connection(accept4(listener.get(), nullptr, nullptr, SOCK_CLOEXEC));
         if (!connection.ok()) {
-            // Probably out of descriptors: wait until clients have closed some.
+            // Probably out of descriptors: wait for clients to disconnect.
             std::this_thread::sleep_for(kRetryPause);
             continue;
         }

@@ -1,4 +1,4 @@
-// The messages between a client and a service, over a socket in the driver's folder.
+// Messages between a client and a service, over a socket in the driver's directory.
 #pragma once
 
 #include <sys/un.h>
@@ -26,17 +26,17 @@ struct ReplyHeader {
     uint32_t size;
 };
 
-// Sends header and parcel whole. False when the peer is gone.
+// Sends the whole header and parcel. False when the peer is gone.
 bool SendMessage(int connection, const void* header, size_t headerSize,
                  const android::Parcel& parcel);
 
-// Receives exactly `size` bytes. False when the peer hangs up before.
+// Receives exactly `size` bytes. False when the peer hangs up first.
 bool Receive(int connection, void* buffer, size_t size);
 
 // A new, unconnected socket.
 UniqueFd NewSocket();
 
-// Whether a service can have this name: that of a file, short enough for an address.
+// Whether this is a valid service name: a file name that fits into a socket address.
 bool IsServiceName(const std::string& name);
 
 // The address of the file `name` in the directory `fd`; without a name, of the file `fd` itself.

@@ -1,4 +1,4 @@
-// One file for each property: properties/KEY in the device root, with the bytes of the value.
+// Every property is a file: properties/KEY in the device root contains the value.
 #include <sys/system_properties.h>
 
 #include <fcntl.h>
@@ -32,7 +32,7 @@ bool IsLegalName(const std::string& name) {
     return true;
 }
 
-// Whether the value is UTF-8, without overlong forms and surrogates.
+// Whether the value is valid UTF-8, without overlong forms and surrogates.
 bool IsUtf8(const std::string& value) {
     constexpr char32_t kLeast[] = {0, 0x80, 0x800, 0x10000};
     for (size_t i = 0; i < value.length();) {
@@ -57,7 +57,7 @@ bool IsUtf8(const std::string& value) {
     return true;
 }
 
-// Whether the file's owner may not write it. Then nobody writes the property, not even root.
+// Whether the owner's write permission is missing. Then not even root may write the property.
 bool IsWriteProtected(int properties, const std::string& name) {
     struct stat status = {};
     return fstatat(properties, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&

@@ -1,5 +1,5 @@
-// C library calls that the linker redirects here (--wrap): those that the device answers itself,
-// and those that its trace records.
+// C library calls that the linker redirects here (--wrap): the device implements some itself and
+// traces the others.
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -20,7 +20,7 @@ int __real_system(const char* command);
 FILE* __real_popen(const char* command, const char* mode);
 int __real_pclose(FILE* stream);
 
-// The device's own kernel command line when the device root has one, else the machine's.
+// The kernel command line in the device root, otherwise the machine's.
 FILE* __wrap_fopen(const char* path, const char* mode) {
     if (strcmp(path, "/proc/cmdline") != 0 || host::DeviceRoot() < 0) {
         return __real_fopen(path, mode);
@@ -48,7 +48,7 @@ int __wrap_system(const char* command) {
     return status;
 }
 
-// The event of the pipe that this thread has open. One at a time is enough.
+// The event of this thread's open pipe. The tool opens one at a time.
 static thread_local std::optional<host::TraceEvent> gPipe;
 
 FILE* __wrap_popen(const char* command, const char* mode) {

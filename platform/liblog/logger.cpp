@@ -1,4 +1,4 @@
-// For the platform's own liblog: its messages go to the device root's log, as those of log.cpp do.
+// Sends the messages of the platform's own liblog to the device root's log, as log.cpp does.
 #include <android/log.h>
 
 #include "platform/log_file.h"

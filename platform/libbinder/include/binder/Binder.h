@@ -15,7 +15,7 @@ class BBinder : public IBinder {
                            uint32_t flags = 0, wp<DeathRecipient>* outRecipient = nullptr) override;
 
   protected:
-    // Carries out one call. UNKNOWN_TRANSACTION for a code the service does not know.
+    // Executes one call. Returns UNKNOWN_TRANSACTION for an unknown code.
     virtual status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply,
                                 uint32_t flags = 0);
 };

@@ -39,8 +39,8 @@ class IBinder : public virtual RefBase {
     virtual status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
                                  uint32_t flags = 0) = 0;
 
-    // Ends one registration with the same arguments. Returns 0, NAME_NOT_FOUND when there is none,
-    // or as linkToDeath().
+    // Removes one registration with the same arguments. Returns 0, NAME_NOT_FOUND when it does not
+    // exist, or the errors of linkToDeath().
     virtual status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
                                    uint32_t flags = 0,
                                    wp<DeathRecipient>* outRecipient = nullptr) = 0;

@@ -7,7 +7,7 @@ class IPCThreadState {
   public:
     static IPCThreadState* self();
 
-    // Never returns. Every service of this process has threads of its own from addService() on.
+    // Never returns. addService() has already started the threads of every service.
     [[noreturn]] void joinThreadPool(bool isMain = true);
 };
 

@@ -13,10 +13,10 @@ class IServiceManager : public IInterface {
     // variable TPD_GET_SERVICE_MS sets another limit in milliseconds, up to a day.
     virtual sp<IBinder> getService(const String16& name) const = 0;
 
-    // The service's binder, or null when it is not there now.
+    // The service's binder, or null when it is not published now.
     virtual sp<IBinder> checkService(const String16& name) const = 0;
 
-    // Publishes a binder of this process, which replaces another of that name. Returns 0 or a
+    // Publishes a binder of this process and replaces an earlier one of that name. Returns 0 or a
     // negative status.
     virtual status_t addService(const String16& name, const sp<IBinder>& service,
                                 bool allowIsolated = false,

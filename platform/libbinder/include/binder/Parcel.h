@@ -1,4 +1,4 @@
-// Host implementation of the platform's message buffer, byte for byte as it is on the wire.
+// Host implementation of the platform's message buffer, with the same bytes as on the wire.
 #pragma once
 
 #include <cstddef>
@@ -25,8 +25,8 @@ class Parcel {
     // Replaces the content and starts reading at its beginning.
     status_t setData(const uint8_t* buffer, size_t size);
 
-    // Sets the size of the content and returns the content, for the caller to fill. Only this
-    // implementation has it: a transport reads into it without another copy.
+    // Sets the size of the content and returns the content for the caller to fill. A host
+    // extension: it lets a transport receive without another copy.
     uint8_t* resize(size_t size);
 
     // Writers return 0, or BAD_VALUE for a null string.
@@ -37,7 +37,7 @@ class Parcel {
 
     // Whether the next value is the token of this interface.
     bool enforceInterface(const String16& interface) const;
-    // The next number; 0 when there is none.
+    // The next number; 0 at the end.
     int32_t readInt32() const;
     // The next string, which the parcel owns; null when no terminator is left.
     const char* readCString() const;

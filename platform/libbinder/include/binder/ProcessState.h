@@ -9,7 +9,7 @@ namespace android {
 
 class ProcessState : public virtual RefBase {
   public:
-    // The one object of the process, on "/dev/binder" unless initWithDriver() came first.
+    // The process's only instance, on "/dev/binder" unless initWithDriver() came first.
     static sp<ProcessState> self();
 
     // Chooses the driver: the directory of this path in the device root. A later call with another

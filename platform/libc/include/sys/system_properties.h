@@ -1,4 +1,4 @@
-// Host implementation of the platform's system properties: one file each in the device root.
+// Host implementation of the platform's system properties: files in the device root.
 #pragma once
 
 #define PROP_VALUE_MAX 92

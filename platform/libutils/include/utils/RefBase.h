@@ -9,7 +9,7 @@
 
 namespace android {
 
-// Destroyed with its last strong reference.
+// The last strong reference destroys the object.
 class RefBase {
   public:
     RefBase(const RefBase&) = delete;
@@ -30,7 +30,7 @@ class RefBase {
     template <typename T>
     friend class wp;
 
-    // The number of strong references. Weak ones share it, so that it outlives the object.
+    // The number of strong references. It outlives the object, since weak references share it.
     const std::shared_ptr<std::atomic<int32_t>> mStrong = std::make_shared<std::atomic<int32_t>>(0);
 };
 
