@@ -20,7 +20,7 @@ namespace device {
 namespace {
 
 constexpr char kDirectory[] = "answers";
-// The largest that a reply has room for, with its terminator.
+// The longest answer that fits in a reply with its terminator.
 constexpr size_t kMaxAnswerBytes = (1 << 20) - 2 * 4096 - 1;
 constexpr int kFailure = 1;
 constexpr int kUsageError = 2;
@@ -30,7 +30,7 @@ int Fail(int status, const std::string& why) {
     return status;
 }
 
-// The file of a command's answer: a byte that is not a letter, a digit or '_' becomes %XX.
+// Returns the path of the command's answer. Bytes other than letters, digits and '_' become %XX.
 std::string AnswerPath(const std::string& command) {
     std::string path = std::string(kDirectory) + "/";
     for (const char c : command) {
@@ -75,7 +75,7 @@ int ListAnswers() {
     return 0;
 }
 
-// What standard input holds, without the newline that the tool prints after an answer.
+// Returns standard input without its final newline: the tool appends one to an answer.
 std::string ReadInput() {
     std::string text(kMaxAnswerBytes + 2, '\0');
     text.resize(fread(text.data(), 1, text.size(), stdin));
@@ -93,10 +93,11 @@ int RemoveAnswer(const std::string& command) {
 
 int RecordAnswer(const std::string& command, const std::string& answer) {
     if (answer.length() > kMaxAnswerBytes) {
-        return Fail(kFailure, "longer than " + std::to_string(kMaxAnswerBytes) + " bytes");
+        return Fail(kFailure,
+                    "the text is longer than " + std::to_string(kMaxAnswerBytes) + " bytes");
     }
     if (answer.find('\0') != std::string::npos) {
-        return Fail(kFailure, "contains a NUL byte");
+        return Fail(kFailure, "the text contains a NUL byte");
     }
     return host::ReplaceFile(AnswerPath(command), answer)
                    ? 0
@@ -110,8 +111,6 @@ std::optional<std::string> FindAnswer(const std::string& command, const std::str
             params.empty() ? std::nullopt : ReadAnswer(command + " " + params);
     return answer.has_value() ? answer : ReadAnswer(command);
 }
-
-size_t CountAnswers() { return FilesIn(kDirectory).size(); }
 
 int ListOrRecordAnswers(int argc, char** argv) {
     if (argc == 0) {
@@ -133,8 +132,9 @@ int ListOrRecordAnswers(int argc, char** argv) {
     }
     const bool isInput = strcmp(argv[1], "-") == 0;
     const std::string answer = isInput ? ReadInput() : argv[1];
-    return ferror(stdin) == 0 ? RecordAnswer(command, answer)
-                              : Fail(kFailure, std::string("cannot read: ") + strerror(errno));
+    return ferror(stdin) == 0
+                   ? RecordAnswer(command, answer)
+                   : Fail(kFailure, std::string("cannot read standard input: ") + strerror(errno));
 }
 
 }  // namespace device

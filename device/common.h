@@ -1,4 +1,4 @@
-// What the programs of the virtual device share.
+// Helpers shared by the programs of the virtual device.
 #pragma once
 
 #include <sys/system_properties.h>
@@ -15,19 +15,19 @@
 
 namespace device {
 
-// The property's value; empty when it is not set.
+// Returns the property's value, or an empty string when it is not set.
 inline std::string GetProperty(const char* key) {
     char value[PROP_VALUE_MAX];
     __system_property_get(key, value);
     return value;
 }
 
-// The property's value as a decimal number; 0 when it is none.
+// Returns the property's value as a decimal number, or 0 when it does not begin with one.
 inline int64_t GetPropertyNumber(const char* key) {
     return strtoll(GetProperty(key).c_str(), nullptr, 10);
 }
 
-// Whether the text is a whole decimal number from `min` to `max`.
+// Whether the whole text is a decimal number from `min` to `max`.
 inline bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
     char* end = nullptr;
     errno = 0;
@@ -35,29 +35,29 @@ inline bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
     return errno == 0 && !text.empty() && *end == '\0' && number >= min && number <= max;
 }
 
-// Whether the daemon says that it lives and that its service is published.
+// Whether the daemon reports that it is alive and has published its service.
 inline bool IsDaemonAlive() {
     return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";
 }
 
-// Whether init is to keep the daemon running.
+// Whether the property tells init to keep the daemon running.
 inline bool IsDaemonEnabled() {
     const std::string enable = GetProperty(kServiceEnableKey);
     return enable == "1" || enable == "true";
 }
 
-// The content of a file of the device root; `missing` when it cannot be read. No file is larger
-// than an argument of a program can be.
+// Returns the contents of a file in the device root, or `missing` when it cannot be read. Reads at
+// most 128 KiB, the size limit of a program argument.
 inline std::string ReadText(const std::string& path, const char* missing) {
     std::string text(131072, '\0');
     const ssize_t length = host::ReadFile(path, text.data(), text.size());
     return length < 0 ? missing : text.substr(0, static_cast<size_t>(length));
 }
 
-// What `getenforce` prints: Enforcing, Permissive or Disabled.
+// Returns what `getenforce` prints: Enforcing, Permissive or Disabled.
 inline std::string SelinuxMode() { return ReadText(host::kSelinuxFile, "Enforcing"); }
 
-// The names in a directory of the device root, sorted. Empty when it cannot be read.
+// Returns the sorted names in a directory of the device root; none when it cannot be read.
 inline std::set<std::string> FilesIn(const std::string& path) {
     const host::UniqueFd directory = host::OpenDirectory(path);
     const std::string opened = "/proc/self/fd/" + std::to_string(directory.get());
@@ -70,7 +70,7 @@ inline std::set<std::string> FilesIn(const std::string& path) {
     return names;
 }
 
-// The path of a file in the directory of the running executable. Without /proc, a path to nothing.
+// Returns the path of a file beside the running executable. Without /proc the path does not exist.
 inline std::string PathBesideProgram(const char* name) {
     std::error_code error;
     const std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe", error);

@@ -1,5 +1,5 @@
-// The simulated touch daemon: publishes its service on the vendor binder, answers commands, and
-// misbehaves as the properties of keys.h and faults.h say.
+// The simulated touch daemon: publishes its service on the vendor binder and answers commands. The
+// properties in keys.h and faults.h make it fail.
 #include <android/log.h>
 #include <sys/system_properties.h>
 #include <sys/time.h>
@@ -34,9 +34,9 @@ using std::chrono::milliseconds;
 
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr uint32_t kExecuteCommandCode = 0;
-// Long enough to send the reply, far too short for anything else.
+// Just long enough to send the reply.
 constexpr int kDieAfterReplyUs = 2000;
-// The names of a phone's commands, each between spaces.
+// The names of the phone's commands, each between spaces for the search.
 constexpr char kCommands[] = " " TPD_DAEMON_COMMANDS " ";
 
 const android::StaticString16 kDescriptor(
@@ -56,7 +56,7 @@ std::string Help() {
            "THP_GetVersion (virtual device only)";
 }
 
-// What the daemon answers to a command. Commands that only act answer that they are done.
+// Returns the answer to a command.
 std::string Answer(const std::string& command, const std::string& params) {
     if (const std::optional<std::string> recorded = device::FindAnswer(command, params)) {
         return *recorded;
@@ -68,11 +68,11 @@ std::string Answer(const std::string& command, const std::string& params) {
         return "captest " + (params.empty() ? "idle_test" : params) + ": PASS";
     }
     if (command == "TSA_ExecuteCommand") {
-        // The parameters are a command of their own: its name, then a space and its parameters.
+        // The parameters are another command: its name, a space and its parameters.
         const size_t space = std::min(params.find(' '), params.length());
         const std::string name = params.substr(0, space);
         return name.empty() || name == command
-                       ? command + ": which command?"
+                       ? command + ": missing or invalid command"
                        : Answer(name, space < params.length() ? params.substr(space + 1) : "");
     }
     if (command == "THP_GetScreenState") {
@@ -100,8 +100,7 @@ std::string Answer(const std::string& command, const std::string& params) {
     abort();
 }
 
-// Kills the process once the reply of this call is on its way. A timer cannot fail for want of a
-// thread.
+// Kills the process after the reply has been sent. A timer cannot fail to start as a thread can.
 void DieAfterReply() {
     constexpr itimerval kDelay = {{0, 0}, {0, kDieAfterReplyUs}};
     [[maybe_unused]] static const int started = setitimer(ITIMER_REAL, &kDelay, nullptr);

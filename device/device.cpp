@@ -1,5 +1,5 @@
-// The virtual device for people and scripts: starts, stops and enters it. The kernel knows which
-// process runs it: init holds a record lock, and asking who holds it takes no lock.
+// The command that starts, stops and uses the virtual device. Init holds a record lock while the
+// device runs; F_GETLK finds the holder without taking the lock.
 #include <fcntl.h>
 #include <limits.h>
 #include <poll.h>
@@ -28,7 +28,7 @@
 #include "platform/unique_fd.h"
 #include "shell.h"
 
-// The C library's header declares them without the C linkage that they have.
+// The C library's header lacks extern "C".
 extern "C" {
 #include <sys/pidfd.h>
 }
@@ -46,21 +46,24 @@ constexpr int kStopLimitMs = 5000;
 constexpr std::chrono::milliseconds kPollPause(5);
 
 constexpr char kUsage[] =
-        "usage: device start [--permissive]  boots it, SELinux Enforcing without the option;\n"
-        "                                    status 0 once its daemon is alive\n"
-        "       device reboot                stops it and boots it again, SELinux Enforcing\n"
-        "       device stop\n"
-        "       device status                status 3 when it is stopped, 4 when unknown\n"
-        "       device root                  prints the directory of its files, and makes it\n"
-        "       device shell [COMMAND...]    as `adb shell`\n"
-        "       device run [ARGUMENT...]     runs the tool; boots a stopped device Permissive\n"
+        "usage: device start [--permissive]  boots the device, waits for its daemon;\n"
+        "                                    SELinux is Enforcing without the option\n"
+        "       device reboot                stops and boots the device, SELinux Enforcing\n"
+        "       device stop                  stops the device\n"
+        "       device status                exits with 3 when stopped, 4 when unknown\n"
+        "       device root                  prints the directory of its files; creates it\n"
+        "                                    when it is missing\n"
+        "       device shell [COMMAND...]    runs a command or the shell, as `adb shell`\n"
+        "       device run [ARGUMENT...]     runs the tool; boots a stopped device in\n"
+        "                                    permissive mode\n"
         "       device trace [--bytes] [--json | --mermaid] ARGUMENT...\n"
         "                                    runs the tool and shows what all processes did\n"
         "       device fault [NAME [ARGUMENT] [COUNT] | none]\n"
-        "                                    gives the daemon a fault; alone: lists them\n"
+        "                                    sets the daemon's fault; lists all faults\n"
+        "                                    without arguments\n"
         "       device answer [COMMAND TEXT | COMMAND - | --remove COMMAND]\n"
-        "                                    records an answer, `-` from standard input; alone:\n"
-        "                                    lists the commands that have one\n";
+        "                                    records an answer, `-` from standard input;\n"
+        "                                    lists recorded ones without arguments\n";
 
 int Usage() {
     fputs(kUsage, stderr);
@@ -94,8 +97,8 @@ std::filesystem::path ProgramOf(pid_t process, std::error_code& error) {
     return std::filesystem::read_symlink("/proc/" + std::to_string(process) + "/exe", error);
 }
 
-// One look at who holds init's lock: the process, 0 for nobody, or -1 and the reason why that
-// cannot be found out.
+// Returns the process that holds init's lock, 0 when it is free, or -1 with the reason when the
+// holder cannot be identified.
 pid_t LookForInit(std::string& reason) {
     const UniqueFd lock = host::OpenFile(host::kInitLockFile, O_RDONLY);
     if (!lock.ok() && errno == ENOENT) {
@@ -113,26 +116,27 @@ pid_t LookForInit(std::string& reason) {
     } else if (const auto program = ProgramOf(holder.l_pid, error); error) {
         reason = "process " + std::to_string(holder.l_pid) + ": " + error.message();
     } else if (program.filename().string().rfind("init", 0) != 0) {
-        reason = program.string() + ", which is not init, holds " + host::kInitLockFile;
+        reason = std::string(host::kInitLockFile) + " is held by " + program.string() +
+                 ", which is not init";
     } else {
         return holder.l_pid;
     }
     return -1;
 }
 
-// The process that runs the device, or 0; -1 after a message. Looks again for a while: an init that
-// exits loses its executable before its lock.
+// Returns init's process, 0 when the device is stopped, or -1 after an error message. Retries
+// because an exiting init loses its /proc executable link before its lock.
 pid_t FindInit() {
     pid_t init = -1;
     std::string reason;
     WaitUntil(kFindLimitMs, [&init, &reason] { return (init = LookForInit(reason)) >= 0; });
     if (init < 0) {
-        Fail("cannot find out whether the device runs: " + reason);
+        Fail("cannot tell whether the device is running: " + reason);
     }
     return init;
 }
 
-// Whether the device runs; a message says why not.
+// Returns whether the device is running; prints an error when it is not.
 bool ExpectRunning() {
     const pid_t init = FindInit();
     if (init == 0) {
@@ -141,15 +145,14 @@ bool ExpectRunning() {
     return init > 0;
 }
 
-// Whether the process, unless it has just exited, runs the init that was built last.
+// Whether the process runs the current init executable. True when it has just exited.
 bool IsCurrentBuild(pid_t init) {
     std::error_code error;
     const std::filesystem::path program = ProgramOf(init, error);
     return error || program == device::PathBesideProgram("init");
 }
 
-// Sends SIGTERM, then SIGKILL after a time-out. The descriptor stands for this one process even
-// when its number passes to another.
+// Sends SIGTERM, then SIGKILL after a time-out. The pidfd protects against a reused process number.
 int Stop(int argc, char** argv) {
     const pid_t init = FindInit();
     if (init <= 0) {
@@ -189,11 +192,11 @@ int AwaitDaemon() {
     }
     return device::IsDaemonAlive()
                    ? 0
-                   : Fail("the daemon is not alive; `device shell logcat -d` may say why, "
-                          "`device shell tpd start` starts one that was stopped");
+                   : Fail("the daemon is not alive; see `device shell logcat -d`, or start a "
+                          "stopped daemon with `device shell tpd start`");
 }
 
-// Starts init and waits until it has booted the device. Init reports what fails there.
+// Starts init and waits until it has booted the device. Init prints its own errors.
 int Boot(const char* selinuxMode) {
     int report[2];
     if (pipe2(report, O_CLOEXEC) != 0) {
@@ -215,14 +218,13 @@ int Boot(const char* selinuxMode) {
     writer.reset();
     char byte = 0;
     if (read(reader.get(), &byte, 1) != 1) {
-        return Fail("did not start");
+        return Fail("init did not boot the device");
     }
     Say("started in " + host::DeviceRootPath() + ", SELinux is " + selinuxMode);
     return AwaitDaemon();
 }
 
-// Boots the device unless it runs already, from this build. Waits for a start in progress, which
-// holds a lock on the root.
+// Boots the device unless it already runs from this build. A lock on the root serializes starts.
 int BringUp(const char* selinuxMode) {
     const UniqueFd root = host::OpenDirectory(".");
     const auto isFree = [&root] {
@@ -239,7 +241,7 @@ int BringUp(const char* selinuxMode) {
         return init < 0 ? 1 : 0;
     }
     if (isOther) {
-        Say("runs another build");
+        Say("the device runs another build; rebooting it");
         if (Stop(0, nullptr) != 0) {
             return 1;
         }
@@ -255,7 +257,7 @@ int Start(int argc, char** argv) {
     const pid_t init = FindInit();
     const int status = BringUp(isPermissive ? "Permissive" : "Enforcing");
     if (init > 0 && status == 0 && FindInit() == init) {
-        Say("already running, left as it is; SELinux is " + device::SelinuxMode());
+        Say("already running; SELinux is " + device::SelinuxMode());
     }
     return status != 0 ? status : AwaitDaemon();
 }
@@ -293,12 +295,12 @@ int Run(int argc, char** argv) {
     return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
 }
 
-// The recorder gets the device root as a descriptor, whose number is its first argument.
+// Passes trace.py the number of a device root descriptor as its first argument.
 int Trace(int argc, char** argv) {
     if (!ExpectRunning()) {
         return 1;
     }
-    host::LookForTrace();  // removes what a killed recorder left behind
+    host::LookForTrace();  // removes the file of a killed trace
     const std::string root = std::to_string(dup(host::DeviceRoot()));
     std::vector<const char*> arguments = {root.c_str()};
     arguments.insert(arguments.end(), argv, argv + argc);

@@ -23,7 +23,7 @@ constexpr int kFailure = 1;
 constexpr int kUsageError = 2;
 
 struct Range {
-    const char* name;  // null when there is no number
+    const char* name;  // null when the fault has no argument
     int64_t min;
     int64_t max;
 };
@@ -37,9 +37,10 @@ constexpr struct FaultRow {
     const char* effect;
     Range argument;
 } kFaults[] = {
-        {FaultKind::kNone, "none", "behaves", kNoArgument},
-        {FaultKind::kDieBefore, "die_before", "dies before it works on the command", kNoArgument},
-        {FaultKind::kDieDuring, "die_during", "works, then dies before it replies", kNoArgument},
+        {FaultKind::kNone, "none", "works normally", kNoArgument},
+        {FaultKind::kDieBefore, "die_before", "dies before it processes the command", kNoArgument},
+        {FaultKind::kDieDuring, "die_during", "processes the command, then dies before it replies",
+         kNoArgument},
         {FaultKind::kDieAfter, "die_after", "replies, then dies", kNoArgument},
         {FaultKind::kCaptestRestart, "captest_restart", "replies, then dies, for captest only",
          kNoArgument},
@@ -54,16 +55,16 @@ int Fail(int status, const std::string& why) {
     return status;
 }
 
-// Stores the number in `number`. Returns nothing, or why the word is not a number of this range.
+// Stores the word's value in `number`. Returns an empty string, or an error when it is invalid.
 std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
     number = strtoll(word.c_str(), nullptr, 10);
     return IsNumberWithin(word, range.min, range.max)
                    ? ""
-                   : std::string("invalid ") + range.name + " '" + word + "'; " +
+                   : std::string("invalid ") + range.name + " '" + word + "'; use " +
                              std::to_string(range.min) + " to " + std::to_string(range.max);
 }
 
-// Reads NAME [ARGUMENT] [COUNT]. Returns nothing, or which word is wrong.
+// Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error that names the invalid word.
 std::string ParseFault(const std::string& text, Fault& fault) {
     std::istringstream words(text);
     const auto nextWord = [&words] {
@@ -94,8 +95,8 @@ std::string ParseFault(const std::string& text, Fault& fault) {
     return error.empty() ? "" : "fault " + name + ": " + error;
 }
 
-// Waits until no other process or thread reads and then writes the fault. The lock is on the
-// directory of properties and ends with the descriptor.
+// Serializes changes of the fault between processes and threads by locking the directory of
+// properties. Closing the descriptor releases the lock.
 host::UniqueFd LockFault() {
     host::UniqueFd lock = host::OpenDirectory(host::kPropertiesDirectory);
     if (lock.ok() && flock(lock.get(), LOCK_EX) != 0) {

@@ -1,5 +1,5 @@
-// The faults of the simulated daemon. The one that is set is the property sim.fault:
-// NAME [ARGUMENT] [COUNT], as the arguments of `device fault`; anything else is no fault.
+// The faults of the simulated daemon. The property sim.fault holds the current one as
+// NAME [ARGUMENT] [COUNT], like the arguments of `device fault`. An invalid value is ignored.
 #pragma once
 
 #include <cstdint>
@@ -21,15 +21,15 @@ enum class FaultKind {
 
 struct Fault {
     FaultKind kind = FaultKind::kNone;
-    int64_t argument = 0;  // what it is depends on the kind
-    int64_t count = 0;     // the number of calls that it affects; 0: all of them
+    int64_t argument = 0;  // the meaning depends on the kind
+    int64_t count = 0;     // of calls that the fault affects; 0: all
 };
 
-// Returns the fault that affects a call of this command, and counts the call.
+// Returns the fault for a call of this command and decrements its remaining count.
 Fault TakeFault(const std::string& command);
 
-// `device fault`: sets the fault that the arguments name, or lists all faults when there are none.
-// Returns the exit status: 2 for a usage error.
+// `device fault`: sets the fault given by the arguments, or lists all faults without arguments.
+// Returns the exit status, 2 for a usage error.
 int SetOrListFaults(int argc, char** argv);
 
 }  // namespace device

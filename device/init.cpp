@@ -1,9 +1,9 @@
-// The part of the device's init that boots it and controls the touch daemon: starts and stops it as
-// "odm.thp.service_enable" says, and restarts it, counting, when it exits on its own.
+// The device's init: boots the device and supervises the touch daemon. "odm.thp.service_enable"
+// starts and stops the daemon. Init restarts a daemon that exits, and counts the restarts.
 //
-// init MODE: boots the device root with SELinux in that mode. One byte on standard output says that
-// the device is booted; a failure before that goes to standard error. Exits on SIGTERM or SIGINT,
-// or when the directory of properties goes away.
+// init MODE: boots the device root with SELinux in that mode. Writes one byte to standard output
+// when the device has booted; prints earlier failures to standard error. Exits on SIGTERM or
+// SIGINT, or when the directory of properties is removed.
 #include <android/log.h>
 #include <fcntl.h>
 #include <poll.h>
@@ -36,7 +36,7 @@ namespace {
 using host::UniqueFd;
 
 constexpr char kDriverDirectory[] = "dev/vndbinder";
-// A daemon that was alive is back soon; the pause doubles for one that exits before it is.
+// The pause doubles while the daemon exits before it is alive.
 constexpr int kMinRestartPauseMs = 50;
 constexpr int kMaxRestartPauseMs = 5000;
 
@@ -55,14 +55,14 @@ constexpr const char* kBootProperties[][2] = {{device::kBuildIdKey, "VIRTUAL-11.
                                               {device::kIsUpdatingFirmwareKey, "false"},
                                               {device::kServiceEnableKey, "1"}};
 
-// Says what failed and, from errno, why.
+// Prints what failed and the reason in errno.
 int Fail(const char* what) {
     fprintf(stderr, "init: %s: %s\n", what, strerror(errno));
     return 1;
 }
 
-// Removes files of a directory, which is made when it is missing. Returns whether it could be
-// opened.
+// Removes the files of a directory, except those with the kept prefix. Creates the directory when
+// it is missing. Returns false when it cannot be opened.
 bool Empty(const char* path, const std::string& keptPrefix = "/") {
     const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
     if (!directory.ok()) {
@@ -76,8 +76,8 @@ bool Empty(const char* path, const std::string& keptPrefix = "/") {
     return true;
 }
 
-// Makes this process the device's one init. The kernel releases a record lock when the process
-// closes any descriptor of the file: nothing else may open it here.
+// Makes this process the device's only init. Closing any descriptor of the file would release the
+// record lock, so this process must not open the file again.
 bool LockDevice() {
     static const UniqueFd file = host::OpenFile(host::kInitLockFile, O_RDWR | O_CREAT);
     struct flock whole = {};
@@ -85,7 +85,7 @@ bool LockDevice() {
     return file.ok() && fcntl(file.get(), F_SETLK, &whole) == 0;
 }
 
-// Also replaces read-only ones that another process has just written.
+// Also replaces read-only properties that another process has just written.
 bool SetBootProperties() {
     return std::all_of(
             std::begin(kBootProperties), std::end(kBootProperties), [](const auto& each) {
@@ -93,8 +93,8 @@ bool SetBootProperties() {
             });
 }
 
-// The state of a device that has just been switched on. Returns what could not be prepared, or
-// null.
+// Resets the device's files to the state after power-on. Returns null, or the file or directory
+// that could not be reset.
 const char* Boot(const char* selinuxMode) {
     const host::TraceEvent event("boot");
     if (!Empty(host::kTemporaryDirectory)) {
@@ -112,7 +112,7 @@ const char* Boot(const char* selinuxMode) {
     return host::ReplaceFile(host::kSelinuxFile, selinuxMode) ? nullptr : host::kSelinuxFile;
 }
 
-// Whether a property that init follows was written since the last call.
+// Whether a property that init watches was written since the last call.
 bool DrainEvents(const UniqueFd& watch) {
     alignas(inotify_event) char events[16384];
     const ssize_t size = read(watch.get(), events, sizeof(events));
@@ -129,9 +129,8 @@ bool DrainEvents(const UniqueFd& watch) {
 
 class DaemonSupervisor {
   public:
-    // Follows a write. Of several quick writes only the last value can be read: "1" for a running
-    // daemon means that "0" came before it. Writes until the daemon has exited are followed at
-    // once.
+    // Applies a write by stopping the daemon first. After quick writes of "0" and "1", only "1" can
+    // be read, but the daemon must still restart. Writes during the stop are applied here, too.
     void Restart(const UniqueFd& watch) {
         Stop();
         DrainEvents(watch);
@@ -139,7 +138,7 @@ class DaemonSupervisor {
         mPauseMs = 0;
     }
 
-    // Notices that the daemon has exited, and starts one that is to run. False when that failed.
+    // Reaps a daemon that has exited, and starts one if enabled. Returns false when fork() fails.
     bool ReapAndStart() {
         ReapDaemon();
         if (mDaemon < 0 && mIsEnabled) {
@@ -162,7 +161,7 @@ class DaemonSupervisor {
     }
 
   private:
-    // The daemon dies with init, also when init has died before this begins.
+    // The daemon dies with init, even if init dies before prctl().
     [[noreturn]] void RunDaemon(pid_t init) const {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
         sigset_t none;
@@ -196,8 +195,9 @@ class DaemonSupervisor {
         __system_property_set(device::kRestartCountKey, std::to_string(next).c_str());
         host::TraceEvent("restart_pause").Add("ms", mPauseMs);
         if (mPauseMs == kMinRestartPauseMs * 2) {
-            __android_log_print(ANDROID_LOG_ERROR, nullptr,
-                                "corvane_daemon does not come up; trying again at growing pauses");
+            __android_log_print(
+                    ANDROID_LOG_ERROR, nullptr,
+                    "corvane_daemon exits before it is alive; retrying with increasing pauses");
         }
     }
 
@@ -211,10 +211,10 @@ class DaemonSupervisor {
 
     pid_t mDaemon = -1;
     bool mIsEnabled = false;
-    int mPauseMs = 0;  // before the next daemon runs; its process waits
+    int mPauseMs = 0;  // before the next daemon runs; the child process waits
 };
 
-// Signal handling, descriptors, session and directory as they are for no caller in particular.
+// Drops the caller's descriptors, signal handling, session and working directory.
 bool Daemonize() {
     close_range(STDERR_FILENO + 1, ~0U, 0);
     for (int number = 1; number < NSIG; ++number) {
@@ -224,7 +224,7 @@ bool Daemonize() {
     return chdir("/") == 0;
 }
 
-// Makes the signals that terminate this process or report its daemon readable.
+// Returns a descriptor that reads SIGCHLD and the signals that terminate init.
 UniqueFd OpenSignals() {
     sigset_t signals;
     sigemptyset(&signals);
@@ -235,7 +235,7 @@ UniqueFd OpenSignals() {
     return UniqueFd(signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK));
 }
 
-// Watches the properties, and the root for the directory of properties to go away.
+// Watches for writes of properties and for the removal of their directory.
 UniqueFd OpenWatch() {
     UniqueFd watch(inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
     const auto add = [&watch](int directory, uint32_t events) {
@@ -253,7 +253,7 @@ bool ExitRequested(const UniqueFd& signals) {
     return isSignaled && signal.ssi_signo != SIGCHLD;
 }
 
-// Whether other processes still find the directory of properties that this one follows.
+// Whether the directory of properties is still the one that init watches.
 bool PropertiesExist() {
     struct stat followed = {};
     struct stat found = {};
@@ -263,7 +263,7 @@ bool PropertiesExist() {
            followed.st_ino == found.st_ino;
 }
 
-// Reports that the device is booted to the process that waits for it, and lets go of the streams.
+// Tells the waiting `device start` that the device has booted, and closes the standard streams.
 void ReportBoot(const UniqueFd& null) {
     [[maybe_unused]] const ssize_t written = write(STDOUT_FILENO, "\n", 1);
     for (const int stream : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {

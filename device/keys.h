@@ -1,9 +1,9 @@
-// The property keys by which init, the daemon and the programs of the device work together.
+// The property keys shared by init, the daemon and the other programs of the device.
 #pragma once
 
 namespace device {
 
-// As on a phone.
+// The same as on a phone.
 constexpr char kBootCompletedKey[] = "sys.boot_completed";
 constexpr char kBuildIdKey[] = "ro.build.display.id";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
@@ -13,8 +13,8 @@ constexpr char kIsUpdatingFirmwareKey[] = "odm.thp.is_updating_fw";
 constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 
-// What the simulated daemon is to do: the time that it takes to come up, whether it updates its
-// firmware ("true"), and its fault (see faults.h).
+// Control the simulated daemon: its startup delay, whether a firmware update is in progress
+// ("true"), and its fault (see faults.h).
 constexpr char kBootDelayKey[] = "sim.boot_delay_ms";
 constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 constexpr char kFaultKey[] = "sim.fault";

@@ -56,7 +56,7 @@ struct Options {
     std::string format = "threadtime";
     std::optional<int64_t> pid;
     std::unique_ptr<regex_t, FreePattern> pattern;
-    // The lowest priority that is shown of a tag.
+    // The lowest priority to show for each tag.
     std::map<std::string, int> filters = {{kOtherTags, ANDROID_LOG_VERBOSE}};
 };
 
@@ -68,7 +68,7 @@ bool AddFilter(const std::string& filter, Options& options) {
     return priority >= 0 && colon != 0;
 }
 
-// Whether a device has all these buffers. One log serves them.
+// Whether the comma-separated names are all known buffers. They share one log.
 bool AreBuffers(const std::string& names) {
     const std::set<std::string> buffers = {"all",    "crash", "default", "events",
                                            "kernel", "main",  "radio",   "system"};
@@ -150,7 +150,7 @@ bool IsShown(const LogEntry& entry, const Options& options) {
 
 class LogReader {
   public:
-    // Leaves the reason in errno.
+    // Returns false with errno set on failure.
     bool Open() {
         mLog = host::OpenFile(host::kLogFile, O_RDONLY);
         struct stat status = {};
@@ -161,9 +161,9 @@ class LogReader {
         return S_ISREG(status.st_mode);  // a FIFO has no end
     }
 
-    // Goes back to the beginning of a log that was emptied since the last call. Its first entry is
-    // another one then, even when it has become longer again.
-    void FindBeginning() {
+    // Restarts at the beginning when the log was cleared since the last call. Its first entry has
+    // changed then, even if the log has grown past the old position.
+    void RewindIfCleared() {
         host::LogEntryHeader first = {};
         const bool hasFirst = pread(mLog.get(), &first, sizeof(first), 0) == sizeof(first);
         if (!hasFirst || memcmp(&first, &mFirst, sizeof(first)) != 0) {
@@ -172,7 +172,7 @@ class LogReader {
         }
     }
 
-    // Reads the next entry, if there is a whole one.
+    // Reads the next entry. Returns false when there is no complete entry.
     bool Read(LogEntry& entry) {
         if (pread(mLog.get(), &entry.header, sizeof(entry.header), mNext) != sizeof(entry.header)) {
             return false;
@@ -224,7 +224,7 @@ void PrintHeader(const LogEntry& entry, const std::string& format) {
     }
 }
 
-// An entry of several lines is shown as several lines with the same header.
+// Prints the header before every line of the entry.
 void PrintEntry(const LogEntry& entry, const std::string& format) {
     size_t begin = 0;
     do {
@@ -235,10 +235,9 @@ void PrintEntry(const LogEntry& entry, const std::string& format) {
     } while (begin < entry.text.length());
 }
 
-// Prints what was logged since the last call, but not more than the last entries that were asked
-// for.
+// Prints the entries since the last call, at most the last `options.count`.
 void PrintNewEntries(LogReader& log, const Options& options) {
-    log.FindBeginning();
+    log.RewindIfCleared();
     std::deque<LogEntry> entries;
     for (LogEntry entry = {}; log.Read(entry);) {
         if (IsShown(entry, options)) {
@@ -284,7 +283,7 @@ int Logcat(int argc, char** argv) {
     if (options.file != nullptr && freopen(options.file, "a", stdout) == nullptr) {
         return Fail(options.file);
     }
-    pollfd output = {STDOUT_FILENO, 0, 0};  // ready when its reader goes
+    pollfd output = {STDOUT_FILENO, 0, 0};  // ready when the reader closes the pipe
     do {
         PrintNewEntries(log, options);
     } while (fflush(stdout) == 0 && options.follow && poll(&output, 1, kFollowPauseMs) == 0);

@@ -30,11 +30,12 @@ int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
     return Fail(program + ": " + strerror(errno));
 }
 
-// The directory of the device's commands. Empty, after a message, when PATH cannot contain it.
+// Returns the directory of the device's commands. Prints an error and returns an empty string when
+// the directory cannot be in PATH.
 std::string CommandDirectory() {
     std::string bin = PathBesideProgram("bin");
     if (bin.find(':') != std::string::npos) {
-        Fail("'" + bin + "' cannot be in PATH because of its ':'; use another build directory");
+        Fail("'" + bin + "' cannot be in PATH: it contains ':'; use another build directory");
         return "";
     }
     return bin;
@@ -68,7 +69,7 @@ int Shell(int argc, char** argv) {
     if (bin.empty()) {
         return 1;
     }
-    // What an interactive shell reads and shows.
+    // The startup file and the prompt of an interactive shell.
     setenv("ENV", "/dev/null", 1);
     setenv("PS1", "virtual:$PWD # ", 1);
     if (argc == 0) {

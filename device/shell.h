@@ -1,4 +1,4 @@
-// The device's shell, and how a program of the device is executed.
+// Runs the device's shell and other programs in the device's environment.
 #pragma once
 
 #include <string>
@@ -6,16 +6,16 @@
 
 namespace device {
 
-// Marks this process and its children as the device's: its `ps` shows them. They use this root.
+// Makes this process and its children use the device root and appear in the device's `ps`.
 void EnterDevice();
 
-// Replaces this process by a program that finds the device's commands and the tool before those of
-// the machine. Returns 1, after a message, on failure.
+// Replaces this process with a program, with the device's commands first in PATH. On failure,
+// prints an error and returns 1.
 int Exec(const std::string& program, std::vector<const char*> arguments);
 
-// Replaces this process by the device's shell. The arguments, joined by spaces, are one command, as
-// for `adb shell`; without any the shell reads its standard input. Returns 1, after a message, on
-// failure.
+// Replaces this process with the device's shell. As with `adb shell`, the arguments are joined by
+// spaces into one command; without arguments the shell reads standard input. On failure, prints an
+// error and returns 1.
 int Shell(int argc, char** argv);
 
 }  // namespace device

@@ -1,5 +1,5 @@
-// The device's own shell commands in one program, selected by argv[0]. They use the platform's own
-// calls, so that the rules for names, sizes and access are one set.
+// The device's own shell commands in one program, selected by argv[0]. They use the platform's
+// functions, so the same rules for names, sizes and access apply.
 #include <android/log.h>
 #include <limits.h>
 #include <strings.h>
@@ -27,7 +27,7 @@ int Fail(const char* what) {
     return 1;
 }
 
-// The whole value. What __system_property_get() fills its buffer with may be a part of it.
+// Returns the whole value; __system_property_get() truncates a long one.
 std::string WholeProperty(const std::string& name) {
     const std::string value = device::GetProperty(name.c_str());
     const bool isCut = value.length() == PROP_VALUE_MAX - 1;
@@ -51,7 +51,7 @@ int Getprop(int argc, char** argv) {
 int Setprop(int /* argc */, char** argv) {
     const char* const name = argv[1];
     const std::string value = argv[2];
-    // The value that the property has already is no change: init would act on it.
+    // Do not write an unchanged value: init acts on every write.
     if ((!value.empty() && device::GetProperty(name) == value) ||
         __system_property_set(name, value.c_str()) == 0) {
         return 0;
@@ -152,7 +152,7 @@ int Reboot(int /* argc */, char** /* argv */) {
 
 constexpr struct {
     const char* name;
-    int minArguments;  // with the name
+    int minArguments;  // including argv[0]
     int maxArguments;
     int (*run)(int argc, char** argv);
     const char* arguments;
@@ -163,7 +163,7 @@ constexpr struct {
         {"logcat", 1, INT_MAX, device::Logcat,
          "[-d] [-c] [-t COUNT] [-f FILE] [-b BUFFER,...] [--pid PID] [-e REGEX]\n"
          "              [-v threadtime|time|brief|tag|raw|epoch] [-s] [TAG[:V|D|I|W|E|F|S]...]\n"
-         "tag * is for all others"},
+         "tag * matches all other tags"},
         {"reboot", 1, 1, Reboot, ""},
         {"setenforce", 2, 2, Setenforce, "enforcing|permissive|1|0"},
         {"setprop", 3, 3, Setprop, "NAME VALUE"},
@@ -187,10 +187,11 @@ int main(int argc, char** argv) {
             fprintf(stderr, "usage: %s %s\n", command.name, command.arguments);
             return 1;
         }
-        // A reader that has gone needs nothing more and is no error.
+        // A closed pipe is not an error.
         const bool flushed = fflush(stdout) == 0 && ferror(stdout) == 0;
         return flushed || errno == EPIPE ? status : Fail("cannot write");
     }
-    fputs("toolbox: run it by the name of one of its commands\n", stderr);
+    fprintf(stderr, "toolbox: unknown command '%s'; run a command in device/bin\n",
+            program_invocation_short_name);
     return 1;
 }

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Runs the tool on the device and shows what it, the daemon and init did meanwhile."""
+"""Runs the tool on the device and shows what the tool, the daemon and init did."""
 import argparse
 import contextlib
 import fcntl
@@ -13,13 +13,13 @@ import sys
 import time
 
 TRACE = "trace"
-ESCAPES = {ord("#"): "#35;", ord(";"): "#59;"}  # of a diagram
-QUIET_S = 0.15  # without an event: whatever the command set off has happened
-REST_LIMIT_S = 5
+ESCAPES = {ord("#"): "#35;", ord(";"): "#59;"}  # in Mermaid text
+QUIET_S = 0.15  # The device is idle after this time without an event.
+IDLE_TIMEOUT_S = 5
 NAMES = {"tpd": "tool", "corvane_daemon": "daemon"}
 
 
-# `end`, `found`, `size` and `way` are made from what was recorded.
+# describe() computes `end`, `found`, `size` and `way`; the other fields are as recorded.
 DESCRIPTIONS = {
     "property_read": 'reads {name}: "{value}"',
     "property_write": 'writes {name}: "{old}" -> "{new}", status {status}',
@@ -52,12 +52,12 @@ ARROWS = {
 
 
 def shown(text):
-    """The bytes, which the trace holds as one code point each, as readable text"""
+    """Decodes recorded text, in which each code point is one byte, and escapes it"""
     return escaped(text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace"))
 
 
 def escaped(text):
-    """The text without characters that a terminal acts on"""
+    """Escapes control characters and other unprintable characters"""
     return "".join(c if c.isprintable() else repr(c)[1:-1] for c in text)
 
 
@@ -87,7 +87,7 @@ def hexdump(request):
 
 @contextlib.contextmanager
 def recording(root):
-    """Turns tracing on: the file is locked before it has its name, and as long as this runs."""
+    """Turns tracing on. Holds the file's lock, taken before the file gets its final name."""
     temporary = f"{os.getpid()}.{TRACE}"
     directory = os.open("tmp", os.O_DIRECTORY | os.O_NOFOLLOW, dir_fd=root)
     trace = os.open(temporary, os.O_RDWR | os.O_CREAT | os.O_EXCL, 0o600, dir_fd=directory)
@@ -108,14 +108,14 @@ def recording(root):
 def read_trace(trace):
     events = []
     for line in os.pread(trace, os.fstat(trace).st_size, 0).decode("ascii").splitlines():
-        # The last line may still be on its way, and a full disk cuts lines short.
+        # The last line may be incomplete, and a full disk truncates lines.
         with contextlib.suppress(json.JSONDecodeError):
             events.append(json.loads(line))
     return sorted(events, key=lambda event: event["time"])
 
 
 def is_idle(events):
-    """Whether nothing happens any more and no daemon is on its way up"""
+    """Whether there are no recent events and no daemon is starting"""
     life = [
         event["what"]
         for event in events
@@ -127,13 +127,13 @@ def is_idle(events):
 
 
 def record(trace, arguments):
-    """What happened while the tool ran and until the device is idle, and the result text"""
+    """Runs the tool, waits until the device is idle, and returns the events and the output"""
     try:
         tool = subprocess.run(["tpd", *arguments], stdout=subprocess.PIPE, check=False)
         result = tool.stdout.decode(errors="backslashreplace")
     except KeyboardInterrupt:
         result = "(interrupted)\n"
-    limit = time.monotonic() + REST_LIMIT_S
+    limit = time.monotonic() + IDLE_TIMEOUT_S
     while not is_idle(events := read_trace(trace)) and time.monotonic() < limit:
         time.sleep(0.02)
     return events, result
@@ -161,7 +161,7 @@ def main():
     form.add_argument("--json", action="store_true", help="print the events as recorded")
     form.add_argument("--mermaid", action="store_true", help="print a sequence diagram")
     parser.add_argument("arguments", nargs=argparse.REMAINDER, metavar="ARGUMENT")
-    root = int(sys.argv[1])  # the device root's descriptor, from `device`
+    root = int(sys.argv[1])  # `device` passes the device root's descriptor.
     options = parser.parse_args(sys.argv[2:])
     if options.arguments[:1] == ["--"]:
         del options.arguments[0]

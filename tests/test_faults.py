@@ -92,10 +92,10 @@ def test_captest_restart_applies_to_captest_only(device):
 
 USAGE_ERRORS = {
     "hangg": "unknown fault 'hangg'; 'device fault' lists them",
-    "hang": "fault hang: invalid MILLISECONDS ''; 0 to 1000000000",
-    "hang 1O0": "fault hang: invalid MILLISECONDS '1O0'; 0 to 1000000000",
-    "huge 67108865": "fault huge: invalid BYTES '67108865'; 0 to 67108864",
-    "no_text 0": "fault no_text: invalid COUNT '0'; 1 to 2147483647",
+    "hang": "fault hang: invalid MILLISECONDS ''; use 0 to 1000000000",
+    "hang 1O0": "fault hang: invalid MILLISECONDS '1O0'; use 0 to 1000000000",
+    "huge 67108865": "fault huge: invalid BYTES '67108865'; use 0 to 67108864",
+    "no_text 0": "fault no_text: invalid COUNT '0'; use 1 to 2147483647",
     "none 1": "fault none: unexpected argument '1'",
 }
 
