@@ -1,7 +1,11 @@
 // The host implementation of the platform, on this process's own device root.
 #include <android/log.h>
+#include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
+#include <binder/ProcessState.h>
+#include <fcntl.h>
 #include <gmock/gmock.h>
+#include <sys/file.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/system_properties.h>
@@ -16,6 +20,8 @@
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/log_file.h"
+#include "platform/trace.h"
+#include "platform/unique_fd.h"
 
 namespace {
 
@@ -60,6 +66,19 @@ TEST(DeviceRootDeathTest, RefusesUnmarkedDirectoriesWithFiles) {
     EXPECT_EXIT(ExpectRefusal(root), refused, "contains files that do not belong to a device");
     std::ofstream(root + "/.tpd-device");
     EXPECT_EXIT(ExpectRefusal(root), testing::ExitedWithCode(1), "");
+}
+
+TEST(DeviceRootPathTest, ComesFromTheEnvironment) {
+    setenv("HOME", "/home/user", 1);
+    setenv("XDG_STATE_HOME", "/state", 1);
+    EXPECT_EQ(host::DeviceRootPath(), kRoot.path);
+    unsetenv("TPD_DEVICE_ROOT");
+    EXPECT_EQ(host::DeviceRootPath(), "/state/tpd-device");
+    unsetenv("XDG_STATE_HOME");
+    EXPECT_EQ(host::DeviceRootPath(), "/home/user/.local/state/tpd-device");
+    unsetenv("HOME");
+    EXPECT_EQ(host::DeviceRootPath(), "");
+    setenv("TPD_DEVICE_ROOT", kRoot.path.c_str(), 1);
 }
 
 TEST(FilesTest, RefusesLinksAtAnyDepth) {
@@ -145,6 +164,25 @@ class TestService : public android::BBinder {
         return static_cast<android::status_t>(code);
     }
 };
+
+TEST(TraceTest, EscapesTextAndKeepsErrno) {
+    EXPECT_TRUE(host::WriteFile(host::kTraceFile, ""));
+    const host::UniqueFd recorder = host::OpenFile(host::kTraceFile, O_RDONLY);
+    ASSERT_EQ(flock(recorder.get(), LOCK_EX), 0);
+    errno = E2BIG;
+    host::TraceEvent("test").Add("text", "a\"\\\n\xff");
+    EXPECT_EQ(errno, E2BIG);
+    std::string line;
+    std::getline(std::ifstream(kRoot.path + "/trace"), line);
+    EXPECT_THAT(line, testing::HasSubstr(R"("text":"a\"\\\u000a\u00ff"})"));
+}
+
+TEST(ServiceManagerTest, WaitsFiveSecondsForAService) {
+    android::ProcessState::initWithDriver(kDriver);
+    const int64_t start = host::MonotonicUs();
+    EXPECT_EQ(android::defaultServiceManager()->getService(android::String16("none")), nullptr);
+    EXPECT_GE(host::MonotonicUs() - start, 4900000);
+}
 
 // The code of a call is the size of its reply in bytes.
 class LongReplyService : public android::BBinder {
