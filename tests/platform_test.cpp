@@ -55,6 +55,10 @@ TEST(DeviceRootDeathTest, RefusesDirectoriesThatAreNotPrivate) {
     EXPECT_EXIT(ExpectRefusal(directory), refused, "is open to other users; its mode must be 0700");
     EXPECT_EXIT(ExpectRefusal(link + "/"), refused, "link: Not a directory");
     EXPECT_EXIT(ExpectRefusal("relative"), refused, "absolute");
+    chmod(directory.c_str(), 0700);
+    if (geteuid() == 0 && chown(directory.c_str(), 1, 1) == 0) {
+        EXPECT_EXIT(ExpectRefusal(directory), refused, "belongs to another user");
+    }
 }
 
 TEST(DeviceRootDeathTest, RefusesUnmarkedDirectoriesWithFiles) {

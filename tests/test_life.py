@@ -111,6 +111,13 @@ def test_second_init_fails(device, build):
     assert len(device.processes("/init")) == 1
 
 
+def test_status_exits_with_3_when_stopped(device):
+    device.output("device", "root")
+    assert device.run("device", "status").returncode == 3
+    device.start()
+    assert device.run("device", "status").returncode == 0
+
+
 def test_restarts_a_device_of_another_build(device, build, tmp_path):
     shutil.copytree(build / "device", tmp_path / "device", symlinks=True)
     device.output(tmp_path / "device/device", "start")

@@ -33,6 +33,11 @@ def test_getprop_prints_long_values_and_defaults(device):
     assert device.output("getprop", "unset", "default") == "default\n"
 
 
+def test_setenforce_switches_selinux(device):
+    modes = [device.output("sh", "-c", f"setenforce {n}; getenforce") for n in (0, 1)]
+    assert modes == ["Permissive\n", "Enforcing\n"]
+
+
 def test_shows_a_missing_setting_as_null(device):
     assert device.output("settings", "get", "system", "missing") == "null\n"
 

@@ -26,7 +26,7 @@ def test_shows_the_steps_of_a_command(trace):
         "tool runs getenforce",
         'tool writes odm.thp.debug.selinux.permissive: "null" -> "true"',
         "tool looks up service.corvaneinterfaceservice: found",
-        "tool calls code 0",
+        "tool calls code 0, two-way",
         "daemon receives captest",
         "daemon answers",
         "tool has its reply",
