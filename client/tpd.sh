@@ -54,7 +54,7 @@ tpd_alive() {
 #   unsent    not sent: the daemon is not alive, or updates its firmware
 #   failed    the daemon may have carried it out, even twice
 #   late      no answer within TPD_LIMIT; the daemon is being restarted
-#   unusable  tpd takes no such arguments; not sent
+#   unusable  not sent: tpd does not accept these arguments
 #   broken    adb or the device failed; TPD_RESULT holds what they printed
 #
 # Returns 0 for "answered", else 1.
