@@ -6,21 +6,23 @@
 #include <sys/system_properties.h>
 #include <unistd.h>
 
+#include <cctype>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <string>
+#include <vector>
 
 #include "common.h"
-#include "logcat.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/libc/properties.h"
+#include "platform/log_file.h"
 
 namespace {
 
-using device::kUsageError;
+constexpr int kUsageError = -1;  // of a command; main() prints the usage
 
 int Fail(const char* what) {
     fprintf(stderr, "%s: %s: %s\n", program_invocation_short_name, what, strerror(errno));
@@ -117,6 +119,16 @@ int Settings(int argc, char** argv) {
     return kUsageError;
 }
 
+// Returns the log priority for the letter, or -1 when it is unknown.
+int PriorityOf(const std::string& letter) {
+    int priority = ANDROID_LOG_SILENT;
+    while (priority >= ANDROID_LOG_VERBOSE &&
+           (letter.length() != 1 || toupper(letter[0]) != host::LogPriorityLetter(priority))) {
+        --priority;
+    }
+    return priority >= ANDROID_LOG_VERBOSE ? priority : -1;
+}
+
 int Log(int argc, char** argv) {
     int priority = ANDROID_LOG_INFO;
     const char* tag = "log";
@@ -124,7 +136,7 @@ int Log(int argc, char** argv) {
     for (int name = 0; (name = getopt(argc, argv, "+p:t:")) != -1;) {
         switch (name) {
             case 'p':
-                priority = device::PriorityOf(optarg);
+                priority = PriorityOf(optarg);
                 valid = valid && priority >= 0;
                 break;
             case 't':
@@ -144,6 +156,16 @@ int Log(int argc, char** argv) {
     return __android_log_print(priority, tag, "%s", text.c_str()) >= 0 ? 0 : Fail("cannot log");
 }
 
+// Passes logcat.py the number of a device root descriptor as its first argument.
+int Logcat(int argc, char** argv) {
+    const std::string script = device::PathBesideProgram("logcat.py");
+    const std::string root = std::to_string(dup(host::DeviceRoot()));
+    std::vector<const char*> arguments = {script.c_str(), root.c_str()};
+    arguments.insert(arguments.end(), argv + 1, argv + argc + 1);  // with the final null pointer
+    execv(script.c_str(), const_cast<char* const*>(arguments.data()));
+    return Fail(script.c_str());
+}
+
 int Reboot(int /* argc */, char** /* argv */) {
     const std::string device = device::PathBesideProgram("device");
     execl(device.c_str(), "device", "reboot", nullptr);
@@ -160,10 +182,7 @@ constexpr struct {
         {"getenforce", 1, 1, Getenforce, ""},
         {"getprop", 1, 3, Getprop, "[NAME [DEFAULT]]"},
         {"log", 2, INT_MAX, Log, "[-p V|D|I|W|E|F|S] [-t TAG] TEXT..."},
-        {"logcat", 1, INT_MAX, device::Logcat,
-         "[-d] [-c] [-t COUNT] [-f FILE] [-b BUFFER,...] [--pid PID] [-e REGEX]\n"
-         "              [-v threadtime|time|brief|tag|raw|epoch] [-s] [TAG[:V|D|I|W|E|F|S]...]\n"
-         "tag * matches all other tags"},
+        {"logcat", 1, INT_MAX, Logcat, ""},
         {"reboot", 1, 1, Reboot, ""},
         {"setenforce", 2, 2, Setenforce, "enforcing|permissive|1|0"},
         {"setprop", 3, 3, Setprop, "NAME VALUE"},

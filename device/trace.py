@@ -1,4 +1,4 @@
-#!/usr/bin/env python3
+#!/usr/bin/python3
 """Runs the tool on the device and shows what the tool, the daemon and init did."""
 import argparse
 import contextlib
@@ -39,7 +39,7 @@ DESCRIPTIONS = {
     "answer": "answers: status {status}, {bytes} bytes",
     "daemon_start": "starts the daemon, process {daemon}",
     "daemon_stop": "stops the daemon, process {daemon}",
-    "daemon_exit": "sees the daemon end, process {daemon}: {end}",
+    "daemon_exit": "reaps the daemon, process {daemon}: {end}",
     "restart_pause": "waits {ms} ms before it starts the daemon",
 }
 ARROWS = {

@@ -1,0 +1,151 @@
+#!/usr/bin/python3
+"""Prints, follows or clears the log of the device whose root is the descriptor ROOT"""
+import argparse
+import os
+import re
+import select
+import signal
+import stat
+import struct
+import sys
+import time
+
+HEADER = struct.Struct("IiiII")  # LogEntryHeader in platform/log_file.h
+BUFFERS = {"all", "crash", "default", "events", "kernel", "main", "radio", "system"}
+PRIORITIES = dict(enumerate("VDIWEF", 2))
+LEVELS = {letter: priority for priority, letter in PRIORITIES.items()} | {"S": 99}
+FORMATS = {
+    "brief": "{letter}/{tag:8}({pid:5}): ",
+    "epoch": "{seconds:19}.{ms:03} {pid:5} {tid:5} {letter} {tag:8}: ",
+    "raw": "",
+    "tag": "{letter}/{tag:8}: ",
+    "threadtime": "{when}.{ms:03} {pid:5} {tid:5} {letter} {tag:8}: ",
+    "time": "{when}.{ms:03} {letter}/{tag:8}({pid:5}): ",
+}
+FOLLOW_PAUSE_MS = 50
+
+
+def buffers(names):
+    """Checks the names of log buffers; they share one log"""
+    if not BUFFERS.issuperset(names.split(",")):
+        raise ValueError
+
+
+def positive(text):
+    if int(text) < 1:
+        raise ValueError
+    return int(text)
+
+
+def pattern(text):
+    try:
+        return re.compile(os.fsencode(text).decode("latin-1"))
+    except re.error as error:
+        raise ValueError from error
+
+
+def tag_filter(text):
+    """The tag of a filter TAG[:PRIORITY] and its lowest priority to show"""
+    tag, _, letter = text.rpartition(":") if ":" in text else (text, ":", "V")
+    if not tag or letter.upper() not in LEVELS:
+        raise ValueError
+    return tag, LEVELS[letter.upper()]
+
+
+def parse(arguments):
+    parser = argparse.ArgumentParser(prog="logcat", description="Prints the device's log.")
+    parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="ignored")
+    parser.add_argument("-c", dest="clear", action="store_true", help="clear the log")
+    parser.add_argument("-d", dest="dump", action="store_true", help="do not follow the log")
+    parser.add_argument("-e", "--regex", type=pattern, help="show matching texts only")
+    parser.add_argument("-f", dest="file", help="append to a file")
+    parser.add_argument("--pid", type=positive, help="show this process only")
+    parser.add_argument("-s", dest="silent", action="store_true", help="as the filter *:S")
+    parser.add_argument("-t", dest="count", type=positive, help="show the last entries only")
+    parser.add_argument("-v", dest="format", choices=FORMATS, default="threadtime")
+    parser.add_argument(
+        "filters",
+        type=tag_filter,
+        nargs="*",
+        metavar="TAG[:PRIORITY]",
+        help="lowest priority to show, one of V, D, I, W, E, F and S; * is all other tags",
+    )
+    return parser.parse_intermixed_args(arguments)
+
+
+class Log:
+    def __init__(self, root, flags):
+        self.file = os.open("log", flags | os.O_NOFOLLOW | os.O_NONBLOCK, dir_fd=root)
+        if not stat.S_ISREG(os.fstat(self.file).st_mode):
+            sys.exit("logcat: the log is not a regular file")
+        self.first, self.position = b"", 0
+
+    def read_new(self):
+        """The complete entries since the last call; all when the log was cleared meanwhile"""
+        first = os.pread(self.file, HEADER.size, 0)
+        if first != self.first:
+            self.first, self.position = first, 0
+        size = os.fstat(self.file).st_size
+        content = os.pread(self.file, max(size - self.position, 0), self.position)
+        begin = 0
+        while len(content) - begin >= HEADER.size:
+            size, pid, tid, seconds, nanoseconds = HEADER.unpack_from(content, begin)
+            end = begin + HEADER.size + size
+            if size < 3 or end > len(content):
+                break
+            body = content[begin + HEADER.size : end].decode("latin-1")
+            tag, _, text = body[1:-1].partition("\0")
+            yield {
+                "letter": PRIORITIES.get(ord(body[0]), "?"),
+                "ms": nanoseconds // 1000000,
+                "pid": pid,
+                "priority": ord(body[0]),
+                "seconds": seconds,
+                "tag": tag,
+                "text": text,
+                "tid": tid,
+                "when": time.strftime("%m-%d %H:%M:%S", time.localtime(seconds)),
+            }
+            self.position += end - begin
+            begin = end
+
+
+def is_shown(entry, options):
+    levels = {"*": LEVELS["S" if options.silent else "V"]} | dict(options.filters)
+    return (
+        entry["priority"] >= levels.get(entry["tag"], levels["*"])
+        and options.pid in (None, entry["pid"])
+        and (options.regex is None or options.regex.search(entry["text"]))
+    )
+
+
+def main():
+    for number in signal.SIGINT, signal.SIGPIPE:
+        signal.signal(number, signal.SIG_DFL)
+    options = parse(sys.argv[2:])
+    log = Log(int(sys.argv[1]), os.O_RDWR if options.clear else os.O_RDONLY)
+    if options.clear:
+        os.truncate(log.file, 0)
+        return
+    if options.file:
+        sys.stdout = open(options.file, "a")
+    sys.stdout.reconfigure(encoding="latin-1")
+    closed = select.poll()  # ready when the reader closes the pipe
+    closed.register(sys.stdout, 0)
+    is_following = not options.dump and options.count is None
+    while True:
+        entries = [entry for entry in log.read_new() if is_shown(entry, options)]
+        for entry in entries[-(options.count or 0) :]:
+            header = FORMATS[options.format].format_map(entry)
+            for line in entry["text"].removesuffix("\n").split("\n"):
+                print(header + line)
+        sys.stdout.flush()
+        if not is_following or closed.poll(FOLLOW_PAUSE_MS):
+            return
+
+
+if __name__ == "__main__":
+    try:
+        main()
+    except OSError as error:
+        sys.exit(f"logcat: {error}")
