@@ -22,13 +22,6 @@ namespace {
 constexpr char kDirectory[] = "answers";
 // The longest answer that fits in a reply with its terminator.
 constexpr size_t kMaxAnswerBytes = (1 << 20) - 2 * 4096 - 1;
-constexpr int kFailure = 1;
-constexpr int kUsageError = 2;
-
-int Fail(int status, const std::string& why) {
-    fprintf(stderr, "device: answer: %s\n", why.c_str());
-    return status;
-}
 
 // Returns the path of the command's answer. Bytes other than letters, digits and '_' become %XX.
 std::string AnswerPath(const std::string& command) {
@@ -68,13 +61,6 @@ std::optional<std::string> ReadAnswer(const std::string& command) {
     return answer;
 }
 
-int ListAnswers() {
-    for (const std::string& file : FilesIn(kDirectory)) {
-        puts(CommandOf(file).c_str());
-    }
-    return 0;
-}
-
 // Returns standard input without its final newline: the tool appends one to an answer.
 std::string ReadInput() {
     std::string text(kMaxAnswerBytes + 2, '\0');
@@ -85,26 +71,28 @@ std::string ReadInput() {
     return text;
 }
 
-int RemoveAnswer(const std::string& command) {
-    return host::RemoveFile(AnswerPath(command))
-                   ? 0
-                   : Fail(kFailure, "'" + command + "': " + strerror(errno));
-}
-
 int RecordAnswer(const std::string& command, const std::string& answer) {
     if (answer.length() > kMaxAnswerBytes) {
-        return Fail(kFailure,
-                    "the text is longer than " + std::to_string(kMaxAnswerBytes) + " bytes");
+        return Fail("answer: the text is longer than " + std::to_string(kMaxAnswerBytes) +
+                    " bytes");
     }
     if (answer.find('\0') != std::string::npos) {
-        return Fail(kFailure, "the text contains a NUL byte");
+        return Fail("answer: the text contains a NUL byte");
     }
     return host::ReplaceFile(AnswerPath(command), answer)
                    ? 0
-                   : Fail(kFailure, "'" + command + "': " + strerror(errno));
+                   : FailForErrno("answer '" + command + "'");
 }
 
 }  // namespace
+
+std::set<std::string> RecordedCommands() {
+    std::set<std::string> commands;
+    for (const std::string& file : FilesIn(kDirectory)) {
+        commands.insert(CommandOf(file));
+    }
+    return commands;
+}
 
 std::optional<std::string> FindAnswer(const std::string& command, const std::string& params) {
     const std::optional<std::string> answer =
@@ -114,27 +102,32 @@ std::optional<std::string> FindAnswer(const std::string& command, const std::str
 
 int ListOrRecordAnswers(int argc, char** argv) {
     if (argc == 0) {
-        return ListAnswers();
+        for (const std::string& command : RecordedCommands()) {
+            puts(command.c_str());
+        }
+        return 0;
     }
     const std::string command = argv[0];
     if (argc == 1) {
-        return Fail(kUsageError, "missing argument after '" + command + "'");
+        return Fail("answer: missing argument after '" + command + "'", kUsageError);
     }
     if (argc > 2) {
-        return Fail(kUsageError, "unexpected argument '" + std::string(argv[2]) +
-                                         "'; quote a command with its parameters");
+        return Fail("answer: unexpected argument '" + std::string(argv[2]) +
+                            "'; quote a command with its parameters",
+                    kUsageError);
     }
     if (command == "--remove") {
-        return RemoveAnswer(argv[1]);
+        return host::RemoveFile(AnswerPath(argv[1]))
+                       ? 0
+                       : FailForErrno("answer '" + std::string(argv[1]) + "'");
     }
     if (command.empty() || command.front() == '-') {
-        return Fail(kUsageError, "invalid command '" + command + "'");
+        return Fail("answer: invalid command '" + command + "'", kUsageError);
     }
     const bool isInput = strcmp(argv[1], "-") == 0;
     const std::string answer = isInput ? ReadInput() : argv[1];
-    return ferror(stdin) == 0
-                   ? RecordAnswer(command, answer)
-                   : Fail(kFailure, std::string("cannot read standard input: ") + strerror(errno));
+    return ferror(stdin) == 0 ? RecordAnswer(command, answer)
+                              : FailForErrno("cannot read standard input");
 }
 
 }  // namespace device

@@ -3,9 +3,13 @@
 #pragma once
 
 #include <optional>
+#include <set>
 #include <string>
 
 namespace device {
+
+// Returns the commands that have a recorded answer.
+std::set<std::string> RecordedCommands();
 
 // Returns the answer recorded for the command with these parameters, or else for the command alone.
 std::optional<std::string> FindAnswer(const std::string& command, const std::string& params);

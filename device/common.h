@@ -5,7 +5,9 @@
 
 #include <cerrno>
 #include <cstdint>
+#include <cstdio>
 #include <cstdlib>
+#include <cstring>
 #include <filesystem>
 #include <set>
 #include <string>
@@ -14,6 +16,19 @@
 #include "platform/files.h"
 
 namespace device {
+
+// Exit statuses of the device's programs.
+constexpr int kFailure = 1;
+constexpr int kUsageError = 2;
+
+// Prints the error after the program's name. Returns the exit status.
+inline int Fail(const std::string& error, int status = kFailure) {
+    fprintf(stderr, "%s: %s\n", program_invocation_short_name, error.c_str());
+    return status;
+}
+
+// The same, with the reason in errno.
+inline int FailForErrno(const std::string& what) { return Fail(what + ": " + strerror(errno)); }
 
 // Returns the property's value, or an empty string when it is not set.
 inline std::string GetProperty(const char* key) {

@@ -35,9 +35,10 @@ extern "C" {
 
 namespace {
 
+using device::Fail;
+using device::FailForErrno;
 using host::UniqueFd;
 
-constexpr int kUsageError = 2;
 constexpr int kExitStopped = 3;  // of `status`
 constexpr int kExitUnknown = 4;
 constexpr int kFindLimitMs = 200;
@@ -65,22 +66,15 @@ constexpr char kUsage[] =
         "                                    records an answer, `-` from standard input;\n"
         "                                    lists recorded ones without arguments\n";
 
-int Usage() {
-    fputs(kUsage, stderr);
-    return kUsageError;
+int UsageError(const std::string& error) {
+    return device::Fail(error + "; see 'device --help'", device::kUsageError);
 }
 
+// Prints a message for people. Returns the exit status of success.
 int Say(const std::string& what) {
     fprintf(stderr, "device: %s\n", what.c_str());
     return 0;
 }
-
-int Fail(const std::string& why) {
-    Say(why);
-    return 1;
-}
-
-int FailForErrno(const std::string& what) { return Fail(what + ": " + strerror(errno)); }
 
 bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(limitMs);
@@ -250,12 +244,11 @@ int BringUp(const char* selinuxMode) {
 }
 
 int Start(int argc, char** argv) {
-    const bool isPermissive = argc == 1 && strcmp(argv[0], "--permissive") == 0;
-    if (argc > 0 && !isPermissive) {
-        return Usage();
+    if (argc > 0 && strcmp(argv[0], "--permissive") != 0) {
+        return UsageError(std::string("start: unknown option '") + argv[0] + "'");
     }
     const pid_t init = FindInit();
-    const int status = BringUp(isPermissive ? "Permissive" : "Enforcing");
+    const int status = BringUp(argc > 0 ? "Permissive" : "Enforcing");
     if (init > 0 && status == 0 && FindInit() == init) {
         Say("already running; SELinux is " + device::SelinuxMode());
     }
@@ -263,6 +256,17 @@ int Start(int argc, char** argv) {
 }
 
 int Reboot(int, char**) { return Stop(0, nullptr) == 0 ? Start(0, nullptr) : 1; }
+
+constexpr struct {
+    const char* label;
+    const char* key;
+    const char* unset;
+} kStatusLines[] = {{"daemon alive", device::kDaemonAliveKey, "false"},
+                    {"binder", device::kDaemonBinderKey, "0"},
+                    {"restarts", device::kRestartCountKey, "0"},
+                    {"firmware update", device::kIsUpdatingFirmwareKey, "false"},
+                    {"fault", device::kFaultKey, "none"},
+                    {"permissive flag", device::kPermissiveFlagKey, "unset"}};
 
 int Status(int, char**) {
     const pid_t init = FindInit();
@@ -272,9 +276,12 @@ int Status(int, char**) {
     }
     printf("running in %s, process %d%s\n", host::DeviceRootPath().c_str(), init,
            IsCurrentBuild(init) ? "" : ", another build");
-    printf("daemon alive: %s, binder: %s, SELinux: %s\n",
-           device::GetProperty(device::kDaemonAliveKey).c_str(),
-           device::GetProperty(device::kDaemonBinderKey).c_str(), device::SelinuxMode().c_str());
+    for (const auto& line : kStatusLines) {
+        const std::string value = device::GetProperty(line.key);
+        printf("%s: %s\n", line.label, value.empty() ? line.unset : value.c_str());
+    }
+    printf("SELinux: %s\nrecorded answers: %zu\n", device::SelinuxMode().c_str(),
+           device::RecordedCommands().size());
     return 0;
 }
 
@@ -322,18 +329,28 @@ constexpr struct {
               {"run", INT_MAX, Run}, {"trace", INT_MAX, Trace},
               {"fault", 3, Fault},   {"answer", INT_MAX, device::ListOrRecordAnswers}};
 
+bool AsksForHelp(const char* word) {
+    return strcmp(word, "-h") == 0 || strcmp(word, "--help") == 0;
+}
+
 int RunVerb(int argc, char** argv) {
-    const std::string name = argc > 1 ? argv[1] : "";
+    const bool asksForHelp =
+            (argc > 1 && AsksForHelp(argv[1])) || (argc > 2 && AsksForHelp(argv[2]));
+    if (argc < 2 || asksForHelp) {
+        fputs(kUsage, asksForHelp ? stdout : stderr);
+        return asksForHelp ? 0 : device::kUsageError;
+    }
+    const std::string name = argv[1];
     for (const auto& verb : kVerbs) {
-        if (name == verb.name && argc - 2 <= verb.maxArguments) {
-            return host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
+        if (name != verb.name) {
+            continue;
         }
+        if (argc - 2 > verb.maxArguments) {
+            return UsageError(name + ": unexpected argument '" + argv[2 + verb.maxArguments] + "'");
+        }
+        return host::DeviceRoot() < 0 ? 1 : verb.run(argc - 2, argv + 2);
     }
-    if (argc == 2 && (name == "-h" || name == "--help")) {
-        fputs(kUsage, stdout);
-        return 0;
-    }
-    return Usage();
+    return UsageError("unknown command '" + name + "'");
 }
 
 }  // namespace

@@ -19,9 +19,6 @@ namespace device {
 
 namespace {
 
-constexpr int kFailure = 1;
-constexpr int kUsageError = 2;
-
 struct Range {
     const char* name;  // null when the fault has no argument
     int64_t min;
@@ -49,11 +46,6 @@ constexpr struct FaultRow {
         {FaultKind::kNoText, "no_text", "replies without a text", kNoArgument},
         {FaultKind::kHuge, "huge", "replies with a long text", {"BYTES", 0, 64 << 20}},
 };
-
-int Fail(int status, const std::string& why) {
-    fprintf(stderr, "device: %s\n", why.c_str());
-    return status;
-}
 
 // Stores the word's value in `number`. Returns an empty string, or an error when it is invalid.
 std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
@@ -146,11 +138,11 @@ int SetOrListFaults(int argc, char** argv) {
     }
     Fault fault;
     if (const std::string error = ParseFault(text, fault); !error.empty()) {
-        return Fail(kUsageError, error);
+        return Fail(error, kUsageError);
     }
     const host::UniqueFd lock = LockFault();
     if (!lock.ok() || __system_property_set(kFaultKey, text.c_str()) != 0) {
-        return Fail(kFailure, std::string("cannot set the fault: ") + strerror(errno));
+        return FailForErrno("cannot set the fault");
     }
     return 0;
 }

@@ -55,12 +55,6 @@ constexpr const char* kBootProperties[][2] = {{device::kBuildIdKey, "VIRTUAL-11.
                                               {device::kIsUpdatingFirmwareKey, "false"},
                                               {device::kServiceEnableKey, "1"}};
 
-// Prints what failed and the reason in errno.
-int Fail(const char* what) {
-    fprintf(stderr, "init: %s: %s\n", what, strerror(errno));
-    return 1;
-}
-
 // Removes the files of a directory, except those with the kept prefix. Creates the directory when
 // it is missing. Returns false when it cannot be opened.
 bool Empty(const char* path, const std::string& keptPrefix = "/") {
@@ -297,25 +291,25 @@ int main(int argc, char** argv) {
         return 2;
     }
     if (!Daemonize()) {
-        return Fail("cannot change to /");
+        return device::FailForErrno("cannot change to /");
     }
     if (host::DeviceRoot() < 0) {
         return 1;
     }
     if (!LockDevice()) {
-        return Fail("cannot lock init.lock");
+        return device::FailForErrno("cannot lock init.lock");
     }
     const UniqueFd null(open("/dev/null", O_RDWR | O_CLOEXEC));
     if (!null.ok()) {
-        return Fail("/dev/null");
+        return device::FailForErrno("/dev/null");
     }
     if (const char* const unprepared = Boot(argv[1]); unprepared != nullptr) {
-        return Fail(unprepared);
+        return device::FailForErrno(unprepared);
     }
     const UniqueFd signals = OpenSignals();
     const UniqueFd watch = OpenWatch();
     if (!signals.ok() || !watch.ok()) {
-        return Fail("cannot watch the properties");
+        return device::FailForErrno("cannot watch the properties");
     }
     ReportBoot(null);
     FollowProperties(signals, watch);

@@ -10,6 +10,7 @@ constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
 constexpr char kFirmwareVersionKey[] = "odm.thp.ver_firmware";
 constexpr char kIsUpdatingFirmwareKey[] = "odm.thp.is_updating_fw";
+constexpr char kPermissiveFlagKey[] = "odm.thp.debug.selinux.permissive";
 constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 

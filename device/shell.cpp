@@ -16,18 +16,13 @@ namespace {
 
 constexpr char kShell[] = "/usr/bin/mksh";
 
-int Fail(const std::string& why) {
-    fprintf(stderr, "device: %s\n", why.c_str());
-    return 1;
-}
-
 int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
                  const std::string& path) {
     EnterDevice();
     setenv("PATH", path.c_str(), 1);
     arguments.push_back(nullptr);
     execv(program.c_str(), const_cast<char* const*>(arguments.data()));
-    return Fail(program + ": " + strerror(errno));
+    return FailForErrno(program);
 }
 
 // Returns the directory of the device's commands. Prints an error and returns an empty string when

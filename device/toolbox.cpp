@@ -22,12 +22,8 @@
 
 namespace {
 
-constexpr int kUsageError = -1;  // of a command; main() prints the usage
-
-int Fail(const char* what) {
-    fprintf(stderr, "%s: %s: %s\n", program_invocation_short_name, what, strerror(errno));
-    return 1;
-}
+using device::FailForErrno;
+using device::kUsageError;  // of a command; main() prints the usage
 
 // Returns the whole value; __system_property_get() truncates a long one.
 std::string WholeProperty(const std::string& name) {
@@ -79,7 +75,7 @@ int Setenforce(int /* argc */, char** argv) {
     }
     return host::ReplaceFile(host::kSelinuxFile, isPermissive ? "Permissive" : "Enforcing")
                    ? 0
-                   : Fail("cannot set the mode");
+                   : FailForErrno("cannot set the mode");
 }
 
 int ListSettings(const std::string& directory) {
@@ -114,7 +110,7 @@ int Settings(int argc, char** argv) {
         return 0;
     }
     if (verb == "put" && argc == 5) {
-        return host::ReplaceFile(path, argv[4]) ? 0 : Fail("cannot store the setting");
+        return host::ReplaceFile(path, argv[4]) ? 0 : FailForErrno("cannot store the setting");
     }
     return kUsageError;
 }
@@ -153,7 +149,8 @@ int Log(int argc, char** argv) {
     for (int i = optind + 1; i < argc; ++i) {
         text.append(" ").append(argv[i]);
     }
-    return __android_log_print(priority, tag, "%s", text.c_str()) >= 0 ? 0 : Fail("cannot log");
+    return __android_log_print(priority, tag, "%s", text.c_str()) >= 0 ? 0
+                                                                       : FailForErrno("cannot log");
 }
 
 // Passes logcat.py the number of a device root descriptor as its first argument.
@@ -163,13 +160,13 @@ int Logcat(int argc, char** argv) {
     std::vector<const char*> arguments = {script.c_str(), root.c_str()};
     arguments.insert(arguments.end(), argv + 1, argv + argc + 1);  // with the final null pointer
     execv(script.c_str(), const_cast<char* const*>(arguments.data()));
-    return Fail(script.c_str());
+    return FailForErrno(script);
 }
 
 int Reboot(int /* argc */, char** /* argv */) {
     const std::string device = device::PathBesideProgram("device");
     execl(device.c_str(), "device", "reboot", nullptr);
-    return Fail(device.c_str());
+    return FailForErrno(device);
 }
 
 constexpr struct {
@@ -204,11 +201,10 @@ int main(int argc, char** argv) {
         const int status = hasArguments ? command.run(argc, argv) : kUsageError;
         if (status == kUsageError) {
             fprintf(stderr, "usage: %s %s\n", command.name, command.arguments);
-            return 1;
         }
         // A closed pipe is not an error.
         const bool flushed = fflush(stdout) == 0 && ferror(stdout) == 0;
-        return flushed || errno == EPIPE ? status : Fail("cannot write");
+        return flushed || errno == EPIPE ? status : FailForErrno("cannot write");
     }
     fprintf(stderr, "toolbox: unknown command '%s'; run a command in device/bin\n",
             program_invocation_short_name);
