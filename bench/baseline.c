@@ -1,6 +1,6 @@
 // The tool's baseline: the same system calls in the same order with the same data, nothing else.
-//   baseline THP_GetVersion   as tpd forwards it, or refuses it while SELinux is enforcing
-//   baseline stop             as tpd stops the daemon
+//   baseline THP_ResetBaseline   as tpd forwards it, or refuses it while SELinux is enforcing
+//   baseline stop                as tpd stops the daemon
 #define _GNU_SOURCE
 #include <fcntl.h>
 #include <signal.h>
@@ -15,7 +15,7 @@
 #include <time.h>
 #include <unistd.h>
 
-#define COMMAND "THP_GetVersion"
+#define COMMAND "THP_ResetBaseline"
 #define DESCRIPTOR u"android.CorvaneInterfaceServer.ICorvaneInterfaceService"
 #define SERVICE_ENABLE "odm.thp.service_enable"
 #define REBOOT_TIMES "odm.thp.dae_reboot_times"

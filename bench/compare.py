@@ -15,7 +15,7 @@ from pathlib import Path
 from statistics import median, quantiles
 
 PERMISSIVE = "odm.thp.debug.selinux.permissive"
-FORWARDED = "THP_GetVersion"
+FORWARDED = "THP_ResetBaseline"
 # Name of the command: its argument, and the property that is set before each run.
 COMMANDS = {
     "forwarded": (FORWARDED, (PERMISSIVE, "true")),

@@ -42,18 +42,10 @@ constexpr char kCommands[] = " " TPD_DAEMON_COMMANDS " ";
 const android::StaticString16 kDescriptor(
         u"android.CorvaneInterfaceServer.ICorvaneInterfaceService");
 
-std::string GetOrUnset(const char* key) {
-    const std::string value = GetProperty(key);
-    return value.empty() ? "unset" : value;
-}
-
 std::string Help() {
-    std::string commands = kCommands;
+    std::string commands = TPD_DAEMON_COMMANDS;
     std::replace(commands.begin(), commands.end(), ' ', '\n');
-    return "corvane_daemon commands:" + commands +
-           "THP_GetScreenState (virtual device only)\n"
-           "THP_GetStatus (virtual device only)\n"
-           "THP_GetVersion (virtual device only)";
+    return "corvane_daemon commands:\n" + commands;
 }
 
 // Returns the answer to a command.
@@ -74,19 +66,6 @@ std::string Answer(const std::string& command, const std::string& params) {
         return name.empty() || name == command
                        ? command + ": missing or invalid command"
                        : Answer(name, space < params.length() ? params.substr(space + 1) : "");
-    }
-    if (command == "THP_GetScreenState") {
-        return "screen state: " + GetOrUnset("odm.thp.screen_status");
-    }
-    if (command == "THP_GetStatus") {
-        return "thplog: " + GetOrUnset("persist.odm.thp.thplog_enabled") +
-               "\nafelog: " + GetOrUnset("odm.thp.debug.afelog") +
-               "\nraw data: " + GetOrUnset("thp.debug.raw") +
-               "\nrestarts: " + GetOrUnset(device::kRestartCountKey);
-    }
-    if (command == "THP_GetVersion") {
-        return "corvane_daemon of " + GetOrUnset(device::kBuildIdKey) + ", firmware " +
-               GetOrUnset(device::kFirmwareVersionKey);
     }
     const bool isName = !command.empty() && command.find(' ') == std::string::npos;
     if (isName && strstr(kCommands, (" " + command + " ").c_str()) != nullptr) {
