@@ -20,6 +20,7 @@
 #include <chrono>
 #include <csignal>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <string>
 #include <thread>
@@ -165,6 +166,10 @@ class DaemonSupervisor {
         if (getppid() == init) {
             host::LookForTrace();
             host::TraceEvent("daemon_start").Add("daemon", getpid());
+            // This path leads to the same directory even when the root was renamed.
+            const std::string root =
+                    "/proc/self/fd/" + std::to_string(dup(host::DeviceRoot())) + "/.";
+            setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
             const std::string program = device::PathBesideProgram("corvane_daemon");
             execl(program.c_str(), program.c_str(), nullptr);
         }

@@ -89,7 +89,7 @@ class Device:
 
     def processes(self, program=""):
         """The processes of this device that run the program."""
-        known = f"TPD_DEVICE_ROOT={self.root}".encode()
+        known = f"TPD_DEVICE_PROCESS={self.root}".encode()
         found = []
         for process in pathlib.Path("/proc").glob("[0-9]*"):
             with contextlib.suppress(OSError):
