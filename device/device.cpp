@@ -46,26 +46,6 @@ constexpr int kStartLimitMs = 10000;
 constexpr int kStopLimitMs = 5000;
 constexpr std::chrono::milliseconds kPollPause(5);
 
-constexpr char kUsage[] =
-        "usage: device start [--permissive]  boots the device, waits for its daemon;\n"
-        "                                    SELinux is Enforcing without the option\n"
-        "       device reboot                stops and boots the device, SELinux Enforcing\n"
-        "       device stop                  stops the device\n"
-        "       device status                exits with 3 when stopped, 4 when unknown\n"
-        "       device root                  prints the directory of its files; creates it\n"
-        "                                    when it is missing\n"
-        "       device shell [COMMAND...]    runs a command or the shell, as `adb shell`\n"
-        "       device run [ARGUMENT...]     runs the tool; boots a stopped device in\n"
-        "                                    permissive mode\n"
-        "       device trace [--bytes] [--json | --mermaid] ARGUMENT...\n"
-        "                                    runs the tool and shows what all processes did\n"
-        "       device fault [NAME [ARGUMENT] [COUNT] | none]\n"
-        "                                    sets the daemon's fault; lists all faults\n"
-        "                                    without arguments\n"
-        "       device answer [COMMAND TEXT | COMMAND - | --remove COMMAND]\n"
-        "                                    records an answer, `-` from standard input;\n"
-        "                                    lists recorded ones without arguments\n";
-
 int UsageError(const std::string& error) {
     return device::Fail(error + "; see 'device --help'", device::kUsageError);
 }
@@ -319,31 +299,59 @@ int Fault(int argc, char** argv) {
     return isPossible ? device::SetOrListFaults(argc, argv) : 1;
 }
 
-constexpr struct {
+constexpr struct Verb {
     const char* name;
+    const char* arguments;
+    const char* effect;
     int maxArguments;
     int (*run)(int argc, char** argv);
-} kVerbs[] = {{"start", 1, Start},   {"reboot", 0, Reboot},
-              {"stop", 0, Stop},     {"status", 0, Status},
-              {"root", 0, Root},     {"shell", INT_MAX, Shell},
-              {"run", INT_MAX, Run}, {"trace", INT_MAX, Trace},
-              {"fault", 3, Fault},   {"answer", INT_MAX, device::ListOrRecordAnswers}};
+} kVerbs[] = {
+        {"start", " [--permissive]",
+         "boots the device, with SELinux enforcing without the option, and waits for its daemon", 1,
+         Start},
+        {"reboot", "", "stops the device and boots it, with SELinux enforcing", 0, Reboot},
+        {"stop", "", "stops the device", 0, Stop},
+        {"status", "", "prints its state; exits with 3 when it is stopped, 4 when unknown", 0,
+         Status},
+        {"root", "", "prints the directory of its files; creates it when it is missing", 0, Root},
+        {"shell", " [COMMAND...]", "runs a command or the interactive shell, as `adb shell`",
+         INT_MAX, Shell},
+        {"run", " [ARGUMENT...]", "runs the tool; boots a stopped device in permissive mode",
+         INT_MAX, Run},
+        {"trace", " [--bytes] [--json | --mermaid] ARGUMENT...",
+         "runs the tool and shows what all processes did", INT_MAX, Trace},
+        {"fault", " [NAME [ARGUMENT] [COUNT] | none]",
+         "sets the daemon's fault; lists the faults without arguments", 3, Fault},
+        {"answer", " [COMMAND TEXT | COMMAND - | --remove COMMAND]",
+         "records an answer, `-` from standard input; lists them without arguments", INT_MAX,
+         device::ListOrRecordAnswers}};
+
+void PrintUsage(FILE* stream, const Verb& verb) {
+    fprintf(stream, "    device %s%s\n        %s\n", verb.name, verb.arguments, verb.effect);
+}
 
 bool AsksForHelp(const char* word) {
     return strcmp(word, "-h") == 0 || strcmp(word, "--help") == 0;
 }
 
 int RunVerb(int argc, char** argv) {
-    const bool asksForHelp =
-            (argc > 1 && AsksForHelp(argv[1])) || (argc > 2 && AsksForHelp(argv[2]));
-    if (argc < 2 || asksForHelp) {
-        fputs(kUsage, asksForHelp ? stdout : stderr);
-        return asksForHelp ? 0 : device::kUsageError;
+    if (argc < 2 || AsksForHelp(argv[1])) {
+        FILE* const stream = argc < 2 ? stderr : stdout;
+        fputs("usage:\n", stream);
+        for (const Verb& verb : kVerbs) {
+            PrintUsage(stream, verb);
+        }
+        return argc < 2 ? device::kUsageError : 0;
     }
     const std::string name = argv[1];
-    for (const auto& verb : kVerbs) {
+    for (const Verb& verb : kVerbs) {
         if (name != verb.name) {
             continue;
+        }
+        if (argc > 2 && AsksForHelp(argv[2])) {
+            puts("usage:");
+            PrintUsage(stdout, verb);
+            return 0;
         }
         if (argc - 2 > verb.maxArguments) {
             return UsageError(name + ": unexpected argument '" + argv[2 + verb.maxArguments] + "'");
