@@ -1,5 +1,6 @@
 """The files shipped with the program, and their agreement with it"""
 import re
+import stat
 import subprocess
 
 import pytest
@@ -8,17 +9,17 @@ from virtual_device import SOURCE, wait_until
 
 COMPLETIONS = {
     "bash": """
-. ./tpd.bash
-COMP_WORDS=(tpd "$@") COMP_CWORD=$#
-_tpd
-echo "${COMPREPLY[@]}"
+. usr/share/bash-completion/completions/tpd-device
+COMP_WORDS=("$@") COMP_CWORD=$(($# - 1))
+_${1//-/_} $1
+printf '%s\\n' "${COMPREPLY[@]}"
 """,
     "zsh": """
-_describe() { echo ${${(P)4}%%:*} }
-compadd() { echo $@ }
-fpath=(.) words=(tpd "$@") CURRENT=$#words
-autoload -U _tpd
-_tpd
+_describe() { print -rl -- ${${(P)4}%%:*} }
+compadd() { print -rl -- $@ }
+fpath=(usr/share/zsh/vendor-completions) words=("$@") CURRENT=$#words
+autoload -U _tpd _tpd-device
+_$1
 """,
 }
 
@@ -27,43 +28,88 @@ def source(path):
     return (SOURCE / path).read_text()
 
 
+@pytest.fixture(scope="session")
+def installed(build, tmp_path_factory):
+    """The root directory below which both packages are unpacked"""
+    directory = tmp_path_factory.mktemp("packages")
+    root = directory / "root"
+    config = build / "CPackConfig.cmake"
+    cpack = ["cpack", "-G", "DEB", "--config", config, "-B", directory]
+    subprocess.check_output(cpack, umask=0o077)
+    for package in directory.glob("*.deb"):
+        subprocess.check_call(["dpkg-deb", "-x", package, root])
+    for name in ["timeout", "toybox"]:  # targets of relative links
+        (root / "usr/bin" / name).symlink_to(f"/usr/bin/{name}")
+    return root
+
+
+@pytest.fixture
+def installed_device(installed, stopped_device):
+    """A device that is used through the packages"""
+    env = stopped_device.env
+    usr = f"{installed}/usr"
+    env["PATH"] = f"{usr}/lib/tpd-device/host:{usr}/bin:{env['PATH']}"
+    return stopped_device
+
+
+def test_modes_do_not_depend_on_the_umask(installed):
+    files = (installed / "usr").rglob("*")
+    modes = {stat.filemode(file.lstat().st_mode) for file in files}
+    assert modes == {"drwxr-xr-x", "-rw-r--r--", "-rwxr-xr-x", "lrwxrwxrwx"}
+
+
 @pytest.fixture(params=COMPLETIONS)
-def complete(request, build):
-    """The shell's completions of an empty last argument."""
-    script = COMPLETIONS[request.param]
-    shell = [request.param, "-f", "-c", script, "complete"]
-    path = build / "completions"
-    return lambda *words: subprocess.check_output([*shell, *words], cwd=path, text=True).split()
+def complete(request, installed, installed_device):
+    """The shell's completions of the last of these words"""
+    shell = request.param, "-f", "-c", COMPLETIONS[request.param]
+
+    def last_word(*words):
+        command = [*shell, "complete", *words]
+        return installed_device.output(*command, cwd=installed).split()
+
+    return last_word
 
 
 def test_completes_the_commands_in_the_help(device, complete):
     commands = re.findall(r"^\w+$", device.tpd("help"), re.M)
-    assert sorted(complete("")) == sorted(commands)
+    assert sorted(complete("tpd", "")) == sorted(commands)
 
 
 def test_completes_parameters(complete):
     modes = ["running_test", "running_test_lasttime"]
-    assert complete("captest", "") == modes
-    assert complete("TSA_ExecuteCommand", "captest", "") == modes
-    assert "THP_SetAccData" in complete("TSA_ExecuteCommand", "")
-    assert complete("stop", "") == []
+    assert complete("tpd", "captest", "") == modes
+    assert complete("tpd-device", "run", "TSA_ExecuteCommand", "captest", "") == modes
+    assert complete("tpd-device", "trace", "--bytes", "captest", "") == modes
+    assert "THP_SetAccData" in complete("tpd", "TSA_ExecuteCommand", "")
+    assert complete("tpd", "stop", "") == []
 
 
-@pytest.fixture
-def manual(build):
-    """The manual page as man shows it"""
-    page = ["groff", "-man", "-Tascii", "-P-cbou", "-ww", "-rLL=80n", build / "docs/tpd.1"]
-    done = subprocess.run(page, check=True, capture_output=True, text=True)
-    assert done.stderr == ""
-    return done.stdout
+def test_completes_the_words_of_the_device_command(complete, installed_device):
+    installed_device.output("tpd-device", "answer", "captest", "done")
+    assert {"start", "trace", "answer"}.issubset(complete("tpd-device", ""))
+    assert complete("tpd-device", "start", "") == ["--permissive"]
+    assert "die_during" in complete("tpd-device", "fault", "")
+    assert complete("tpd-device", "answer", "--remove", "") == ["captest"]
 
 
-def test_manual_describes_the_local_commands(device, manual):
+def described(page, section):
+    """The names that a section of a manual page describes after its first paragraph"""
+    groff = "groff -man -Tascii -P-cbou -ww -rLL=80n".split()
+    shown = subprocess.run([*groff, page], capture_output=True, text=True)
+    assert (shown.returncode, shown.stderr) == (0, "")
+    pattern = rf"^{section}\n.*?\n\n(.*?)^[A-Z]"
+    entries = re.search(pattern, shown.stdout, re.M | re.S)[1]
+    return re.findall(r"^ {7}(\w+)", entries, re.M)
+
+
+def test_manual_describes_the_local_commands(device, build):
     listed = device.tpd("help").split("//aaa special gTpdCmds\n")[1].split()
-    section = manual.partition("LOCAL COMMANDS\n")[2].partition("\nFORWARDED")[0]
-    entries = section.partition("\n\n")[2]
-    described = re.findall(r"^ {7}(\w+)", entries, re.M)
-    assert sorted(described) == listed
+    assert sorted(described(build / "docs/tpd.1", "LOCAL COMMANDS")) == listed
+
+
+def test_manual_describes_the_faults(stopped_device, build):
+    listed = re.findall(r"^\w+", stopped_device.output("device", "fault"), re.M)
+    assert set(listed).issubset(described(build / "docs/tpd-device.1", "FAULTS"))
 
 
 def test_builds_the_same_sources_for_a_device():
@@ -83,23 +129,19 @@ def is_idle(device):
     return device.is_up() == is_enabled or not device.processes("/init")
 
 
-def run_in_source(device, script):
-    return device.output("bash", "-c", script, cwd=SOURCE)
-
-
 def test_replays_the_session_of_the_readme(stopped_device):
     session = fenced(source("README.md"))
     for step in session.removeprefix("$ ").split("\n$ "):
         command, _, expected = step.partition("\n")
-        stdout = run_in_source(stopped_device, command)
+        stdout = stopped_device.output("bash", "-c", command, cwd=SOURCE)
         assert stdout.rstrip("\n") == expected.rstrip("\n"), command
         wait_until(lambda: is_idle(stopped_device))
 
 
-def test_runs_the_ci_example(stopped_device):
-    page = source("docs/automation.md")
-    example = page.partition("<!-- ci-example -->\n")[2]
-    done = stopped_device.run("bash", "-xc", fenced(example), cwd=SOURCE)
+def test_runs_the_ci_example(installed, installed_device):
+    page = source("docs/automation.md").partition("<!-- ci-example -->\n")[2]
+    example = fenced(page).replace("/usr/", f"{installed}/usr/")
+    done = installed_device.run("sh", "-xc", example)
     assert done.returncode == 0, done.stderr
 
 
