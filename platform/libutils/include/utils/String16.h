@@ -1,39 +1,28 @@
 // Host implementation of the platform's UTF-16 string.
 #pragma once
 
-#include <cstddef>
-#include <memory>
+#include <cstring>
 #include <string>
 
 namespace android {
 
-// A constant string, with a terminating zero unit; copies share it.
 class String16 {
   public:
-    String16();
-    // From ASCII; any other byte becomes U+FFFD.
-    explicit String16(const char* text);
+    explicit String16(const char* ascii) : mText(ascii, ascii + strlen(ascii)) {}
+    String16(const char16_t* text, size_t size) : mText(text, size) {}
 
-    const char16_t* string() const { return mText; }
-    size_t size() const { return mSize; }  // code units
-
-    bool operator==(const String16& other) const;
-    bool operator!=(const String16& other) const { return !(*this == other); }
-
-  protected:
-    constexpr String16(const char16_t* text, size_t size) : mText(text), mSize(size) {}
+    const char16_t* string() const { return mText.c_str(); }  // ends with a zero unit
+    size_t size() const { return mText.size(); }              // code units
 
   private:
-    const char16_t* mText;
-    size_t mSize;
-    std::shared_ptr<const std::u16string> mOwned;  // null for a StaticString16
+    std::u16string mText;
 };
 
-// A constant without heap storage, to construct String16 objects from.
+// A constant, to construct String16 objects from. On a device it needs no heap storage.
 template <size_t N>
 class StaticString16 : public String16 {
   public:
-    constexpr StaticString16(const char16_t (&text)[N])  // NOLINT(google-explicit-constructor)
+    StaticString16(const char16_t (&text)[N])  // NOLINT(google-explicit-constructor)
         : String16(text, N - 1) {}
 };
 

@@ -1,44 +1,30 @@
 // Host implementation of the platform's strong reference to a RefBase object.
 #pragma once
 
-#include <utility>
+#include <memory>
 
 namespace android {
 
+class RefBase;
+
+// A shared pointer that any number of times can be made from the same raw pointer.
 template <typename T>
-class sp {
+class sp : public std::shared_ptr<T> {
   public:
     sp() = default;
-    sp(T* object) : mObject(object) {  // NOLINT(google-explicit-constructor)
-        if (mObject != nullptr) {
-            mObject->incStrong(this);
-        }
-    }
-    sp(const sp& other) : sp(other.mObject) {}
-    sp(sp&& other) noexcept : mObject(std::exchange(other.mObject, nullptr)) {}
+    sp(T* object) : std::shared_ptr<T>(Share(object)) {}  // NOLINT(google-explicit-constructor)
     template <typename U>
-    sp(const sp<U>& other) : sp(other.get()) {}  // NOLINT(google-explicit-constructor)
-    ~sp() { clear(); }
-
-    sp& operator=(sp other) noexcept {
-        std::swap(mObject, other.mObject);
-        return *this;
-    }
-
-    void clear() {
-        if (T* const object = std::exchange(mObject, nullptr)) {
-            object->decStrong(this);
-        }
-    }
-
-    T* get() const { return mObject; }
-    T* operator->() const { return mObject; }
-    T& operator*() const { return *mObject; }
-    bool operator==(const sp& other) const { return mObject == other.mObject; }
-    bool operator!=(const sp& other) const { return mObject != other.mObject; }
+    sp(const std::shared_ptr<U>& object)  // NOLINT(google-explicit-constructor)
+        : std::shared_ptr<T>(object) {}
 
   private:
-    T* mObject = nullptr;
+    static std::shared_ptr<T> Share(T* object) {
+        if (object == nullptr) {
+            return nullptr;
+        }
+        const std::shared_ptr<RefBase> owner = object->weak_from_this().lock();
+        return {owner != nullptr ? owner : std::shared_ptr<RefBase>(object), object};
+    }
 };
 
 }  // namespace android
