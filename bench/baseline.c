@@ -143,10 +143,8 @@ static int Connect(void) {
 }
 
 static char* Call(int connection) {
-    struct iovec part = {(void*)&request, sizeof(request)};
-    const struct msghdr message = {.msg_iov = &part, .msg_iovlen = 1};
     uint32_t reply[2];  // status and size
-    if (sendmsg(connection, &message, MSG_NOSIGNAL) < 0 ||
+    if (send(connection, &request, sizeof(request), MSG_NOSIGNAL) < 0 ||
         recv(connection, reply, sizeof(reply), MSG_WAITALL) != sizeof(reply)) {
         Fail("call");
     }

@@ -97,7 +97,7 @@ void RunBaseline(State& state) {
     request.writeInterfaceToken(ICorvaneInterfaceClient::descriptor);
     request.writeCString(std::to_string(state.range(0)).c_str());
     request.writeInt32(0);
-    const host::RequestHeader header = {0, 0x10, static_cast<uint32_t>(request.dataSize())};
+    const host::RequestHeader header = {0, 0x10, 0};
     host::ReplyHeader reply = {};
     std::vector<char> buffer(host::kMaxTransactionBytes);
     const host::UniqueFd connection = host::NewSocket();
@@ -105,9 +105,9 @@ void RunBaseline(State& state) {
     const sockaddr_un address = host::Address(directory, kServiceName);
     connect(connection.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address));
     for (auto _ : state) {
-        host::SendMessage(connection.get(), &header, sizeof(header), request);
-        host::Receive(connection.get(), &reply, sizeof(reply));
-        host::Receive(connection.get(), buffer.data(), reply.size);
+        host::SendMessage(connection, header, request);
+        host::Receive(connection, &reply, sizeof(reply));
+        host::Receive(connection, buffer.data(), reply.size);
     }
     if (reply.size <= state.range(0)) {
         state.SkipWithError("no reply");

@@ -87,11 +87,7 @@ class FakeServiceManager : public IServiceManager {
         const bool found = TakeFirst(gDevice->lookups, true);
         return found ? new FakeService(++gDevice->servicesFound) : nullptr;
     }
-    sp<IBinder> checkService(const String16&) const override { return nullptr; }
-    status_t addService(const String16&, const sp<IBinder>&, bool, int) override {
-        return INVALID_OPERATION;
-    }
-    IBinder* onAsBinder() override { return nullptr; }
+    status_t addService(const String16&, const sp<IBinder>&) override { return INVALID_OPERATION; }
 };
 
 }  // namespace

@@ -1,11 +1,5 @@
-#include <binder/Binder.h>
-
-#include <binder/IInterface.h>
-#include <binder/IPCThreadState.h>
 #include <binder/IServiceManager.h>
-#include <binder/Parcel.h>
 #include <binder/ProcessState.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
@@ -44,68 +38,31 @@ std::string ServiceName(const String16& name) {
 class DriverServiceManager : public IServiceManager {
   public:
     sp<IBinder> getService(const String16& name) const override {
-        return LookUp(ServiceName(name), GetServiceLimitUs());
-    }
-
-    sp<IBinder> checkService(const String16& name) const override {
-        return LookUp(ServiceName(name), 0);
-    }
-
-    status_t addService(const String16& name, const sp<IBinder>& service, bool /* allowIsolated */,
-                        int /* dumpsysFlags */) override {
-        return host::PublishService(ProcessState::self()->getDriverName(), ServiceName(name),
-                                    service);
-    }
-
-  protected:
-    IBinder* onAsBinder() override { return nullptr; }
-
-  private:
-    static sp<IBinder> LookUp(const std::string& name, int64_t limitUs) {
         host::TraceEvent event("lookup");
         const std::string driver = ProcessState::self()->getDriverName();
+        const std::string service = ServiceName(name);
         const int64_t start = host::MonotonicUs();
-        sp<IBinder> binder = host::ConnectService(driver, name);
-        while (binder == nullptr && host::MonotonicUs() + kGetServicePauseUs <= start + limitUs) {
+        const int64_t lastTry = start + GetServiceLimitUs() - kGetServicePauseUs;
+        sp<IBinder> binder = host::ConnectService(driver, service);
+        while (binder == nullptr && host::MonotonicUs() <= lastTry) {
             std::this_thread::sleep_for(std::chrono::microseconds(kGetServicePauseUs));
-            binder = host::ConnectService(driver, name);
+            binder = host::ConnectService(driver, service);
         }
-        event.Add("service", name)
+        event.Add("service", service)
                 .Add("found", binder != nullptr ? 1 : 0)
                 .Add("us", host::MonotonicUs() - start);
         return binder;
+    }
+
+    status_t addService(const String16& name, const sp<IBinder>& service) override {
+        return host::PublishService(ProcessState::self()->getDriverName(), ServiceName(name),
+                                    service);
     }
 };
 
 }  // namespace
 
 sp<IInterface> IBinder::queryLocalInterface(const String16& /* descriptor */) { return nullptr; }
-
-status_t BBinder::transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) {
-    data.setDataPosition(0);
-    const status_t status = onTransact(code, data, reply, flags);
-    if (reply != nullptr) {
-        reply->setDataPosition(0);
-    }
-    return status;
-}
-
-status_t BBinder::linkToDeath(const sp<DeathRecipient>& /* recipient */, void* /* cookie */,
-                              uint32_t /* flags */) {
-    return INVALID_OPERATION;
-}
-
-status_t BBinder::unlinkToDeath(const wp<DeathRecipient>& /* recipient */, void* /* cookie */,
-                                uint32_t /* flags */, wp<DeathRecipient>* /* outRecipient */) {
-    return INVALID_OPERATION;
-}
-
-status_t BBinder::onTransact(uint32_t /* code */, const Parcel& /* data */, Parcel* /* reply */,
-                             uint32_t /* flags */) {
-    return UNKNOWN_TRANSACTION;
-}
-
-ProcessState::ProcessState(std::string driver) : mDriver(std::move(driver)) {}
 
 sp<ProcessState> ProcessState::self() {
     return gProcess != nullptr ? gProcess : initWithDriver(kDefaultDriver);
@@ -120,17 +77,6 @@ sp<ProcessState> ProcessState::initWithDriver(const char* driver) {
         abort();
     }
     return gProcess;
-}
-
-IPCThreadState* IPCThreadState::self() {
-    static IPCThreadState state;
-    return &state;
-}
-
-void IPCThreadState::joinThreadPool(bool /* isMain */) {
-    for (;;) {
-        pause();
-    }
 }
 
 sp<IServiceManager> defaultServiceManager() {

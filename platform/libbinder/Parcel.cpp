@@ -20,12 +20,6 @@ void Parcel::setDataPosition(size_t position) const {
     mPosition = std::min(position, mData.size());
 }
 
-status_t Parcel::setData(const uint8_t* buffer, size_t size) {
-    mData.assign(buffer, buffer + size);
-    mPosition = 0;
-    return OK;
-}
-
 uint8_t* Parcel::resize(size_t size) {
     mData.resize(size);
     mPosition = 0;
@@ -56,16 +50,12 @@ status_t Parcel::writeCString(const char* text) {
     return text != nullptr ? write(text, strlen(text) + 1) : BAD_VALUE;
 }
 
-status_t Parcel::writeString16(const String16& text) {
-    writeInt32(static_cast<int32_t>(text.size()));
-    return write(text.string(), (text.size() + 1) * sizeof(char16_t));
-}
-
 status_t Parcel::writeInterfaceToken(const String16& interface) {
-    for (const int32_t field : {kNoStrictModePolicy, kNoWorkSource, kVendorHeader}) {
-        writeInt32(field);
-    }
-    return writeString16(interface);
+    writeInt32(kNoStrictModePolicy);
+    writeInt32(kNoWorkSource);
+    writeInt32(kVendorHeader);
+    writeInt32(static_cast<int32_t>(interface.size()));
+    return write(interface.string(), (interface.size() + 1) * sizeof(char16_t));
 }
 
 bool Parcel::enforceInterface(const String16& interface) const {

@@ -16,7 +16,8 @@ constexpr size_t kMaxTransactionBytes = (1 << 20) - 2 * 4096;
 constexpr size_t kMaxOneWayBytes = kMaxTransactionBytes / 2;
 
 // Returns a proxy of the service, or null when the service is not published or too busy to accept
-// another client. `driver` is the driver's path on the device.
+// another client. `driver` is the driver's path on the device, `name` a file name of at most 64
+// bytes.
 android::sp<android::IBinder> ConnectService(const std::string& driver, const std::string& name);
 
 // Returns a proxy over a connected socket.

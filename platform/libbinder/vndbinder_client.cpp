@@ -41,38 +41,31 @@ class RemoteBinder : public IBinder {
         Parcel discarded;
         Parcel& received = reply != nullptr ? *reply : discarded;
         const status_t status = Deliver(code, data, received, flags);
-        const bool hasReply = status == android::OK && (flags & FLAG_ONEWAY) == 0;
         TraceEvent("reply")
                 .Add("status", status)
-                .Add("bytes", static_cast<int64_t>(hasReply ? received.dataSize() : 0))
+                .Add("bytes", static_cast<int64_t>(received.dataSize()))
                 .Add("us", MonotonicUs() - start);
         return status;
     }
 
-    status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
-                         uint32_t flags) override {
+    status_t linkToDeath(const sp<DeathRecipient>& recipient, void* /* cookie */,
+                         uint32_t /* flags */) override {
         const status_t status = mConnection.ok() ? android::OK : android::DEAD_OBJECT;
         if (status == android::OK) {
-            mLinks.push_back({recipient, cookie, flags});
+            mRecipients.emplace_back(recipient);
         }
         TraceEvent("link_to_death").Add("status", status);
         return status;
     }
 
-    status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie, uint32_t flags,
-                           wp<DeathRecipient>* outRecipient) override {
-        const status_t status = Unlink({recipient, cookie, flags}, outRecipient);
+    status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* /* cookie */,
+                           uint32_t /* flags */, wp<DeathRecipient>* /* outRecipient */) override {
+        const status_t status = Unlink(recipient);
         TraceEvent("unlink_to_death").Add("status", status);
         return status;
     }
 
   private:
-    struct Link {
-        wp<DeathRecipient> recipient;
-        void* cookie;
-        uint32_t flags;
-    };
-
     status_t Deliver(uint32_t code, const Parcel& data, Parcel& reply, uint32_t flags) {
         if (!mConnection.ok()) {
             return android::DEAD_OBJECT;
@@ -81,49 +74,27 @@ class RemoteBinder : public IBinder {
         if (data.dataSize() > (oneWay ? kMaxOneWayBytes : kMaxTransactionBytes)) {
             return android::FAILED_TRANSACTION;
         }
-        const RequestHeader header = {code, flags, static_cast<uint32_t>(data.dataSize())};
-        if (!SendMessage(mConnection.get(), &header, sizeof(header), data)) {
+        if (!SendMessage(mConnection, RequestHeader{code, flags, 0}, data)) {
             return OwnerDied();
         }
-        return oneWay ? android::OK : ReceiveReply(reply);
-    }
-
-    status_t ReceiveReply(Parcel& reply) {
         ReplyHeader header = {};
-        if (!Receive(mConnection.get(), &header, sizeof(header))) {
-            return OwnerDied();
-        }
-        if (header.size > kMaxTransactionBytes) {
-            // The start of the next reply is unknown, so the connection is unusable.
-            OwnerDied();
-            return android::FAILED_TRANSACTION;
-        }
-        if (!Receive(mConnection.get(), reply.resize(header.size), header.size)) {
+        if (!oneWay && !ReceiveMessage(mConnection, &header, &reply)) {
             reply.resize(0);
             return OwnerDied();
-        }
-        if (header.status != android::OK) {
-            reply.resize(0);
         }
         // A positive status counts as success, as on a device.
         return std::min<status_t>(header.status, android::OK);
     }
 
-    status_t Unlink(const Link& old, wp<DeathRecipient>* outRecipient) {
+    status_t Unlink(const wp<DeathRecipient>& recipient) {
         if (!mConnection.ok()) {
             return android::DEAD_OBJECT;
         }
-        const auto link = std::find_if(mLinks.begin(), mLinks.end(), [&old](const Link& each) {
-            return each.recipient == old.recipient && each.cookie == old.cookie &&
-                   each.flags == old.flags;
-        });
-        if (link == mLinks.end()) {
+        const auto found = std::find(mRecipients.begin(), mRecipients.end(), recipient);
+        if (found == mRecipients.end()) {
             return android::NAME_NOT_FOUND;
         }
-        if (outRecipient != nullptr) {
-            *outRecipient = link->recipient;
-        }
-        mLinks.erase(link);
+        mRecipients.erase(found);
         return android::OK;
     }
 
@@ -132,10 +103,8 @@ class RemoteBinder : public IBinder {
         const TraceEvent event("binder_died");
         mConnection.reset();
         const sp<IBinder> keep(this);  // a recipient may drop the last other reference
-        const std::vector<Link> links = std::move(mLinks);
-        mLinks.clear();
-        for (const Link& link : links) {
-            const sp<DeathRecipient> recipient = link.recipient.promote();
+        for (const wp<DeathRecipient>& linked : std::exchange(mRecipients, {})) {
+            const sp<DeathRecipient> recipient = linked.promote();
             if (recipient != nullptr) {
                 recipient->binderDied(wp<IBinder>(this));
             }
@@ -144,7 +113,7 @@ class RemoteBinder : public IBinder {
     }
 
     UniqueFd mConnection;  // closed once the owner is known to be dead
-    std::vector<Link> mLinks;
+    std::vector<wp<DeathRecipient>> mRecipients;
 };
 
 // Does not wait for a busy service; the next lookup may reach it.
@@ -158,9 +127,6 @@ bool Connect(const UniqueFd& connection, const sockaddr_un& address) {
 }  // namespace
 
 sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
-    if (!IsServiceName(name)) {
-        return nullptr;
-    }
     const UniqueFd directory = OpenDirectory(driver.substr(1));
     const UniqueFd service(openat(directory.get(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
     UniqueFd connection = NewSocket();

@@ -52,52 +52,47 @@ void StartThread(Work work) {
     pthread_detach(thread);
 }
 
-// Executes the one-way calls of all clients of a service in sequence, in the order of their
-// arrival. Two-way calls do not wait for them. The queue is unbounded.
-class OneWayQueue : public android::BBinder {
-  public:
-    explicit OneWayQueue(const sp<IBinder>& service) : mService(service) {}
+struct Request {
+    RequestHeader header;
+    Parcel data;
+};
 
-    // Executes the queued calls as they come. Never returns.
+// A published binder.
+class Service {
+  public:
+    explicit Service(const sp<IBinder>& binder) : mBinder(binder) {}
+
+    status_t Execute(const Request& request, Parcel* reply) {
+        return mBinder->transact(request.header.code, request.data, reply, request.header.flags);
+    }
+
+    // Queues a one-way call. The queue is unbounded.
+    void Enqueue(std::unique_ptr<Request> call) {
+        const std::lock_guard<std::mutex> lock(mMutex);
+        mCalls.push_back(std::move(call));
+        mHasCalls.notify_one();
+    }
+
+    // Executes the one-way calls of all clients in sequence, in the order of their arrival. Two-way
+    // calls do not wait for them. Never returns.
     [[noreturn]] void Drain() {
         std::unique_lock<std::mutex> lock(mMutex);
         for (;;) {
             mHasCalls.wait(lock, [this] { return !mCalls.empty(); });
-            const std::deque<Call> calls = std::exchange(mCalls, {});
+            const std::unique_ptr<Request> call = std::move(mCalls.front());
+            mCalls.pop_front();
             lock.unlock();
-            for (const Call& call : calls) {
-                Parcel reply;
-                mService->transact(call.code, call.data, &reply, call.flags);
-            }
+            Parcel reply;
+            Execute(*call, &reply);
             lock.lock();
         }
     }
 
-  protected:
-    status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
-        if ((flags & FLAG_ONEWAY) == 0) {
-            return mService->transact(code, data, reply, flags);
-        }
-        const std::lock_guard<std::mutex> lock(mMutex);
-        Call& call = mCalls.emplace_back();
-        call.code = code;
-        call.flags = flags;
-        call.data.setData(data.data(), data.dataSize());
-        mHasCalls.notify_one();
-        return android::OK;
-    }
-
   private:
-    struct Call {
-        uint32_t code = 0;
-        uint32_t flags = 0;
-        Parcel data;
-    };
-
-    const sp<IBinder> mService;
+    const sp<IBinder> mBinder;
     std::mutex mMutex;
     std::condition_variable mHasCalls;
-    std::deque<Call> mCalls;
+    std::deque<std::unique_ptr<Request>> mCalls;
 };
 
 // Replaces the socket of an earlier service of that name, but no other kind of file.
@@ -113,36 +108,36 @@ bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::stri
            listen(listener.get(), kBacklog) == 0;
 }
 
-// Serves one client until it hangs up or sends something that is not a request.
-void ServeClient(const UniqueFd& connection, const sp<IBinder>& service) {
-    RequestHeader header = {};
-    while (Receive(connection.get(), &header, sizeof(header)) &&
-           header.size <= kMaxTransactionBytes) {
-        Parcel request;
-        Parcel reply;
-        if (!Receive(connection.get(), request.resize(header.size), header.size)) {
-            break;
-        }
+// Returns the next request; null when the client hangs up or sends something that is not a request.
+std::unique_ptr<Request> NextRequest(const UniqueFd& connection) {
+    auto request = std::make_unique<Request>();
+    const bool received = ReceiveMessage(connection, &request->header, &request->data);
+    return received ? std::move(request) : nullptr;
+}
+
+void ServeClient(const UniqueFd& connection, Service* service) {
+    while (std::unique_ptr<Request> request = NextRequest(connection)) {
         LookForTrace();
-        status_t status = service->transact(header.code, request, &reply, header.flags);
-        if ((header.flags & IBinder::FLAG_ONEWAY) != 0) {
+        if ((request->header.flags & IBinder::FLAG_ONEWAY) != 0) {
+            service->Enqueue(std::move(request));
             continue;
         }
+        Parcel reply;
+        status_t status = service->Execute(*request, &reply);
         if (status == android::OK && reply.dataSize() > kMaxTransactionBytes) {
             status = android::FAILED_TRANSACTION;
         }
         if (status != android::OK) {
             reply.resize(0);
         }
-        const ReplyHeader answer = {status, static_cast<uint32_t>(reply.dataSize())};
-        if (!SendMessage(connection.get(), &answer, sizeof(answer), reply)) {
+        if (!SendMessage(connection, ReplyHeader{status, 0}, reply)) {
             break;
         }
     }
 }
 
 // Serves every client on its own thread. Never returns.
-[[noreturn]] void AcceptClients(const UniqueFd& listener, const sp<IBinder>& service) {
+[[noreturn]] void AcceptClients(const UniqueFd& listener, Service* service) {
     for (;;) {
         UniqueFd connection(accept4(listener.get(), nullptr, nullptr, SOCK_CLOEXEC));
         if (!connection.ok()) {
@@ -160,9 +155,6 @@ void ServeClient(const UniqueFd& connection, const sp<IBinder>& service) {
 
 status_t PublishService(const std::string& driver, const std::string& name,
                         const sp<IBinder>& binder) {
-    if (binder == nullptr || !IsServiceName(name)) {
-        return android::BAD_VALUE;
-    }
     const UniqueFd directory = OpenDirectory(driver.substr(1), IfMissing::kMake);
     if (!directory.ok()) {
         return -errno;
@@ -174,9 +166,9 @@ status_t PublishService(const std::string& driver, const std::string& name,
     if (!Listen(listener, directory, name)) {
         return -errno;
     }
-    const sp<OneWayQueue> queue = new OneWayQueue(binder);
-    StartThread([queue] { queue->Drain(); });
-    StartThread([listener = std::move(listener), queue] { AcceptClients(listener, queue); });
+    auto* const service = new Service(binder);  // its threads use it until the process exits
+    StartThread([service] { service->Drain(); });
+    StartThread([listener = std::move(listener), service] { AcceptClients(listener, service); });
     return android::OK;
 }
 

@@ -9,6 +9,7 @@
 
 #include <binder/Parcel.h>
 
+#include "platform/libbinder/vndbinder.h"
 #include "platform/unique_fd.h"
 
 namespace host {
@@ -26,18 +27,31 @@ struct ReplyHeader {
     uint32_t size;
 };
 
-// Sends the whole header and parcel. False when the peer is gone.
-bool SendMessage(int connection, const void* header, size_t headerSize,
-                 const android::Parcel& parcel);
+// Sends all these bytes. False when the peer is gone.
+bool Send(const UniqueFd& connection, const std::string& bytes);
 
 // Receives exactly `size` bytes. False when the peer hangs up first.
-bool Receive(int connection, void* buffer, size_t size);
+bool Receive(const UniqueFd& connection, void* buffer, size_t size);
+
+// Sends a header, completed with the parcel's size, and the parcel. False when the peer is gone.
+template <typename Header>
+bool SendMessage(const UniqueFd& connection, Header header, const android::Parcel& parcel) {
+    header.size = static_cast<uint32_t>(parcel.dataSize());
+    std::string message(reinterpret_cast<const char*>(&header), sizeof(header));
+    message.append(reinterpret_cast<const char*>(parcel.data()), parcel.dataSize());
+    return Send(connection, message);
+}
+
+// Receives a header and its parcel. False when the peer hangs up first or the parcel does not fit
+// into the driver's buffer; then the connection is unusable.
+template <typename Header>
+bool ReceiveMessage(const UniqueFd& connection, Header* header, android::Parcel* parcel) {
+    return Receive(connection, header, sizeof(Header)) && header->size <= kMaxTransactionBytes &&
+           Receive(connection, parcel->resize(header->size), header->size);
+}
 
 // A new, unconnected socket.
 UniqueFd NewSocket();
-
-// Whether this is a valid service name: a file name that fits into a socket address.
-bool IsServiceName(const std::string& name);
 
 // The address of the file `name` in the directory `fd`; without a name, of the file `fd` itself.
 // The length of the device root's path does not matter.

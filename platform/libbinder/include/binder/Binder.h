@@ -8,16 +8,22 @@ namespace android {
 // Service side: a binder of this process. Calls from several threads arrive at once.
 class BBinder : public IBinder {
   public:
-    status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags = 0) final;
-    status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
-                         uint32_t flags = 0) override;
-    status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
-                           uint32_t flags = 0, wp<DeathRecipient>* outRecipient = nullptr) override;
+    status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags = 0) final {
+        return onTransact(code, data, reply, flags);
+    }
+    status_t linkToDeath(const sp<DeathRecipient>& /* recipient */, void* /* cookie */,
+                         uint32_t /* flags */) final {
+        return INVALID_OPERATION;
+    }
+    status_t unlinkToDeath(const wp<DeathRecipient>& /* recipient */, void* /* cookie */,
+                           uint32_t /* flags */, wp<DeathRecipient>* /* outRecipient */) final {
+        return INVALID_OPERATION;
+    }
 
   protected:
     // Executes one call. Returns UNKNOWN_TRANSACTION for an unknown code.
     virtual status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply,
-                                uint32_t flags = 0);
+                                uint32_t flags = 0) = 0;
 };
 
 // Client side: the base of a proxy, with its reference to the remote binder.

@@ -14,10 +14,7 @@ class Parcel;
 
 class IBinder : public virtual RefBase {
   public:
-    enum {
-        FIRST_CALL_TRANSACTION = 0x00000001,
-        FLAG_ONEWAY = 0x00000001,
-    };
+    enum { FLAG_ONEWAY = 0x00000001 };
 
     class DeathRecipient : public virtual RefBase {
       public:
@@ -39,8 +36,8 @@ class IBinder : public virtual RefBase {
     virtual status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
                                  uint32_t flags = 0) = 0;
 
-    // Removes one registration with the same arguments. Returns 0, NAME_NOT_FOUND when it does not
-    // exist, or the errors of linkToDeath().
+    // Removes one registration of the recipient and ignores the other arguments. Returns 0,
+    // NAME_NOT_FOUND when it does not exist, or the errors of linkToDeath().
     virtual status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
                                    uint32_t flags = 0,
                                    wp<DeathRecipient>* outRecipient = nullptr) = 0;

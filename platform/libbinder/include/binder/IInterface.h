@@ -5,20 +5,13 @@
 
 namespace android {
 
-class IInterface : public virtual RefBase {
-  protected:
-    virtual IBinder* onAsBinder() = 0;
-};
+class IInterface : public virtual RefBase {};
 
 // Client side: the interface on a remote binder.
 template <typename INTERFACE>
 class BpInterface : public INTERFACE, public BpRefBase {
   public:
     explicit BpInterface(const sp<IBinder>& remote) : BpRefBase(remote) {}
-
-  protected:
-    typedef INTERFACE BaseInterface;
-    IBinder* onAsBinder() override { return remote(); }
 };
 
 }  // namespace android

@@ -22,9 +22,6 @@ class Parcel {
     size_t dataPosition() const { return mPosition; }
     void setDataPosition(size_t position) const;
 
-    // Replaces the content and starts reading at its beginning.
-    status_t setData(const uint8_t* buffer, size_t size);
-
     // Sets the size of the content and returns the content for the caller to fill. A host
     // extension: it lets a transport receive without another copy.
     uint8_t* resize(size_t size);
@@ -33,7 +30,6 @@ class Parcel {
     status_t writeInterfaceToken(const String16& interface);
     status_t writeInt32(int32_t value);
     status_t writeCString(const char* text);
-    status_t writeString16(const String16& text);
 
     // Whether the next value is the token of this interface.
     bool enforceInterface(const String16& interface) const;

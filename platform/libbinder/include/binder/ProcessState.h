@@ -19,7 +19,7 @@ class ProcessState : public virtual RefBase {
     const std::string& getDriverName() const { return mDriver; }
 
   private:
-    explicit ProcessState(std::string driver);
+    explicit ProcessState(const char* driver) : mDriver(driver) {}
 
     const std::string mDriver;
 };
