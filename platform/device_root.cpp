@@ -1,6 +1,5 @@
 #include "platform/device_root.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -9,6 +8,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 
 #include "platform/unique_fd.h"
 
@@ -36,18 +36,6 @@ void FillStandardDescriptors() {
     }
 }
 
-// Makes a directory and its missing parents. Returns 0 or an errno value.
-int MakeDirectories(const std::string& path) {
-    size_t end = 0;
-    do {
-        end = path.find('/', end + 1);
-        if (mkdir(path.substr(0, end).c_str(), 0700) != 0 && errno != EEXIST) {
-            return errno;
-        }
-    } while (end != std::string::npos);
-    return 0;
-}
-
 bool IsMarked(int root) {
     struct stat status = {};
     return fstatat(root, kMark, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
@@ -55,20 +43,13 @@ bool IsMarked(int root) {
 
 // Marks an empty directory as a device root. Returns null, or why that is impossible.
 const char* Mark(int root) {
-    const int opened = openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    DIR* const directory = opened < 0 ? nullptr : fdopendir(opened);
-    if (directory == nullptr) {
-        return strerror(errno);
-    }
-    int entries = 0;
-    while (readdir(directory) != nullptr) {
-        ++entries;
-    }
-    closedir(directory);
-    const bool isEmpty = entries == 2;  // "." and ".."
-    if (isEmpty) {
+    std::error_code error;
+    if (std::filesystem::is_empty("/proc/self/fd/" + std::to_string(root), error)) {
         const UniqueFd mark(openat(root, kMark, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
         return mark.ok() || errno == EEXIST ? nullptr : strerror(errno);
+    }
+    if (error) {
+        return strerror(error.value());
     }
     // Another process may have marked it meanwhile.
     return IsMarked(root) ? nullptr : "contains files that do not belong to a device";
@@ -102,8 +83,10 @@ int OpenRoot() {
     constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
     UniqueFd root(open(path.c_str(), kFlags));
     if (!root.ok() && errno == ENOENT) {
-        if (const int error = MakeDirectories(path); error != 0) {
-            return Refuse(path, strerror(error));
+        std::error_code error;
+        std::filesystem::create_directories(path, error);
+        if (error) {
+            return Refuse(path, error.message().c_str());
         }
         root.reset(open(path.c_str(), kFlags));
     }

@@ -4,7 +4,6 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <cstdio>
@@ -15,17 +14,16 @@ namespace host {
 
 namespace {
 
+using std::filesystem::path;
+
 constexpr int kAnyFile = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
 constexpr int kDirectory = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
 constexpr mode_t kDirectoryMode = 0700;
 constexpr mode_t kFileMode = 0600;
 
-UniqueFd OpenParent(const std::string& path, IfMissing ifMissing) {
-    const size_t slash = path.rfind('/');
-    return OpenDirectory(slash == std::string::npos ? "." : path.substr(0, slash), ifMissing);
+UniqueFd OpenParent(const path& path, IfMissing ifMissing) {
+    return OpenDirectory(path.has_parent_path() ? path.parent_path() : ".", ifMissing);
 }
-
-std::string NameOf(const std::string& path) { return path.substr(path.rfind('/') + 1); }
 
 bool WriteAll(UniqueFd file, std::string_view content) {
     return file.ok() &&
@@ -36,21 +34,22 @@ bool WriteAll(UniqueFd file, std::string_view content) {
 
 }  // namespace
 
-UniqueFd OpenDirectory(const std::string& path, IfMissing ifMissing) {
+UniqueFd OpenDirectory(const path& path, IfMissing ifMissing) {
     UniqueFd directory;
-    size_t begin = 0;
-    do {
-        const size_t end = std::min(path.find('/', begin), path.length());
-        const std::string name = path.substr(begin, end - begin);
-        const int above = begin == 0 ? DeviceRoot() : directory.get();
-        UniqueFd next(openat(above, name.c_str(), kDirectory));
-        if (!next.ok() && errno == ENOENT && ifMissing == IfMissing::kMake) {
-            mkdirat(above, name.c_str(), kDirectoryMode);
-            next.reset(openat(above, name.c_str(), kDirectory));
+    int above = DeviceRoot();
+    for (const auto& name : path.relative_path()) {
+        if (name.empty()) {
+            break;  // a trailing slash
         }
-        directory = std::move(next);
-        begin = end + 1;
-    } while (directory.ok() && begin < path.length());
+        if (ifMissing == IfMissing::kMake) {
+            mkdirat(above, name.c_str(), kDirectoryMode);
+        }
+        directory = UniqueFd(openat(above, name.c_str(), kDirectory));
+        above = directory.get();
+        if (!directory.ok()) {
+            break;
+        }
+    }
     return directory;
 }
 
@@ -63,9 +62,9 @@ UniqueFd OpenFileAt(int directory, const std::string& name, int flags) {
     return UniqueFd(openat(directory, name.c_str(), flags | kAnyFile, kFileMode));
 }
 
-UniqueFd OpenFile(const std::string& path, int flags) {
+UniqueFd OpenFile(const path& path, int flags) {
     const UniqueFd parent = OpenParent(path, IfMissing::kFail);
-    return parent.ok() ? OpenFileAt(parent.get(), NameOf(path), flags) : UniqueFd();
+    return parent.ok() ? OpenFileAt(parent.get(), path.filename(), flags) : UniqueFd();
 }
 
 int OpenForAppending(const char* name, int flags) {
@@ -78,18 +77,18 @@ int OpenForAppending(const char* name, int flags) {
     return file.release();
 }
 
-ssize_t ReadFile(const std::string& path, char* buffer, size_t size) {
+ssize_t ReadFile(const path& path, char* buffer, size_t size) {
     const UniqueFd file = OpenFile(path, O_RDONLY);
     return file.ok() ? read(file.get(), buffer, size) : -1;
 }
 
-bool WriteFile(const std::string& path, std::string_view content) {
+bool WriteFile(const path& path, std::string_view content) {
     return WriteAll(OpenFile(path, O_WRONLY | O_CREAT | O_TRUNC), content);
 }
 
-bool ReplaceFile(const std::string& path, std::string_view content) {
+bool ReplaceFile(const path& path, std::string_view content) {
     const UniqueFd parent = OpenParent(path, IfMissing::kMake);
-    return parent.ok() && ReplaceFileAt(parent.get(), NameOf(path), content);
+    return parent.ok() && ReplaceFileAt(parent.get(), path.filename(), content);
 }
 
 bool ReplaceFileAt(int directory, const std::string& name, std::string_view content,
@@ -107,9 +106,9 @@ bool ReplaceFileAt(int directory, const std::string& name, std::string_view cont
     return false;
 }
 
-bool RemoveFile(const std::string& path) {
+bool RemoveFile(const path& path) {
     const UniqueFd parent = OpenParent(path, IfMissing::kFail);
-    return parent.ok() && unlinkat(parent.get(), NameOf(path).c_str(), 0) == 0;
+    return parent.ok() && unlinkat(parent.get(), path.filename().c_str(), 0) == 0;
 }
 
 }  // namespace host

@@ -4,6 +4,7 @@
 
 #include <sys/types.h>
 
+#include <filesystem>
 #include <string>
 #include <string_view>
 
@@ -23,13 +24,13 @@ constexpr char kTraceFile[] = "trace";
 enum class IfMissing { kFail, kMake };
 
 // Opens a directory for reading and for the *at() calls. "." is the device root.
-UniqueFd OpenDirectory(const std::string& path, IfMissing ifMissing = IfMissing::kFail);
+UniqueFd OpenDirectory(const std::filesystem::path& path, IfMissing ifMissing = IfMissing::kFail);
 
 // The properties directory, made when missing. It stays open. -1 on failure.
 int PropertiesDirectory();
 
 // Opens a file with these flags of open().
-UniqueFd OpenFile(const std::string& path, int flags);
+UniqueFd OpenFile(const std::filesystem::path& path, int flags);
 UniqueFd OpenFileAt(int directory, const std::string& name, int flags);
 
 // Opens a regular file in the root itself for appending. The caller closes the descriptor. Rejects
@@ -38,18 +39,18 @@ UniqueFd OpenFileAt(int directory, const std::string& name, int flags);
 int OpenForAppending(const char* name, int flags);
 
 // Reads at most `size` bytes from the beginning of a file. Returns how many, or -1.
-ssize_t ReadFile(const std::string& path, char* buffer, size_t size);
+ssize_t ReadFile(const std::filesystem::path& path, char* buffer, size_t size);
 
 // Overwrites a file or makes a missing one. Meanwhile other processes may see it empty or half
 // written.
-bool WriteFile(const std::string& path, std::string_view content);
+bool WriteFile(const std::filesystem::path& path, std::string_view content);
 
 // Replaces a file atomically, or makes it and its missing directories. `flags` are those of
 // renameat2().
-bool ReplaceFile(const std::string& path, std::string_view content);
+bool ReplaceFile(const std::filesystem::path& path, std::string_view content);
 bool ReplaceFileAt(int directory, const std::string& name, std::string_view content,
                    unsigned flags = 0);
 
-bool RemoveFile(const std::string& path);
+bool RemoveFile(const std::filesystem::path& path);
 
 }  // namespace host

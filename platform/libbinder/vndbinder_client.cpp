@@ -127,7 +127,7 @@ bool Connect(const UniqueFd& connection, const sockaddr_un& address) {
 }  // namespace
 
 sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
-    const UniqueFd directory = OpenDirectory(driver.substr(1));
+    const UniqueFd directory = OpenDirectory(driver);
     const UniqueFd service(openat(directory.get(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
     UniqueFd connection = NewSocket();
     if (!service.ok() || !Connect(connection, Address(service))) {

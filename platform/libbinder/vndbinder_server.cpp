@@ -155,7 +155,7 @@ void ServeClient(const UniqueFd& connection, Service* service) {
 
 status_t PublishService(const std::string& driver, const std::string& name,
                         const sp<IBinder>& binder) {
-    const UniqueFd directory = OpenDirectory(driver.substr(1), IfMissing::kMake);
+    const UniqueFd directory = OpenDirectory(driver, IfMissing::kMake);
     if (!directory.ok()) {
         return -errno;
     }
