@@ -69,12 +69,9 @@ TraceEvent::~TraceEvent() {
     mLine += "}\n";
     // Opened for every event: the file may be gone, and threads do not share a descriptor.
     const UniqueFd file(OpenForAppending(kTraceFile, 0));
-    const bool isWritten = file.ok() && write(file.get(), mLine.data(), mLine.size()) ==
-                                                static_cast<ssize_t>(mLine.size());
-    if (file.ok() && !isWritten) {
+    const ssize_t written = write(file.get(), mLine.data(), mLine.size());
+    if (written != static_cast<ssize_t>(mLine.size())) {
         fchmod(file.get(), S_IRUSR);
-    }
-    if (!isWritten) {
         gTraced = 0;
     }
     errno = error;

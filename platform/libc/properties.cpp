@@ -5,12 +5,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <cctype>
 #include <cstdio>
 #include <cstring>
 #include <string>
 
-#include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/libc/properties.h"
 #include "platform/trace.h"
@@ -20,41 +18,36 @@ namespace {
 bool IsReadOnlyKey(const std::string& name) { return name.compare(0, 3, "ro.") == 0; }
 
 bool IsLegalName(const std::string& name) {
-    if (name.empty() || name.front() == '.' || name.back() == '.' ||
-        name.find("..") != std::string::npos) {
-        return false;
-    }
-    for (const char c : name) {
-        if (isalnum(static_cast<unsigned char>(c)) == 0 && strchr("_.@:-", c) == nullptr) {
-            return false;
-        }
-    }
-    return true;
+    constexpr char kLegal[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789_.@:-";
+    return !name.empty() && name.front() != '.' && name.back() != '.' &&
+           name.find("..") == std::string::npos &&
+           name.find_first_not_of(kLegal) == std::string::npos;
 }
 
 // Whether the value is valid UTF-8, without overlong forms and surrogates.
 bool IsUtf8(const std::string& value) {
-    constexpr char32_t kLeast[] = {0, 0x80, 0x800, 0x10000};
-    for (size_t i = 0; i < value.length();) {
-        const auto lead = static_cast<unsigned char>(value[i++]);
-        const int following = lead < 0x80 ? 0 : lead < 0xE0 ? 1 : lead < 0xF0 ? 2 : 3;
-        if ((lead >= 0x80 && lead < 0xC0) || lead > 0xF7) {
-            return false;
-        }
-        char32_t point = following == 0 ? lead : lead & (0x3FU >> following);
-        for (int k = 0; k < following; ++k) {
-            const auto byte = static_cast<unsigned char>(i < value.length() ? value[i++] : '\0');
-            if ((byte & 0xC0) != 0x80) {
+    int following = 0;  // continuation bytes that the character still needs
+    int least = 0;      // the range of the next one
+    int greatest = 0;
+    for (const char c : value) {
+        const auto byte = static_cast<unsigned char>(c);
+        if (following > 0) {
+            if (byte < least || byte > greatest) {
                 return false;
             }
-            point = point << 6 | (byte & 0x3F);
-        }
-        const bool isSurrogate = point >= 0xD800 && point <= 0xDFFF;
-        if (point < kLeast[following] || isSurrogate || point > 0x10FFFF) {
-            return false;
+            --following;
+            least = 0x80;
+            greatest = 0xBF;
+        } else if (byte >= 0x80) {
+            if (byte < 0xC2 || byte > 0xF4) {
+                return false;
+            }
+            following = byte < 0xE0 ? 1 : byte < 0xF0 ? 2 : 3;
+            least = byte == 0xE0 ? 0xA0 : byte == 0xF0 ? 0x90 : 0x80;
+            greatest = byte == 0xED ? 0x9F : byte == 0xF4 ? 0x8F : 0xBF;
         }
     }
-    return true;
+    return following == 0;
 }
 
 // Whether the owner's write permission is missing. Then not even root may write the property.
@@ -65,21 +58,19 @@ bool IsWriteProtected(int properties, const std::string& name) {
 }
 
 int Get(const std::string& name, char* value) {
-    ssize_t length = -1;
-    if (host::DeviceRoot() >= 0 && IsLegalName(name)) {
+    ssize_t length = 0;
+    if (IsLegalName(name)) {
         const host::UniqueFd file = host::OpenFileAt(host::PropertiesDirectory(), name, O_RDONLY);
-        length = file.ok() ? read(file.get(), value, PROP_VALUE_MAX - 1) : -1;
+        length = file.ok() ? read(file.get(), value, PROP_VALUE_MAX - 1) : 0;
     }
     value[length > 0 ? length : 0] = '\0';
     return static_cast<int>(strlen(value));
 }
 
 bool Set(const std::string& name, const std::string& value) {
-    if (host::DeviceRoot() < 0 || host::BrokenPropertyRule(name, value) != nullptr) {
-        return false;
-    }
     const int properties = host::PropertiesDirectory();
-    return properties >= 0 && !IsWriteProtected(properties, name) &&
+    return host::BrokenPropertyRule(name, value) == nullptr &&
+           !IsWriteProtected(properties, name) &&
            host::ReplaceFileAt(properties, name, value, IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0);
 }
 

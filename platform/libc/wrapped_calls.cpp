@@ -26,14 +26,8 @@ FILE* __wrap_fopen(const char* path, const char* mode) {
         return __real_fopen(path, mode);
     }
     host::UniqueFd file = host::OpenFile(host::kCommandLineFile, O_RDONLY);
-    if (!file.ok()) {
-        return errno == ENOENT ? __real_fopen(path, mode) : nullptr;
-    }
-    FILE* const stream = fdopen(file.get(), mode);
-    if (stream != nullptr) {
-        (void)file.release();
-    }
-    return stream;
+    const bool isMissing = !file.ok() && errno == ENOENT;
+    return isMissing ? __real_fopen(path, mode) : fdopen(file.release(), mode);
 }
 
 int __wrap_usleep(useconds_t us) {
@@ -48,8 +42,8 @@ int __wrap_system(const char* command) {
     return status;
 }
 
-// The event of this thread's open pipe. The tool opens one at a time.
-static thread_local std::optional<host::TraceEvent> gPipe;
+// The event of the open pipe. The tool opens one at a time, on its only thread.
+static std::optional<host::TraceEvent> gPipe;
 
 FILE* __wrap_popen(const char* command, const char* mode) {
     gPipe.emplace("shell").Add("command", command);
@@ -58,10 +52,8 @@ FILE* __wrap_popen(const char* command, const char* mode) {
 
 int __wrap_pclose(FILE* stream) {
     const int status = __real_pclose(stream);
-    if (gPipe.has_value()) {
-        gPipe->Add("status", status);
-        gPipe.reset();
-    }
+    gPipe->Add("status", status);
+    gPipe.reset();
     return status;
 }
 
