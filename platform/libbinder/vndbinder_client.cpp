@@ -60,7 +60,14 @@ class RemoteBinder : public IBinder {
 
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* /* cookie */,
                            uint32_t /* flags */, wp<DeathRecipient>* /* outRecipient */) override {
-        const status_t status = Unlink(recipient);
+        const auto found = std::find(mRecipients.begin(), mRecipients.end(), recipient);
+        const bool isLinked = found != mRecipients.end();
+        if (isLinked) {
+            mRecipients.erase(found);
+        }
+        const status_t status = !mConnection.ok() ? android::DEAD_OBJECT
+                                : isLinked        ? android::OK
+                                                  : android::NAME_NOT_FOUND;
         TraceEvent("unlink_to_death").Add("status", status);
         return status;
     }
@@ -86,18 +93,6 @@ class RemoteBinder : public IBinder {
         return std::min<status_t>(header.status, android::OK);
     }
 
-    status_t Unlink(const wp<DeathRecipient>& recipient) {
-        if (!mConnection.ok()) {
-            return android::DEAD_OBJECT;
-        }
-        const auto found = std::find(mRecipients.begin(), mRecipients.end(), recipient);
-        if (found == mRecipients.end()) {
-            return android::NAME_NOT_FOUND;
-        }
-        mRecipients.erase(found);
-        return android::OK;
-    }
-
     // Notifies the recipients, once, on this thread.
     status_t OwnerDied() {
         const TraceEvent event("binder_died");
@@ -116,23 +111,20 @@ class RemoteBinder : public IBinder {
     std::vector<wp<DeathRecipient>> mRecipients;
 };
 
-// Does not wait for a busy service; the next lookup may reach it.
-bool Connect(const UniqueFd& connection, const sockaddr_un& address) {
-    return fcntl(connection.get(), F_SETFL, O_NONBLOCK) == 0 &&
-           connect(connection.get(), reinterpret_cast<const sockaddr*>(&address),
-                   sizeof(address)) == 0 &&
-           fcntl(connection.get(), F_SETFL, 0) == 0;
-}
-
 }  // namespace
 
 sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
     const UniqueFd directory = OpenDirectory(driver);
     const UniqueFd service(openat(directory.get(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
+    const sockaddr_un address = Address(service);
     UniqueFd connection = NewSocket();
-    if (!service.ok() || !Connect(connection, Address(service))) {
+    // Does not wait for a busy service; the next lookup may reach it.
+    fcntl(connection.get(), F_SETFL, O_NONBLOCK);
+    if (connect(connection.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) !=
+        0) {
         return nullptr;
     }
+    fcntl(connection.get(), F_SETFL, 0);
     return NewProxy(std::move(connection));
 }
 

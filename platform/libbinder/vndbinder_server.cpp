@@ -18,7 +18,6 @@
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/libbinder/vndbinder_wire.h"
-#include "platform/trace.h"
 
 using android::IBinder;
 using android::Parcel;
@@ -108,16 +107,13 @@ bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::stri
            listen(listener.get(), kBacklog) == 0;
 }
 
-// Returns the next request; null when the client hangs up or sends something that is not a request.
-std::unique_ptr<Request> NextRequest(const UniqueFd& connection) {
-    auto request = std::make_unique<Request>();
-    const bool received = ReceiveMessage(connection, &request->header, &request->data);
-    return received ? std::move(request) : nullptr;
-}
-
+// Serves one client until it hangs up or sends something that is not a request.
 void ServeClient(const UniqueFd& connection, Service* service) {
-    while (std::unique_ptr<Request> request = NextRequest(connection)) {
-        LookForTrace();
+    for (;;) {
+        auto request = std::make_unique<Request>();
+        if (!ReceiveMessage(connection, &request->header, &request->data)) {
+            return;
+        }
         if ((request->header.flags & IBinder::FLAG_ONEWAY) != 0) {
             service->Enqueue(std::move(request));
             continue;
@@ -131,7 +127,7 @@ void ServeClient(const UniqueFd& connection, Service* service) {
             reply.resize(0);
         }
         if (!SendMessage(connection, ReplyHeader{status, 0}, reply)) {
-            break;
+            return;
         }
     }
 }

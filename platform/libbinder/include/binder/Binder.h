@@ -1,11 +1,11 @@
-// Host implementation of the platform's binder objects on either side of a call.
+// Host implementation of the platform's binder objects on the service side of a call.
 #pragma once
 
 #include <binder/IBinder.h>
 
 namespace android {
 
-// Service side: a binder of this process. Calls from several threads arrive at once.
+// A binder of this process. Calls from several threads arrive at once.
 class BBinder : public IBinder {
   public:
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags = 0) final {
@@ -24,16 +24,6 @@ class BBinder : public IBinder {
     // Executes one call. Returns UNKNOWN_TRANSACTION for an unknown code.
     virtual status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply,
                                 uint32_t flags = 0) = 0;
-};
-
-// Client side: the base of a proxy, with its reference to the remote binder.
-class BpRefBase : public virtual RefBase {
-  protected:
-    explicit BpRefBase(const sp<IBinder>& remote) : mRemote(remote) {}
-    IBinder* remote() const { return mRemote.get(); }
-
-  private:
-    const sp<IBinder> mRemote;
 };
 
 }  // namespace android
