@@ -101,7 +101,7 @@ const char* Boot(const char* selinuxMode) {
     if (!Empty(host::kPropertiesDirectory, "persist.") || !SetBootProperties()) {
         return host::kPropertiesDirectory;
     }
-    if (!host::WriteFile(host::kLogFile, "")) {
+    if (!host::OpenFile(host::kLogFile, O_WRONLY | O_CREAT | O_TRUNC).ok()) {
         return host::kLogFile;
     }
     return host::ReplaceFile(host::kSelinuxFile, selinuxMode) ? nullptr : host::kSelinuxFile;

@@ -82,10 +82,6 @@ ssize_t ReadFile(const path& path, char* buffer, size_t size) {
     return file.ok() ? read(file.get(), buffer, size) : -1;
 }
 
-bool WriteFile(const path& path, std::string_view content) {
-    return WriteAll(OpenFile(path, O_WRONLY | O_CREAT | O_TRUNC), content);
-}
-
 bool ReplaceFile(const path& path, std::string_view content) {
     const UniqueFd parent = OpenParent(path, IfMissing::kMake);
     return parent.ok() && ReplaceFileAt(parent.get(), path.filename(), content);

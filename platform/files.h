@@ -41,10 +41,6 @@ int OpenForAppending(const char* name, int flags);
 // Reads at most `size` bytes from the beginning of a file. Returns how many, or -1.
 ssize_t ReadFile(const std::filesystem::path& path, char* buffer, size_t size);
 
-// Overwrites a file or makes a missing one. Meanwhile other processes may see it empty or half
-// written.
-bool WriteFile(const std::filesystem::path& path, std::string_view content);
-
 // Replaces a file atomically, or makes it and its missing directories. `flags` are those of
 // renameat2().
 bool ReplaceFile(const std::filesystem::path& path, std::string_view content);

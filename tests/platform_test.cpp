@@ -91,7 +91,7 @@ TEST(FilesTest, RefusesLinksAtAnyDepth) {
     EXPECT_TRUE(host::OpenDirectory("links", host::IfMissing::kMake).ok());
     std::filesystem::create_directory_symlink(outside, kRoot.path + "/links/link");
     EXPECT_FALSE(host::ReplaceFile("links/link/file", "text"));
-    EXPECT_FALSE(host::WriteFile("links/link/below/file", "text"));
+    EXPECT_FALSE(host::ReplaceFile("links/link/below/file", "text"));
     EXPECT_TRUE(std::filesystem::remove(outside));  // fails when it is not empty
 }
 
@@ -170,7 +170,7 @@ class TestService : public android::BBinder {
 };
 
 TEST(TraceTest, EscapesTextAndKeepsErrno) {
-    EXPECT_TRUE(host::WriteFile(host::kTraceFile, ""));
+    EXPECT_TRUE(host::ReplaceFile(host::kTraceFile, ""));
     const host::UniqueFd recorder = host::OpenFile(host::kTraceFile, O_RDONLY);
     ASSERT_EQ(flock(recorder.get(), LOCK_EX), 0);
     errno = E2BIG;
