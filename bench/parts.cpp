@@ -22,7 +22,6 @@
 #include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
-#include "platform/libbinder/vndbinder_wire.h"
 #include "property/Property.h"
 
 namespace {

@@ -1,7 +1,9 @@
 // Helpers shared by the programs of the virtual device.
 #pragma once
 
+#include <fcntl.h>
 #include <sys/system_properties.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdint>
@@ -64,8 +66,9 @@ inline bool IsDaemonEnabled() {
 // Returns the contents of a file in the device root, or `missing` when it cannot be read. Reads at
 // most 128 KiB, the size limit of a program argument.
 inline std::string ReadText(const std::string& path, const char* missing) {
+    const host::UniqueFd file = host::OpenFile(path, O_RDONLY);
     std::string text(131072, '\0');
-    const ssize_t length = host::ReadFile(path, text.data(), text.size());
+    const ssize_t length = read(file.get(), text.data(), text.size());
     return length < 0 ? missing : text.substr(0, static_cast<size_t>(length));
 }
 

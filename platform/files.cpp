@@ -77,11 +77,6 @@ int OpenForAppending(const char* name, int flags) {
     return file.release();
 }
 
-ssize_t ReadFile(const path& path, char* buffer, size_t size) {
-    const UniqueFd file = OpenFile(path, O_RDONLY);
-    return file.ok() ? read(file.get(), buffer, size) : -1;
-}
-
 bool ReplaceFile(const path& path, std::string_view content) {
     const UniqueFd parent = OpenParent(path, IfMissing::kMake);
     return parent.ok() && ReplaceFileAt(parent.get(), path.filename(), content);

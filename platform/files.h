@@ -2,8 +2,6 @@
 // component of a path. A function that fails sets errno.
 #pragma once
 
-#include <sys/types.h>
-
 #include <filesystem>
 #include <string>
 #include <string_view>
@@ -37,9 +35,6 @@ UniqueFd OpenFileAt(int directory, const std::string& name, int flags);
 // a pipe: a write to one without a reader would kill the process. O_CREAT in `flags` makes a
 // missing file.
 int OpenForAppending(const char* name, int flags);
-
-// Reads at most `size` bytes from the beginning of a file. Returns how many, or -1.
-ssize_t ReadFile(const std::filesystem::path& path, char* buffer, size_t size);
 
 // Replaces a file atomically, or makes it and its missing directories. `flags` are those of
 // renameat2().

@@ -2,13 +2,12 @@
 
 #include <algorithm>
 #include <cstring>
-#include <limits>
 
 namespace android {
 
 namespace {
 
-constexpr int32_t kNoStrictModePolicy = std::numeric_limits<int32_t>::min();  // 0x80000000
+constexpr int32_t kNoStrictModePolicy = INT32_MIN;  // 0x80000000
 constexpr int32_t kNoWorkSource = -1;
 constexpr int32_t kVendorHeader = 'V' << 24 | 'N' << 16 | 'D' << 8 | 'R';
 

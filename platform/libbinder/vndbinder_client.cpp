@@ -9,7 +9,6 @@
 
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
-#include "platform/libbinder/vndbinder_wire.h"
 #include "platform/trace.h"
 
 using android::IBinder;

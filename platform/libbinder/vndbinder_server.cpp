@@ -17,7 +17,6 @@
 
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
-#include "platform/libbinder/vndbinder_wire.h"
 
 using android::IBinder;
 using android::Parcel;

@@ -1,4 +1,4 @@
-#include "platform/libbinder/vndbinder_wire.h"
+#include "platform/libbinder/vndbinder.h"
 
 #include <sys/socket.h>
 
