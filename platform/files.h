@@ -21,7 +21,8 @@ constexpr char kTraceFile[] = "trace";
 
 enum class IfMissing { kFail, kMake };
 
-// Opens a directory for reading and for the *at() calls. "." is the device root.
+// Opens a directory for reading and for the *at() calls. "." is the device root. The path may begin
+// with a slash.
 UniqueFd OpenDirectory(const std::filesystem::path& path, IfMissing ifMissing = IfMissing::kFail);
 
 // The properties directory, made when missing. It stays open. -1 on failure.

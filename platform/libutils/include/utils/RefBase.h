@@ -18,7 +18,7 @@ class RefBase : public std::enable_shared_from_this<RefBase> {
     RefBase() = default;
 };
 
-// A weak reference to an object that has a strong one, or to none.
+// A weak reference, empty or to an object that has a strong reference at that time.
 template <typename T>
 class wp : public std::weak_ptr<T> {
   public:
