@@ -82,16 +82,13 @@ int OpenRoot() {
     }
     constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
     UniqueFd root(open(path.c_str(), kFlags));
+    std::error_code error;
     if (!root.ok() && errno == ENOENT) {
-        std::error_code error;
         std::filesystem::create_directories(path, error);
-        if (error) {
-            return Refuse(path, error.message().c_str());
-        }
         root.reset(open(path.c_str(), kFlags));
     }
     if (!root.ok()) {
-        return Refuse(path, strerror(errno));
+        return Refuse(path, error ? strerror(error.value()) : strerror(errno));
     }
     const char* const why = Check(root.get());
     return why == nullptr ? root.release() : Refuse(path, why);

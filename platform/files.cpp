@@ -18,8 +18,6 @@ using std::filesystem::path;
 
 constexpr int kAnyFile = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
 constexpr int kDirectory = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-constexpr mode_t kDirectoryMode = 0700;
-constexpr mode_t kFileMode = 0600;
 
 UniqueFd OpenParent(const path& path, IfMissing ifMissing) {
     return OpenDirectory(path.has_parent_path() ? path.parent_path() : ".", ifMissing);
@@ -42,7 +40,7 @@ UniqueFd OpenDirectory(const path& path, IfMissing ifMissing) {
             break;  // a trailing slash
         }
         if (ifMissing == IfMissing::kMake) {
-            mkdirat(above, name.c_str(), kDirectoryMode);
+            mkdirat(above, name.c_str(), 0700);
         }
         directory = UniqueFd(openat(above, name.c_str(), kDirectory));
         above = directory.get();
@@ -59,7 +57,7 @@ int PropertiesDirectory() {
 }
 
 UniqueFd OpenFileAt(int directory, const std::string& name, int flags) {
-    return UniqueFd(openat(directory, name.c_str(), flags | kAnyFile, kFileMode));
+    return UniqueFd(openat(directory, name.c_str(), flags | kAnyFile, 0600));
 }
 
 UniqueFd OpenFile(const path& path, int flags) {

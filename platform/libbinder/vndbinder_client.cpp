@@ -5,8 +5,6 @@
 #include <utility>
 #include <vector>
 
-#include <binder/Parcel.h>
-
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/trace.h"

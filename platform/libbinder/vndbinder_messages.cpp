@@ -1,7 +1,9 @@
 #include "platform/libbinder/vndbinder.h"
 
 #include <sys/socket.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <string_view>
 
@@ -10,7 +12,8 @@ namespace host {
 bool Send(const UniqueFd& connection, const std::string& bytes) {
     std::string_view left = bytes;
     while (!left.empty()) {
-        const ssize_t sent = send(connection.get(), left.data(), left.size(), MSG_NOSIGNAL);
+        const ssize_t sent =
+                TEMP_FAILURE_RETRY(send(connection.get(), left.data(), left.size(), MSG_NOSIGNAL));
         if (sent < 0) {
             return false;
         }
@@ -22,7 +25,8 @@ bool Send(const UniqueFd& connection, const std::string& bytes) {
 bool Receive(const UniqueFd& connection, void* buffer, size_t size) {
     auto* next = static_cast<char*>(buffer);
     while (size > 0) {
-        const ssize_t received = recv(connection.get(), next, size, MSG_WAITALL);
+        const ssize_t received =
+                TEMP_FAILURE_RETRY(recv(connection.get(), next, size, MSG_WAITALL));
         if (received <= 0) {
             return false;
         }

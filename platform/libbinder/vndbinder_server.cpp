@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <condition_variable>
@@ -12,8 +13,6 @@
 #include <mutex>
 #include <thread>
 #include <utility>
-
-#include <binder/Parcel.h>
 
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
@@ -51,7 +50,7 @@ void StartThread(Work work) {
 }
 
 struct Request {
-    RequestHeader header;
+    RequestHeader header = {};
     Parcel data;
 };
 
@@ -64,10 +63,13 @@ class Service {
         return mBinder->transact(request.header.code, request.data, reply, request.header.flags);
     }
 
-    // Queues a one-way call. The queue is unbounded.
-    void Enqueue(std::unique_ptr<Request> call) {
+    // Queues a copy of a one-way call. The queue is unbounded.
+    void Enqueue(const Request& request) {
         const std::lock_guard<std::mutex> lock(mMutex);
-        mCalls.push_back(std::move(call));
+        Request& call = mCalls.emplace_back();
+        const size_t size = request.data.dataSize();
+        call.header = request.header;
+        std::copy_n(request.data.data(), size, call.data.resize(size));
         mHasCalls.notify_one();
     }
 
@@ -77,11 +79,12 @@ class Service {
         std::unique_lock<std::mutex> lock(mMutex);
         for (;;) {
             mHasCalls.wait(lock, [this] { return !mCalls.empty(); });
-            const std::unique_ptr<Request> call = std::move(mCalls.front());
-            mCalls.pop_front();
+            const std::deque<Request> calls = std::exchange(mCalls, {});
             lock.unlock();
-            Parcel reply;
-            Execute(*call, &reply);
+            for (const Request& call : calls) {
+                Parcel reply;
+                Execute(call, &reply);
+            }
             lock.lock();
         }
     }
@@ -90,7 +93,7 @@ class Service {
     const sp<IBinder> mBinder;
     std::mutex mMutex;
     std::condition_variable mHasCalls;
-    std::deque<std::unique_ptr<Request>> mCalls;
+    std::deque<Request> mCalls;
 };
 
 // Replaces the socket of an earlier service of that name, but no other kind of file.
@@ -109,16 +112,16 @@ bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::stri
 // Serves one client until it hangs up or sends something that is not a request.
 void ServeClient(const UniqueFd& connection, Service* service) {
     for (;;) {
-        auto request = std::make_unique<Request>();
-        if (!ReceiveMessage(connection, &request->header, &request->data)) {
+        Request request;
+        if (!ReceiveMessage(connection, &request.header, &request.data)) {
             return;
         }
-        if ((request->header.flags & IBinder::FLAG_ONEWAY) != 0) {
-            service->Enqueue(std::move(request));
+        if ((request.header.flags & IBinder::FLAG_ONEWAY) != 0) {
+            service->Enqueue(request);
             continue;
         }
         Parcel reply;
-        status_t status = service->Execute(*request, &reply);
+        status_t status = service->Execute(request, &reply);
         if (status == android::OK && reply.dataSize() > kMaxTransactionBytes) {
             status = android::FAILED_TRANSACTION;
         }

@@ -11,14 +11,6 @@ class BBinder : public IBinder {
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags = 0) final {
         return onTransact(code, data, reply, flags);
     }
-    status_t linkToDeath(const sp<DeathRecipient>& /* recipient */, void* /* cookie */,
-                         uint32_t /* flags */) final {
-        return INVALID_OPERATION;
-    }
-    status_t unlinkToDeath(const wp<DeathRecipient>& /* recipient */, void* /* cookie */,
-                           uint32_t /* flags */, wp<DeathRecipient>* /* outRecipient */) final {
-        return INVALID_OPERATION;
-    }
 
   protected:
     // Executes one call. Returns UNKNOWN_TRANSACTION for an unknown code.

@@ -33,14 +33,18 @@ class IBinder : public virtual RefBase {
 
     // Registers a recipient and keeps a weak reference to it. Returns 0, DEAD_OBJECT when the owner
     // is known to be dead, or INVALID_OPERATION on a binder of this process.
-    virtual status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie = nullptr,
-                                 uint32_t flags = 0) = 0;
+    virtual status_t linkToDeath(const sp<DeathRecipient>& /* recipient */,
+                                 void* /* cookie */ = nullptr, uint32_t /* flags */ = 0) {
+        return INVALID_OPERATION;
+    }
 
     // Removes one registration of the recipient and ignores the other arguments. Returns 0,
     // NAME_NOT_FOUND when it does not exist, or the errors of linkToDeath().
-    virtual status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie = nullptr,
-                                   uint32_t flags = 0,
-                                   wp<DeathRecipient>* outRecipient = nullptr) = 0;
+    virtual status_t unlinkToDeath(const wp<DeathRecipient>& /* recipient */,
+                                   void* /* cookie */ = nullptr, uint32_t /* flags */ = 0,
+                                   wp<DeathRecipient>* /* outRecipient */ = nullptr) {
+        return INVALID_OPERATION;
+    }
 };
 
 }  // namespace android
