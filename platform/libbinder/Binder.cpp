@@ -15,7 +15,6 @@ namespace android {
 
 namespace {
 
-constexpr char kDefaultDriver[] = "/dev/binder";
 constexpr int64_t kGetServiceLimitMs = 5000;
 constexpr int64_t kMaxGetServiceLimitMs = 86'400'000;  // a day
 constexpr int64_t kGetServicePauseUs = 100000;
@@ -65,7 +64,7 @@ class DriverServiceManager : public IServiceManager {
 sp<IInterface> IBinder::queryLocalInterface(const String16& /* descriptor */) { return nullptr; }
 
 sp<ProcessState> ProcessState::self() {
-    return gProcess != nullptr ? gProcess : initWithDriver(kDefaultDriver);
+    return gProcess != nullptr ? gProcess : initWithDriver("/dev/binder");
 }
 
 sp<ProcessState> ProcessState::initWithDriver(const char* driver) {

@@ -26,7 +26,6 @@ namespace host {
 
 namespace {
 
-constexpr int kBacklog = 128;
 constexpr std::chrono::milliseconds kRetryPause(10);
 // The kernel closes the descriptors of a dying process from the highest down. The listener is above
 // the connections, so a client whose call fails cannot find it again, as with a real driver.
@@ -106,7 +105,7 @@ bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::stri
     const sockaddr_un address = Address(directory, name);
     return bind(listener.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) ==
                    0 &&
-           listen(listener.get(), kBacklog) == 0;
+           listen(listener.get(), SOMAXCONN) == 0;
 }
 
 // Serves one client until it hangs up or sends something that is not a request.
