@@ -35,14 +35,6 @@ def test_forwards_in_upgrade_mode(device):
     assert device.tpd("captest") == PASS
 
 
-def test_ignores_a_linked_kernel_command_line(device, tmp_path):
-    device.setprop(PERMISSIVE, "null")
-    (tmp_path / "cmdline").write_text("enter_recovery=1\n")
-    (device.root / "proc").mkdir()
-    (device.root / "proc/cmdline").symlink_to(tmp_path / "cmdline")
-    assert device.tpd("captest").startswith("please exe 'adb shell setenforce 0'")
-
-
 def test_reports_a_firmware_update(device):
     device.setprop("sim.updating_fw", "true")
     wait_until(lambda: device.getprop("odm.thp.is_updating_fw") == "true")

@@ -11,7 +11,7 @@ from virtual_device import LIMIT_S, PASS, wait_until
 
 @pytest.fixture
 def trace(stopped_device):
-    """Traces a command on a running device without a recorder, and returns the output."""
+    """Runs `device trace` on a running device and returns its output."""
     stopped_device.output("device", "start", "--permissive")
     return lambda *arguments: stopped_device.output("device", "trace", *arguments)
 
@@ -22,15 +22,15 @@ def assert_in_order(shown, *parts):
 
 def test_shows_the_steps_of_a_command(trace):
     assert_in_order(
-        trace("captest"),
+        trace("captest", "\33[2J"),
         "tool runs getenforce",
         'tool writes odm.thp.debug.selinux.permissive: "null" -> "true"',
         "tool looks up service.corvaneinterfaceservice: found",
         "tool calls code 0, two-way",
-        "daemon receives captest",
+        r'daemon receives captest, parameters "\x1b[2J"',
         "daemon answers",
         "tool has its reply",
-        f"result: {PASS}",
+        r"result: captest \x1b[2J: PASS",
     )
 
 
