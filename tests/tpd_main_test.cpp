@@ -61,45 +61,51 @@ TEST(TpdMainTest, DoesNothingWithOtherArguments) {
     }
 }
 
-TEST(TpdMainTest, ExecutesLocalCommands) {
+// Runs the handler of a local command and expects these writes and shell commands.
+void ExpectLocal(const std::string& command, const std::string& confirmation,
+                 const std::vector<Call>& calls) {
+    SCOPED_TRACE(command);
+    FakeDevice device;
+    device.properties[kThplogKey] = command == "log_disable" ? "true" : "";
+    g_tpdCmd = new TpdCmd;
+    AddBasicTpdCmds();
+    AddThplogTpdCmds();
+    AddRawTpdCmds();
+    AddAfelogTpdCmds();
+    AddShowtouchTpdCmds();
+    EXPECT_EQ(gTpdCmds[command].handler(""), confirmation);
+    EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(calls));
+}
+
+TEST(TpdMainTest, ControlsTheDaemon) {
+    ExpectLocal("start", "start corvane_daemon done\n", {kSetBootFlag, kStart});
+    ExpectLocal("stop", "stop corvane_daemon done\n", {kStop});
+    ExpectLocal("reboot", "reboot corvane_daemon done\n", {kStop, kSetBootFlag, kStart});
+}
+
+TEST(TpdMainTest, SwitchesTheLogs) {
+    ExpectLocal("log_enable", "enable thplog\n",
+                {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart});
+    ExpectLocal("log_disable", "disable thplog\n",
+                {Write("persist.sys.zelmor.debug.on", "false"),
+                 Write("persist.odm.thp.ver_dae", "true"), Write("odm.thp.ver_dae", "true"),
+                 Write(kThplogKey, "false"), kStop, kSetBootFlag, kStart});
+    const std::string afe = "odm.thp.debug.afelog";
+    ExpectLocal("log_afe_enable", "enable afehal log\n",
+                {Write(afe, "true"), kStop, kSetBootFlag, kStart});
+    ExpectLocal("log_afe_disable", "disable afehal log\n",
+                {Write(afe, "false"), kStop, kSetBootFlag, kStart});
+}
+
+TEST(TpdMainTest, SwitchesRawDataAndTheTouchDisplay) {
+    const std::string raw = "thp.debug.raw";
+    ExpectLocal("debugRawEnable", "set thp.debug.raw as 1\n", {Write(raw, "true")});
+    ExpectLocal("debugDifEnable", "set thp.debug.raw as 0\n", {Write(raw, "false")});
     const std::string show = "settings put system show_touches ";
     const std::string point = "settings put system pointer_location ";
-    const Call logOn = Write(kThplogKey, "true");
-    const Call afeOn = Write("odm.thp.debug.afelog", "true");
-    const Call afeOff = Write("odm.thp.debug.afelog", "false");
-    const struct {
-        const char* command;
-        const char* confirmation;
-        std::vector<Call> calls;
-    } kRows[] = {
-            {"start", "start corvane_daemon done\n", {kSetBootFlag, kStart}},
-            {"stop", "stop corvane_daemon done\n", {kStop}},
-            {"reboot", "reboot corvane_daemon done\n", {kStop, kSetBootFlag, kStart}},
-            {"log_enable", "enable thplog\n", {logOn, kStop, kSetBootFlag, kStart}},
-            {"log_disable",
-             "disable thplog\n",
-             {Write("persist.sys.zelmor.debug.on", "false"),
-              Write("persist.odm.thp.ver_dae", "true"), Write("odm.thp.ver_dae", "true"),
-              Write(kThplogKey, "false"), kStop, kSetBootFlag, kStart}},
-            {"debugRawEnable", "set thp.debug.raw as 1\n", {Write("thp.debug.raw", "true")}},
-            {"debugDifEnable", "set thp.debug.raw as 0\n", {Write("thp.debug.raw", "false")}},
-            {"log_afe_enable", "enable afehal log\n", {afeOn, kStop, kSetBootFlag, kStart}},
-            {"log_afe_disable", "disable afehal log\n", {afeOff, kStop, kSetBootFlag, kStart}},
-            {"showtouch", "show touch done\n", {Shell(show + "1"), Shell(point + "1")}},
-            {"showtouch_close", "close touch show done\n", {Shell(show + "0"), Shell(point + "0")}},
-    };
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.command);
-        FakeDevice device;
-        device.properties[kThplogKey] = row.command == std::string("log_disable") ? "true" : "";
-        g_tpdCmd = new TpdCmd;
-        for (const auto addCommands : {AddBasicTpdCmds, AddThplogTpdCmds, AddRawTpdCmds,
-                                       AddAfelogTpdCmds, AddShowtouchTpdCmds}) {
-            addCommands();
-        }
-        EXPECT_EQ(gTpdCmds[row.command].handler(""), row.confirmation);
-        EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(row.calls));
-    }
+    ExpectLocal("showtouch", "show touch done\n", {Shell(show + "1"), Shell(point + "1")});
+    ExpectLocal("showtouch_close", "close touch show done\n",
+                {Shell(show + "0"), Shell(point + "0")});
 }
 
 TEST(TpdMainTest, LogsALocalCommandAndPrintsAnEmptyLine) {
