@@ -4,7 +4,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
-#include <string>
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size);
 
@@ -14,5 +13,3 @@ inline void Check(bool condition) {
         abort();
     }
 }
-
-inline std::string ToString(const uint8_t* data, size_t size) { return {data, data + size}; }

@@ -1,11 +1,9 @@
 // The tool with any arguments, on any device. The bits of the input's first two bytes choose the
 // state of the device; the arguments follow as zero-terminated strings. The last one is also
 // the kernel command line, getenforce's output and the daemon's answer.
-#include <algorithm>
 #include <bitset>
 #include <cstdio>
-#include <cstring>
-#include <vector>
+#include <sstream>
 
 #include "daemon/TpdClient.h"
 #include "fuzz.h"
@@ -15,13 +13,14 @@ int tpd_main(int argc, char** argv);
 
 int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     static const bool silent = freopen("/dev/null", "w", stdout) != nullptr;
-    uint16_t bits = 0;
-    memcpy(&bits, data, std::min(size, sizeof(bits)));
-    const std::bitset<16> state(bits);
+    if (size < 2) {
+        return 0;
+    }
+    const std::bitset<16> state(data[0] + 256U * data[1]);
+    std::istringstream strings(std::string(data + 2, data + size));
     std::vector<std::string> arguments = {"tpd"};
-    for (size_t at = sizeof(bits); at < size && arguments.size() < 6;
-         at += arguments.back().size() + 1) {
-        arguments.emplace_back(ToString(data + at, size - at).c_str());
+    for (std::string text; arguments.size() < 6 && std::getline(strings, text, '\0');) {
+        arguments.push_back(text);
     }
     std::vector<char*> argv;
     for (std::string& argument : arguments) {

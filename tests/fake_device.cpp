@@ -61,22 +61,19 @@ class FakeService : public IBinder {
 
     status_t linkToDeath(const sp<DeathRecipient>& recipient, void* cookie,
                          uint32_t flags) override {
-        gDevice->Record(LinkToDeath(IsTools(recipient, cookie, flags) ? mNumber : -1));
+        gDevice->Record(LinkToDeath(cookie == nullptr && flags == 0 ? mNumber : -1));
         mRecipient = recipient;
         return OK;
     }
 
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* cookie, uint32_t flags,
                            wp<DeathRecipient>* /* out */) override {
-        gDevice->Record(UnlinkToDeath(IsTools(recipient, cookie, flags) ? mNumber : -1));
+        const bool linked = recipient == mRecipient && cookie == nullptr && flags == 0;
+        gDevice->Record(UnlinkToDeath(linked ? mNumber : -1));
         return OK;
     }
 
   private:
-    static bool IsTools(const wp<DeathRecipient>& recipient, const void* cookie, uint32_t flags) {
-        return recipient == wp<DeathRecipient>(g_deathRecipient) && cookie == nullptr && flags == 0;
-    }
-
     const int mNumber;
     wp<DeathRecipient> mRecipient;
 };

@@ -31,22 +31,6 @@ def test_fault_has_its_documented_result(device, fault, text, dies):
     wait_until(lambda: bool(device.events("daemon_exit")) == dies)
 
 
-USAGE_ERRORS = {
-    "hangg": "unknown fault 'hangg'; 'device fault' lists them",
-    "hang 1O0": "fault hang: invalid MILLISECONDS '1O0'; use 0 to 1000000000",
-    "no_text 0": "fault no_text: invalid COUNT '0'; use 1 to 2147483647",
-    "none 1": "fault none: unexpected argument '1'",
-}
-
-
-@pytest.mark.parametrize("arguments", USAGE_ERRORS)
-def test_names_the_invalid_argument(device, arguments):
-    done = device.run("device", "fault", *arguments.split())
-    assert (done.returncode, done.stdout) == (2, "")
-    assert done.stderr == f"device: {USAGE_ERRORS[arguments]}\n"
-    assert device.getprop("sim.fault") == ""
-
-
 def test_tool_can_be_interrupted_while_the_daemon_hangs(device):
     device.output("device", "fault", "hang", "60000", "1")
     tool = subprocess.Popen([*device.tool, "captest"], env=device.env)

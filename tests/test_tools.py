@@ -1,5 +1,4 @@
 """The device's shell commands, recorded answers and adb"""
-import os
 from subprocess import PIPE, Popen
 
 import pytest
@@ -16,13 +15,6 @@ def test_getprop_prints_long_values_and_defaults(device):
     assert device.getprop("ro.long") == "x" * 200
     assert f"[ro.long]: [{'x' * 200}]\n" in device.output("getprop")
     assert device.output("getprop", "unset", "default") == "default\n"
-
-
-def test_failed_write_leaves_no_file(device):
-    done = device.run("sh", "-c", "trap '' XFSZ; ulimit -f 0; setprop key value")
-    assert done.stderr.startswith("Failed to set property 'key' to 'value'.\n")
-    assert device.getprop("key") == ""
-    assert os.listdir(device.root / "tmp") == []
 
 
 def test_setenforce_switches_selinux(device):
@@ -47,7 +39,6 @@ LOG_SELECTIONS = {
     "-v raw one:E two:E": "first\n",
     "-v raw -e d$ one two": "second\n",
     "-v raw -t 1 -b main,crash one two": "second\n",
-    "-v raw --pid 1 one two": "",
 }
 
 
@@ -77,14 +68,9 @@ def test_daemon_returns_recorded_answers(device):
     device.setprop(PERMISSIVE, "true")
     assert device.tpd("THP_GetVersion", "x") == "v%d\n"
     assert device.tpd("THP_SetFoldState", "1") == "\xff\n\n"
-    assert device.tpd("THP_SetFoldState", "0") == "THP_SetFoldState: done (0)\n"
-
-
-def test_forgets_removed_answers(device):
-    device.output("device", "answer", "captest a/b", "recorded")
-    assert device.output("device", "answer") == "captest a/b\n"
-    device.output("device", "answer", "--remove", "captest a/b")
-    assert device.output("device", "answer") == ""
+    device.output("device", "answer", "--remove", "THP_SetFoldState 1")
+    assert device.tpd("THP_SetFoldState", "1") == "THP_SetFoldState: done (1)\n"
+    assert device.output("device", "answer") == "THP_GetVersion\n"
 
 
 def test_rejects_answers_that_the_daemon_cannot_send(device):
@@ -98,12 +84,14 @@ def test_rejects_answers_that_the_daemon_cannot_send(device):
 USAGE_ERRORS = {
     "adb -d shell true": "no devices found",
     "adb -s other shell true": "device 'other' not found",
-    "adb push a b": "push",
     "device answer captest": "captest",
+    "device fault hang 1O0": "hang: invalid MILLISECONDS '1O0'; use 0 to 1000000000",
+    "device fault hangg": "unknown fault 'hangg'; 'device fault' lists them",
+    "device fault no_text 0": "no_text: invalid COUNT '0'; use 1 to 2147483647",
+    "device fault none 1": "fault none: unexpected argument '1'",
     "log -p q text": "usage: log",
     "logcat -d -b none": "usage: logcat",
     "setprop .a 1": "The name is illegal",
-    "setprop a": "usage: setprop",
 }
 
 
@@ -131,14 +119,6 @@ def test_finds_the_listed_commands_and_no_others(device):
 def test_shell_sees_only_processes_of_its_device(device):
     (daemon,) = device.processes("corvane_daemon")
     assert shell(device, "pgrep '^(corvane|python)'") == f"{daemon}\n"
-    assert shell(device, "ps -p 1") == ""
     assert "python" not in shell(device, "ps -ef")
     shell(device, "pkill -9 corvane_daemon")
     wait_until(lambda: device.restarts() == 1)
-
-
-@pytest.mark.parametrize("option, count", [("", 1), ("-n", 3)])
-def test_adb_shell_reads_standard_input_without_n(device, option, count):
-    loop = f"while read -r x; do echo $x; adb shell {option} true; done"
-    done = device.run("bash", "-c", loop, input="a\nb\nc\n")
-    assert len(done.stdout.split()) == count

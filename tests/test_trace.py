@@ -22,15 +22,15 @@ def assert_in_order(shown, *parts):
 
 def test_shows_the_steps_of_a_command(trace):
     assert_in_order(
-        trace("captest", "\33[2J"),
+        trace("captest", '"a\\b\33[2J'),
         "tool runs getenforce",
         'tool writes odm.thp.debug.selinux.permissive: "null" -> "true"',
         "tool looks up service.corvaneinterfaceservice: found",
         "tool calls code 0, two-way",
-        r'daemon receives captest, parameters "\x1b[2J"',
+        r'daemon receives captest, parameters ""a\b\x1b[2J"',
         "daemon answers",
         "tool has its reply",
-        r"result: captest \x1b[2J: PASS",
+        r'result: captest "a\b\x1b[2J: PASS',
     )
 
 

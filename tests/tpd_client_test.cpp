@@ -84,16 +84,11 @@ TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerReportsAFailure) {
 }
 
 TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
-    device.rejectedWrites = {"odm.thp.service_enable"};
-    for (const std::string enabled : {"0", "1"}) {
-        device.properties["odm.thp.service_enable"] = enabled;
-        device.lookups = {false, false};
-        EXPECT_EQ(client.RunCmd("c", ""), "0F_1F; failed to get binder service");
-        EXPECT_EQ(client.daemonUnavailable, 1);
-        EXPECT_EQ(device.calls({kLog}).back(),
-                  Log(ERROR, "RunCmd, failed to Get binder service. thp.service_enable: " +
-                                     enabled + "\n"));
-    }
+    device.lookups = {false, false};
+    EXPECT_EQ(client.RunCmd("c", ""), "0F_1F; failed to get binder service");
+    EXPECT_EQ(client.daemonUnavailable, 1);
+    EXPECT_EQ(device.calls({kLog}).back(),
+              Log(ERROR, "RunCmd, failed to Get binder service. thp.service_enable: 1\n"));
 }
 
 constexpr char kCaptestFailure[] =
