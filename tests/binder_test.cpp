@@ -79,8 +79,10 @@ TEST_F(BinderTest, LooksUpTheServiceOnce) {
 }
 
 TEST_F(BinderTest, TreatsAReplyWithoutTextAsEmpty) {
-    device.answers = {{android::OK, nullptr}};
+    device.answers = {{android::OK, nullptr}, {android::OK, ""}};
     EXPECT_EQ(RunCmdParms("[TPD]c", ""), "");
+    EXPECT_EQ(RunCmdParms("[TPD]c", ""), "");
+    EXPECT_THAT(device.calls({kTransact}), SizeIs(2));
 }
 
 TEST_F(BinderTest, RetriesAFailedCallOnceAfterANewLookup) {
