@@ -25,14 +25,14 @@ RESULTS = [
 
 @pytest.mark.parametrize("fault, text, dies", RESULTS, ids=[row[0] for row in RESULTS])
 def test_fault_has_its_documented_result(device, fault, text, dies):
-    device.output("device", "fault", *fault.split())
+    device.fault(fault)
     assert device.tpd("captest") == text
     assert device.events("fault")[0]["name"] == fault
     wait_until(lambda: bool(device.events("daemon_exit")) == dies)
 
 
 def test_daemon_sends_no_reply_larger_than_the_receive_buffer(device):
-    device.output("device", "fault", "huge", "1040384", "1")
+    device.fault("huge 1040384 1")
     assert device.tpd("captest") == PASS
     assert device.events("binder_died") == []
 
@@ -46,7 +46,7 @@ def test_daemon_refuses_requests_to_another_interface(device):
 
 
 def test_tool_can_be_interrupted_while_the_daemon_hangs(device):
-    device.output("device", "fault", "hang", "60000", "1")
+    device.fault("hang 60000 1")
     tool = subprocess.Popen([*device.tool, "captest"], env=device.env)
     wait_until(lambda: device.events("fault"))
     tool.send_signal(signal.SIGINT)

@@ -61,7 +61,7 @@ def test_reboot_keeps_persistent_properties_only(device):
     device.setprop("persist.a", "1")
     device.setprop("b", "1")
     device.output("setenforce", "0")
-    device.output("adb", "shell", "reboot")
+    device.shell("reboot")
     assert (device.getprop("persist.a"), device.getprop("b")) == ("1", "")
     assert device.output("getenforce") == "Enforcing\n"
 

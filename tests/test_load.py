@@ -40,7 +40,7 @@ FAULTS = [
     lambda device: device.run("timeout", "-s", "KILL", "0.005", *device.tool, "captest"),
     lambda device: device.kill("corvane_daemon"),
     lambda device: device.tpd("reboot"),
-    lambda device: device.output("device", "fault", "die_after", "9"),
+    lambda device: device.fault("die_after 9"),
 ]
 
 
@@ -57,6 +57,6 @@ def test_fails_only_with_known_results(device, commands):
             random.choice(FAULTS)(device)
             time.sleep(0.2)
     clients.result()
-    device.output("device", "fault", "none")
+    device.fault("none")
     device.tpd("reboot")
     wait_until(lambda: device.tpd("captest") == PASS)

@@ -50,7 +50,7 @@ def test_draws_a_sequence_diagram(trace):
 
 
 def test_recorder_exits_with_its_terminal(trace, stopped_device):
-    stopped_device.output("device", "fault", "hang", "60000")
+    stopped_device.fault("hang 60000")
     command = ["device", "trace", "captest"]
     recorder = subprocess.Popen(command, env=stopped_device.env, stdout=subprocess.DEVNULL)
     wait_until(lambda: (stopped_device.root / "trace").exists() and stopped_device.events("fault"))

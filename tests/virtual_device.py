@@ -57,6 +57,12 @@ class Device:
     def tpd(self, *arguments, **options):
         return self.output(*self.tool, *arguments, **options)
 
+    def shell(self, command):
+        return self.run("adb", "shell", command).stdout
+
+    def fault(self, text):
+        self.output("device", "fault", *text.split())
+
     def getprop(self, key):
         return self.output("getprop", key).removesuffix("\n")
 
