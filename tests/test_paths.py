@@ -1,6 +1,5 @@
 """Every path of a command through the tool, with the simulated daemon"""
-from virtual_device import NO_SERVICE, PASS, PERMISSIVE, RESTART, SERVICE
-from virtual_device import wait_until
+from virtual_device import NO_SERVICE, PASS, PERMISSIVE, RESTART, SERVICE, wait_until
 
 
 def test_forwards_a_command(device):

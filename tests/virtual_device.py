@@ -63,6 +63,9 @@ class Device:
     def fault(self, text):
         self.output("device", "fault", *text.split())
 
+    def answer(self, *arguments, **options):
+        return self.output("device", "answer", *arguments, **options)
+
     def getprop(self, key):
         return self.output("getprop", key).removesuffix("\n")
 
