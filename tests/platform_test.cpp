@@ -184,7 +184,7 @@ class ProxyTest : public testing::Test {
 TEST_F(ProxyTest, RefusesAReplyLargerThanTheReceiveBuffer) {
     const uint32_t header[] = {android::OK, 1040385};
     EXPECT_EQ(write(owner.get(), header, sizeof(header)), ssize_t{sizeof(header)});
-    EXPECT_EQ(proxy->transact(0, request, &reply), android::FAILED_TRANSACTION);
+    EXPECT_EQ(proxy->transact(0, request, &reply), android::DEAD_OBJECT);
 }
 
 struct TestRecipient : IBinder::DeathRecipient {
