@@ -20,8 +20,8 @@ constexpr char kTag[] = "corvane_daemon";
 constexpr char kHelp[] = "help";
 constexpr char kTsaExecuteCommand[] = "TSA_ExecuteCommand";
 
-// Log lines and result texts are part of the interface, down to the constant line numbers in
-// brackets and the "g_tpdCmd" in a message. Do not correct them.
+// Log lines and result texts are part of the interface, including the constant numbers in brackets
+// and "g_tpdCmd" in a message. Do not correct them.
 void LogEnter(const char* function, int line) {
     __android_log_print(ANDROID_LOG_INFO, kTag, "%s[%d] +\n", function, line);
 }
@@ -30,7 +30,7 @@ void AddTpdCmd(const char* name, std::string (*handler)(std::string)) {
     gTpdCmds.emplace(name, Cmd{handler});
 }
 
-// The exit status is ignored: a local command reports nothing.
+// Ignores the exit status: local commands do not report failures.
 void RunShell(const char* command) { [[maybe_unused]] const int status = system(command); }
 
 void InitTpdCmds() {
@@ -42,7 +42,7 @@ void InitTpdCmds() {
     AddShowtouchTpdCmds();
 }
 
-// Forwards a command to the daemon and returns the result text. Refuses while SELinux is enforcing.
+// Forwards a command to the daemon if SELinux permits it. Returns the result text.
 std::string ThpDebugExecuteCmd(std::string cmd, std::string params) {
     __android_log_print(ANDROID_LOG_INFO, kTag, "corvane_daemon %s[%d] cmd %s\n",
                         "ThpDebugExecuteCmd", 156, cmd.c_str());
@@ -180,8 +180,8 @@ std::string Thp_runCommand(std::string first, std::string second) {
     return ThpDebugExecuteCmd(kTsaExecuteCommand, first + " " + second);
 }
 
-// Always returns 0; callers read the result text. After a failed allocation the process exits at
-// once and leaves the rest to the kernel.
+// Always returns 0; callers read the result text. After a failed allocation, returns at once and
+// leaves the cleanup to the kernel.
 int main(int argc, char** argv) {
     g_tpdCmd = new (std::nothrow) TpdCmd;
     if (g_tpdCmd == nullptr) {
@@ -195,7 +195,7 @@ int main(int argc, char** argv) {
     InitTpdCmds();
 
     const std::string ret = Dispatch(argc, argv);
-    // Survive a closed pipe. Not earlier: the commands run above would inherit the setting.
+    // Survive a closed pipe. Set only now, because the commands run above would inherit it.
     signal(SIGPIPE, SIG_IGN);
     printf("%s", ret.c_str());
     putchar('\n');

@@ -1,5 +1,4 @@
-// The command front end: the local command table, and the dispatch of a command to it or to the
-// daemon.
+// The command-line front end: runs local commands and forwards all others to the daemon.
 #pragma once
 
 #include <functional>
@@ -8,31 +7,31 @@
 
 class TpdCmd;
 
-// A local command. Its handler returns a short confirmation.
+// A local command. The handler ignores its argument and returns a short confirmation.
 struct Cmd {
     std::function<std::string(std::string)> handler;
 };
 
-// The controller. main creates and destroys it; null before and after.
+// The daemon's controller. main() creates and deletes it; the pointer is null before and after.
 extern TpdCmd* g_tpdCmd;
 
-// The local commands by name. main fills the table before it dispatches and empties it at the end.
+// The local commands by name. main() fills the table at startup and clears it before it returns.
 extern std::map<std::string, Cmd> gTpdCmds;
 
-// Add local commands to the table. A name that is already there keeps its handler.
+// Add local commands to gTpdCmds. An existing entry keeps its handler.
 void AddBasicTpdCmds();
 void AddThplogTpdCmds();
 void AddRawTpdCmds();
 void AddAfelogTpdCmds();
 void AddShowtouchTpdCmds();
 
-// Runs the local command of that name and discards its confirmation. Returns false if there is no
-// such command. The misspelt name is part of the interface.
+// Runs the local command `name` and discards its confirmation. Returns false for an unknown name.
+// The misspelling is part of the interface.
 bool ExcuteTpdCmd(std::string name);
 
 // Returns the help text that lists the local commands.
 std::string CmdsToStr();
 
-// Forwards "TSA_ExecuteCommand" with the two arguments, joined by a space, as its parameters and
-// returns the result text. Sends nothing and returns an empty string if `first` is empty.
+// Forwards "TSA_ExecuteCommand" with both arguments, joined by a space, as its parameters. Returns
+// the result text. If `first` is empty, sends nothing and returns an empty string.
 std::string Thp_runCommand(std::string first, std::string second);
