@@ -22,7 +22,7 @@ constexpr char kNoServiceMark[] = "0F_1F";
 constexpr char kErrorMark[] = "ERROR";
 
 constexpr char kCaptest[] = "captest";
-// Both mode names in one string. Parameters that are a substring of it select the mode.
+// The names of both test modes, concatenated. Any substring selects running-test mode.
 constexpr char kRunningTestModes[] =
         "running_test"
         "running_test_lasttime";

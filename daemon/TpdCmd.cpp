@@ -18,7 +18,7 @@ constexpr char kGetenforce[] = "getenforce";
 constexpr char kPermissive[] = "Permissive";
 constexpr size_t kSelinuxModeBytes = 200;
 
-// Whether the log is on by default for this user type ("ro.logsystem.usertype").
+// Returns true if the log is on by default for this user type ("ro.logsystem.usertype").
 bool IsUserTypeWithLog(int userType) { return userType == 3 || userType == 5; }
 
 }  // namespace

@@ -1,6 +1,5 @@
-// The daemon's controller: starts, stops and restarts the daemon, switches its log, and decides
-// whether commands may be forwarded. It only writes the daemon's control properties; the platform's
-// init acts on them.
+// The daemon's controller: starts, stops and restarts the daemon, switches its log on and off, and
+// decides whether commands may be forwarded. It only writes control properties; init acts on them.
 #pragma once
 
 #include <cstdint>
@@ -10,31 +9,32 @@
 
 class TpdCmd {
   public:
-    // Creates the client. Prints a message on standard output and returns false if out of memory.
+    // Creates the client. If out of memory, prints a message to standard output and returns false.
     bool Init();
 
+    // Request a start, stop or restart of the daemon without waiting for it.
     void StartCorvane();
     void StopCorvane();
     void RebootCorvane();
 
-    // Whether the touch-processing log is on. The user type decides if the log's property is
-    // neither true nor false.
+    // Returns true if the touch-processing log is on. If its property contains neither "true" nor
+    // "false", the user type decides.
     static bool IsThplogEnable();
 
-    // Switch the touch-processing log and restart the daemon for the change to take effect. Do
+    // Switch the touch-processing log on or off and restart the daemon to apply the change. Do
     // nothing in upgrade mode or if the log is already in that state.
     void EnableThplog();
     void DisableThplog();
 
-    // The monotonic clock in milliseconds, or 0 if it cannot be read.
+    // Returns the monotonic clock in milliseconds, or 0 if it cannot be read.
     static uint64_t GetMonotonicTime();
 
-    // Whether commands may be forwarded: a stored flag is set, the device is in upgrade mode or
-    // runs a factory build, or SELinux is permissive. The last is stored in the flag for later
-    // runs. If it cannot be determined, the answer is no.
+    // Returns true if commands may be forwarded: a stored flag is set, the device is in upgrade
+    // mode or runs a factory build, or SELinux is permissive. In the last case, sets the flag.
+    // Returns false if the SELinux mode cannot be determined.
     bool IsSelinuxPermissive();
 
-    // The client, owned by the controller. Null before Init() succeeds.
+    // Returns the client, owned by this object. Null before Init() succeeds.
     TpdClient* GetTpdclient() const;
 
   private:
