@@ -66,7 +66,7 @@ namespace {
 
 constexpr uint32_t kExecuteCommandCode = 0;
 
-// Readers show the program's name for a null tag.
+// The log shows the program's name for a null tag.
 constexpr const char* kNoTag = nullptr;
 
 const android::StaticString16 kDescriptor(

@@ -1,5 +1,5 @@
-// The client side of the daemon's binder interface. It has one operation: execute a command with
-// parameters and return a string.
+// The client side of the daemon's binder interface. Its only operation executes a command with
+// parameters and returns a string.
 #pragma once
 
 #include <string>
@@ -15,8 +15,8 @@ class ICorvaneInterfaceClient : public android::IInterface {
   public:
     static const android::String16 descriptor;
 
-    // Returns the implementation if the binder is in this process, otherwise a new proxy. Null for
-    // a null binder.
+    // Returns the implementation if `binder` is local to this process, otherwise a new proxy. Null
+    // for a null binder.
     static android::sp<ICorvaneInterfaceClient> asInterface(
             const android::sp<android::IBinder>& binder);
 
@@ -25,13 +25,13 @@ class ICorvaneInterfaceClient : public android::IInterface {
 
     virtual const android::String16& getInterfaceDescriptor() const;
 
-    // Sends `cmd` with `params` to the daemon. A command that contains kTwoWayMarker is always
-    // two-way; the marker and what precedes it are not sent. Any other command is one-way if it or
-    // its parameters match the lists below.
+    // Sends `cmd` with `params` to the daemon and returns the status of the transaction.
     //
-    // Two-way: on success returns 0 and the daemon's answer in `reply`, empty if the answer has no
-    // string; otherwise returns the transport's status and leaves `reply` alone. One-way: `reply`
-    // is "OK" regardless of the status.
+    // A command that contains kTwoWayMarker is sent two-way, without the marker and anything before
+    // it. Any other command is sent one-way if the lists below match it or its parameters.
+    //
+    // Two-way: stores the daemon's answer in `reply`, empty if the daemon sent no string; leaves
+    // `reply` unchanged on failure. One-way: sets `reply` to "OK" regardless of the status.
     virtual android::status_t ExecuteCommand(std::string& reply, std::string cmd,
                                              std::string params) = 0;
 };
@@ -45,8 +45,8 @@ class BpCorvaneInterfaceClient : public android::BpInterface<ICorvaneInterfaceCl
                                      std::string params) override;
 };
 
-// Logs the daemon's death and unlinks itself. Recovery is elsewhere: the next call on the dead
-// binder fails, and RunCmdParms() looks the service up again.
+// Logs the daemon's death and unlinks itself. It does not reconnect: the next call on the dead
+// binder fails, and RunCmdParms() then looks the service up again.
 class MyDeathRecipient : public android::IBinder::DeathRecipient {
   public:
     explicit MyDeathRecipient(const android::sp<android::IBinder>& binder);
@@ -58,15 +58,16 @@ class MyDeathRecipient : public android::IBinder::DeathRecipient {
     android::sp<android::IBinder> mBinder;
 };
 
-// Whether any entry of `list` is a substring of `text`.
+// Returns true if any entry of `list` is a substring of `text`.
 bool IsAsync(const std::vector<std::string>& list, std::string text);
 
-// Commands that are sent one-way. The first list is matched against the command, the second against
-// the parameters. Read-only.
+// Substrings that make an unmarked command one-way: the first list applies to the command, the
+// second to its parameters.
 extern const std::vector<std::string> g_asyncCmds;
 extern const std::vector<std::string> g_asyncThpCmds;
 
-// The service's binder, null before the first lookup and after a failed call, and the death
-// recipient that is linked to every such binder of this process.
+// The service's binder. Null before the first successful lookup and after a failed call.
 extern android::sp<android::IBinder> g_thpBinder;
+
+// The death recipient, linked to every binder that a lookup returns. Null before the first one.
 extern android::sp<MyDeathRecipient> g_deathRecipient;

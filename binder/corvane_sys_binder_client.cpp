@@ -30,12 +30,12 @@ constexpr char kTimeoutText[] =
         "corvane_daemon binder server execute command return ERROR, may caused by processing "
         "timeout.";
 
-// The log lines are part of the interface: they have no tag, for which readers show the program's
-// name, many are at ERROR though nothing failed, and "retry:" is always followed by 1.
+// The log lines are part of the interface. They have a null tag, shown as the program's name; ERROR
+// does not mean a failure; "retry:" is always followed by 1.
 constexpr const char* kNoTag = nullptr;
 
-// Writes up to six times, until the value reads back. A failure shows only in the log. Not
-// Property::Set(): that logs other lines, and binder/ does not depend on property/.
+// Writes the property until the value reads back, at most six times. A failure shows only in the
+// log. Does not use Property::Set(), which logs other lines and which binder/ must not include.
 void SetProperty(std::string key, std::string value) {
     char current[kPropertyBufferBytes] = {};
     for (int writes = 0; writes < kPropertyWrites; ++writes) {
@@ -50,7 +50,8 @@ void SetProperty(std::string key, std::string value) {
     }
 }
 
-// Looks the service up once. Returns its binder with the death recipient linked to it, or null.
+// Looks the service up once and links the death recipient to it. Returns its binder, or null if it
+// is not found.
 sp<IBinder> LookUpService() {
     constexpr char kName[] = "ThpGetBinder";
     __android_log_print(ANDROID_LOG_INFO, kNoTag, "%s", kName);
