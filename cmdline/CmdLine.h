@@ -1,4 +1,4 @@
-// How the device was booted, from the kernel command line.
+// The boot mode and the build type, from the kernel command line.
 #pragma once
 
 #include <string>
@@ -10,14 +10,14 @@ class CmdLine : public StringPairParser {
   public:
     CmdLine();
 
-    // The first line of the kernel command line, up to 8191 bytes or the first NUL. Empty if it
-    // cannot be read.
+    // Returns the first line of the kernel command line, up to 8191 bytes or the first NUL. Empty
+    // if it cannot be read.
     static std::string GetCmdLine();
 
-    // Whether the device was booted into recovery or an upgrade.
+    // Returns true if the device was booted into recovery or upgrade mode.
     bool IsUpgradeMode() const;
 
-    // Whether the device runs a factory build.
+    // Returns true if the device runs a factory build.
     bool IsFactoryVersion() const;
 
   private:

@@ -9,13 +9,13 @@
 
 namespace {
 
-// The log lines are part of the interface: every write, even a successful first one, is logged at
-// ERROR with "retry:1", and a value found by the second read with "i = 1".
+// The log lines are part of the interface. Every write is logged at ERROR with "retry:1", even if
+// it succeeds at once. A value that only the second read returns is logged with "i = 1".
 constexpr char kTag[] = "corvane_daemon";
 constexpr int kWriteAttempts = 6;
 constexpr useconds_t kPauseUs = 100;
 
-// Written at the rate of touch input, therefore not logged.
+// Not logged, because it is written at the rate of touch input.
 constexpr char kSilentKey[] = "odm.thp.trigger_input";
 
 struct Row {

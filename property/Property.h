@@ -1,7 +1,5 @@
-// The daemon's system properties: a fixed table of named rows, reads with defaults, writes
-// confirmed by reading back, and a typed accessor for every row that the tool uses.
-//
-// An object lives in the scope of one operation. It caches no values: every read asks the device.
+// The daemon's system properties: a fixed table of names and defaults, and typed accessors for the
+// rows that the tool uses. Writes are confirmed by reading the value back. Values are not cached.
 #pragma once
 
 #include <mutex>
@@ -9,9 +7,9 @@
 #include <vector>
 
 struct PropertyItem {
-    std::string alias;         // the accessors' name for the row, unique in the table
-    std::string key;           // system property
-    std::string defaultValue;  // for an empty property; empty if the row has none
+    std::string alias;         // name of the row, unique in the table
+    std::string key;           // name of the system property
+    std::string defaultValue;  // used if the property is empty; empty if there is no default
 };
 
 class Property {
@@ -20,16 +18,16 @@ class Property {
     Property(const Property&) = delete;
     Property& operator=(const Property&) = delete;
 
-    // The row with this alias, or the table's first row if the alias is unknown. Owned by the
+    // Returns the row with this alias, or the first row if the alias is unknown. Owned by this
     // object.
     PropertyItem& GetItem(std::string alias);
 
-    // Reads the property `key` into `out` and returns the length of the value. An empty property is
-    // read once more after a pause. If it is still empty, the default is stored in the property and
-    // in `out`, and the default's length + 1 is returned, or 0 if there is no default.
+    // Reads the property `key` into `out` and returns the length of the value. Reads an empty
+    // property once more after 100 us. If it is still empty, stores the default in the property and
+    // in `out` and returns its length + 1, or returns 0 if there is no default.
     int Get(std::string key, std::string& out, std::string defaultValue);
 
-    // Writes `value` up to six times, until it reads back. A failure shows only in the log.
+    // Writes `value` until it reads back, at most six times. A failure shows only in the log.
     void Set(std::string key, std::string value);
 
     // Setters. Flags are stored as "true" or "false", numbers in decimal.
@@ -43,7 +41,7 @@ class Property {
     void SetAfeLog(bool on);
     void SetPermissive(bool on);
 
-    // String getters: Get() with the row's default.
+    // String getters. Return what Get() returns with the row's default.
     int GetThplogEnable(std::string& out);
     int GetServiceEnable(std::string& out);
     int GetDaeAlive(std::string& out);
@@ -52,12 +50,12 @@ class Property {
     int GetUpdateFW(std::string& out);
     int GetPermissive(std::string& out);
 
-    // The user type, a decimal number. Returns what Get() returns. Leaves `type` alone if the value
-    // does not begin with a number or the number does not fit in an int.
+    // Reads the user type, a decimal number. Returns what Get() returns. Leaves `type` unchanged if
+    // the value does not begin with a number or the number does not fit in an int.
     int GetUserType(int& type);
 
-    // Flag getters: whether the value is exactly "true" or "1". GetRebootTimes() therefore tells
-    // whether the count is "1", not how many restarts there were.
+    // Flag getters. Return true if the value is exactly "true" or "1". GetRebootTimes() therefore
+    // returns true only if the restart count is exactly 1.
     bool GetServiceEnable();
     bool GetDaeAlive();
     bool GetRebootTimes();
@@ -71,7 +69,7 @@ class Property {
     int GetText(const char* alias, std::string& out);
     bool GetFlag(const char* alias);
 
-    std::mutex mMutex;    // held by the accessors; Get, Set and GetItem do not take it
+    std::mutex mMutex;    // locked by the accessors, but not by Get(), Set() and GetItem()
     char mBuf[128] = {};  // last value read
     std::string mValue;   // last string read by a flag getter or GetUserType
     std::vector<PropertyItem> mItems;
