@@ -12,7 +12,7 @@ constexpr char kTag[] = "corvane_daemon";
 constexpr int kDefaultLogLevel = LOG_INFO;
 constexpr size_t kMessageBytes = 2048;
 
-// Indexed by LogLevel, from LOG_ERROR.
+// Android log priorities, indexed by level - LOG_ERROR.
 constexpr int kPriorities[] = {ANDROID_LOG_ERROR, ANDROID_LOG_WARN, ANDROID_LOG_INFO,
                                ANDROID_LOG_INFO};
 

@@ -9,11 +9,11 @@ enum LogLevel : int {
     LOG_ERROR = 1,
     LOG_WARNING = 2,
     LOG_INFO = 3,
-    LOG_DEBUG = 4,  // written with the priority of LOG_INFO
+    LOG_DEBUG = 4,  // logged with the priority of LOG_INFO
 };
 
-// Any thread may log at any time. A derived facility overrides GetLogLevel() to set another
-// threshold and Append() to keep texts in memory.
+// Thread-safe. A derived class can override GetLogLevel() to change the threshold and Append() to
+// keep texts in memory.
 class LogBase {
   public:
     explicit LogBase(std::string name);
@@ -23,26 +23,26 @@ class LogBase {
 
     virtual std::string GetName() const;
 
-    // Writes one line unless `level` is above the threshold. `function` is the caller's name or
-    // full signature; the printf format (const char*) and its arguments follow `line`. A message
-    // longer than 2047 bytes is cut, and an extra log line says so.
+    // Logs a message unless `level` is above the threshold. `function` is the caller's name or full
+    // signature; the printf format (const char*) and its arguments follow `line`. Truncates a
+    // message longer than 2047 bytes and logs an extra line that says so.
     virtual void Printf(LogLevel level, std::string function, int line, ...);
 
-    // Hook that keeps `text` in mLog, under mMutex. Does nothing by default.
+    // Hook for keeping `text` in mLog, guarded by mMutex. Does nothing by default.
     virtual void Append(std::string text) const;
 
-    // The text kept in memory; GetLogClear() also empties it.
+    // Return the text kept in memory. GetLogClear() also clears it.
     virtual std::string GetLog() const;
     virtual std::string GetLogClear() const;
 
-    // The threshold: the highest level that is written.
+    // Returns the threshold: the highest level that is logged.
     virtual int GetLogLevel() const;
 
-    // Writes "function[line] message" when `level` is a LogLevel not above the threshold.
+    // Logs "function[line] message" if `level` is a valid LogLevel and not above the threshold.
     void AndroidLog(unsigned int level, const std::string& function, int line,
                     const std::string& message);
 
-    // Returns the qualified name in a function signature, without return type and parameters.
+    // Returns the function signature without its return type and parameters.
     std::string PrettyTrim(std::string signature);
 
   protected:
@@ -51,5 +51,5 @@ class LogBase {
     mutable std::mutex mMutex;
 };
 
-// The process-wide facility, named "sys".
+// The process-wide instance, named "sys".
 extern LogBase gSysLog;
