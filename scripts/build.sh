@@ -1,14 +1,14 @@
 # shellcheck shell=bash disable=SC2034
-# Functions of the other scripts: usage messages and the build.
+# Functions for the other scripts: usage messages and builds.
 tree=$(CDPATH='' cd -- "$(dirname -- "$(readlink -f -- "${BASH_SOURCE[0]}")")/.." && pwd)
 script=$(readlink -f -- "$0")
 export TPD_BUILD_DIR
 TPD_BUILD_DIR=$(realpath -m -- "${TPD_BUILD_DIR:-$tree/build}")
 
-# Prints the comment that the script begins with.
+# Prints the script's leading comment.
 usage() { sed -n '2,/^[^#]/s/^# \{0,1\}//p' "$script"; }
 
-# answer_help ARGUMENT...: prints the usage and exits when the first argument asks for it.
+# answer_help ARGUMENT...: prints the usage and exits if the first argument is -h or --help.
 answer_help() {
     if [[ ${1-} == -h || ${1-} == --help ]]; then
         usage
@@ -22,7 +22,7 @@ usage_error() {
     exit 2
 }
 
-# locked COMMAND...: runs it with the lock on TPD_BUILD_DIR, so that builds do not overlap.
+# locked COMMAND...: runs the command with a lock on TPD_BUILD_DIR, so that builds do not overlap.
 locked() {
     mkdir -p "$TPD_BUILD_DIR"
     (
@@ -34,7 +34,8 @@ locked() {
     ) 9>"$TPD_BUILD_DIR/lock"
 }
 
-# quietly COMMAND...: runs it and shows its output, kept in TPD_BUILD_DIR, only when it fails.
+# quietly COMMAND...: runs the command with its output in TPD_BUILD_DIR/build.log. If the command
+# fails, prints the output and exits.
 quietly() {
     if ! "$@" >"$TPD_BUILD_DIR/build.log" 2>&1; then
         cat "$TPD_BUILD_DIR/build.log" >&2
@@ -49,10 +50,10 @@ configure() {
     quietly cmake --preset "${TPD_PRESET:-release}" -B "$TPD_BUILD_DIR"
 }
 
-# up_to_date TARGET...: whether there is nothing to build.
+# up_to_date TARGET...: succeeds if there is nothing to build.
 up_to_date() { ninja -C "$TPD_BUILD_DIR" -n "$@" | grep -q "no work to do"; }
 
-# Shows the build's progress on a terminal.
+# build_targets TARGET...: as build, without the lock. Shows progress if stderr is a terminal.
 build_targets() {
     [[ -f $TPD_BUILD_DIR/build.ninja ]] || configure
     if [[ -t 2 ]] && ! up_to_date "$@"; then
@@ -62,5 +63,5 @@ build_targets() {
     fi
 }
 
-# build TARGET...: configures TPD_BUILD_DIR when necessary, then builds.
+# build TARGET...: configures TPD_BUILD_DIR if necessary, then builds.
 build() { locked build_targets "$@"; }
