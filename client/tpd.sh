@@ -5,18 +5,18 @@
 #   tpd_wait 30 || exit 1
 #   tpd_send THP_SetFoldState 1 || echo "$TPD_OUTCOME: $TPD_RESULT" >&2
 #
-# ADB is the command that reaches the device, `adb` by default; it is split into words, so
-# ADB="adb -s SERIAL" selects one of several. TPD_LIMIT is the time that one command may take, in
-# seconds, 30 by default. A command that needs a restart of the daemon can take 22 seconds.
+# ADB is the adb command, by default `adb`. It is split into words: ADB="adb -s SERIAL" selects a
+# device. TPD_LIMIT is the time limit for one command in seconds, by default 30. A command can take
+# up to 22 seconds while the daemon restarts.
 
-# tpd_adb ARGUMENT...: runs adb. It leaves the caller's standard input alone, which `adb shell` would
-# read to its end.
+# tpd_adb ARGUMENT...: runs adb with an empty standard input, because `adb shell` would read that of
+# the caller.
 tpd_adb() {
     # shellcheck disable=SC2086
     ${ADB:-adb} "$@" </dev/null
 }
 
-# tpd_quote ARGUMENT...: prints the arguments as words that the device's shell reads as they are.
+# tpd_quote ARGUMENT...: prints the arguments, quoted for the device's shell.
 tpd_quote() {
     for tpd_rest in "$@"; do
         printf " '"
@@ -28,7 +28,8 @@ tpd_quote() {
     done
 }
 
-# tpd_wait SECONDS: waits until the daemon is alive and reachable. Fails after that time.
+# tpd_wait SECONDS: waits until the daemon is alive and its service is published. Returns 1 on
+# time-out.
 tpd_wait() {
     tpd_left=$1
     until tpd_alive; do
@@ -38,7 +39,8 @@ tpd_wait() {
     done
 }
 
-# tpd_alive: whether the daemon is alive and reachable now, as the tool decides it.
+# tpd_alive: succeeds if the daemon is alive and its service is published. Checks the properties
+# that the tool checks.
 tpd_alive() {
     case $(tpd_adb shell 'echo "$(getprop odm.thp.dae_alive),$(getprop odm.thp.binder)"') in
         1,1 | 1,true | true,1 | true,true) ;;
@@ -49,15 +51,15 @@ tpd_alive() {
 # tpd_send ARGUMENT...: runs tpd with the arguments and sets TPD_RESULT to its result text and
 # TPD_OUTCOME to one of:
 #
-#   answered  the daemon had the command, perhaps twice; a local command counts as answered
+#   answered  the daemon answered, perhaps after executing the command twice, or a local command ran
 #   refused   not sent: SELinux is enforcing
-#   unsent    not sent: the daemon is not alive, or updates its firmware
-#   failed    the daemon may have carried it out, even twice
+#   unsent    not sent: the daemon is not alive or is updating its firmware, or out of memory
+#   failed    no answer; the daemon may have executed the command, even twice
 #   late      no answer within TPD_LIMIT; the daemon is being restarted
 #   unusable  not sent: tpd does not accept these arguments
-#   broken    adb or the device failed; TPD_RESULT holds what they printed
+#   broken    adb or the device failed; TPD_RESULT is what they printed
 #
-# Returns 0 for "answered", else 1.
+# Returns 0 for "answered", otherwise 1.
 tpd_send() {
     TPD_RESULT=
     TPD_OUTCOME=unusable
