@@ -1,6 +1,6 @@
-// The tool's baseline: the same system calls in the same order with the same data, nothing else.
-//   baseline THP_ResetBaseline   as tpd forwards it, or refuses it while SELinux is enforcing
-//   baseline stop                as tpd stops the daemon
+// The baseline: makes the tool's system calls in the same order with the same data, nothing else.
+//   baseline THP_ResetBaseline   forwards the command, or refuses it while SELinux is enforcing
+//   baseline stop                stops the daemon
 #define _GNU_SOURCE
 #include <fcntl.h>
 #include <signal.h>
@@ -90,7 +90,7 @@ static void WriteProperty(const char* name, const char* text) {
 
 static void ReadKernelCommandLine(void) {
     char line[kBlock];
-    openat(root, "proc", kDirectory);  // the device has none
+    openat(root, "proc", kDirectory);  // does not exist
     const int file = open("/proc/cmdline", O_RDONLY);
     fstat(file, &status);
     if (read(file, line, (size_t)status.st_blksize) < 0) {
@@ -162,7 +162,7 @@ static void BeginOutput(void) {
     fstat(STDOUT_FILENO, &status);
 }
 
-// Writes as a buffered stream does: whole blocks at once, the rest when the program exits.
+// Writes as a buffered stream does: whole blocks at once, the rest on exit.
 static void Print(int connection, char* text) {
     BeginOutput();
     const size_t size = strlen(text);

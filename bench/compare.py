@@ -1,8 +1,9 @@
 #!/usr/bin/env python3
 """Measures tpd and its baseline, prints the tables of docs/performance.md and draws its picture.
 
-Needs a device whose daemon runs without init, so that the daemon survives `stop`.
-Writes BUILD/results.json: table, row, program, measure, [lower quartile, median, upper quartile].
+The daemon must run without init, so that it survives `stop`.
+Writes BUILD/results.json: nested objects by table, row, program and measure, each measure as
+[lower quartile, median, upper quartile].
 """
 import argparse
 import json
@@ -16,21 +17,21 @@ from statistics import median, quantiles
 
 PERMISSIVE = "odm.thp.debug.selinux.permissive"
 FORWARDED = "THP_ResetBaseline"
-# Name of the command: its argument, and the property that is set before each run.
+# The argument of each command, and the property that is set before each run.
 COMMANDS = {
     "forwarded": (FORWARDED, (PERMISSIVE, "true")),
     "refused": (FORWARDED, (PERMISSIVE, "null")),
     "stop": ("stop", ("odm.thp.service_enable", "1")),
 }
 KIB, MIB, GIB = 1 << 10, 1 << 20, 1 << 30
-LARGEST_REPLY = MIB - 2 * 4096 - 4  # bytes; four more are terminator and padding
+LARGEST_REPLY = MIB - 2 * 4096 - 4  # without the terminator and padding
 REPLY_BYTES = [256, 4 * KIB, 64 * KIB, LARGEST_REPLY]
 CLIENTS = [1, 2, 4, 8, 16, 32, 64]
 LOG_BYTES = [MIB, 32 * MIB, GIB]
 PROPERTIES = [1000, 10000, 100000]
 STEPS = 1 + sum(map(len, [COMMANDS, REPLY_BYTES, CLIENTS, LOG_BYTES, PROPERTIES]))
-BATCH = 128  # commands that all clients together run
-COUNTS = 5  # how often instructions and system calls are counted
+BATCH = 128  # commands run by all clients together
+COUNTS = 5  # runs that count instructions and system calls
 TIMES = ["processor_us", "elapsed_us"]
 
 
@@ -38,11 +39,11 @@ def parse_options():
     parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
     parser.add_argument("build", type=Path, help="build directory")
     parser.add_argument("--picture", type=Path, required=True, help="SVG file to write")
-    parser.add_argument("--rounds", type=int, default=30, help="rounds of a case, at least 2 (30)")
-    parser.add_argument("--runs", type=int, default=25, help="runs of a program in a round (25)")
+    parser.add_argument("--rounds", type=int, default=30, help="rounds, at least 2 (default 30)")
+    parser.add_argument("--runs", type=int, default=25, help="runs in a round (default 25)")
     options = parser.parse_args()
     if options.rounds < 2 or options.runs < 1:
-        parser.error("needs at least 2 rounds and 1 run")
+        parser.error("--rounds must be at least 2 and --runs at least 1")
     return options
 
 
@@ -50,7 +51,7 @@ def parse_options():
 
 
 def run(command, **options):
-    """Returns what the command prints."""
+    """Runs the command and returns its output. Exits if the command fails."""
     done = subprocess.run(command, text=True, capture_output=True, **options)
     if done.returncode != 0:
         sys.exit(f"{command}: status {done.returncode}\n{done.stderr}")
@@ -62,7 +63,7 @@ def set_property(name, value):
 
 
 def time_run(command, output):
-    """Times and page faults of one run, including the programs that it starts."""
+    """Returns the times and page faults of one run, including child processes."""
     flags = os.O_WRONLY | os.O_CREAT | os.O_TRUNC
     to_file = [(os.POSIX_SPAWN_OPEN, 1, output, flags, 0o600)]
     start = time.perf_counter()
@@ -79,19 +80,19 @@ def time_run(command, output):
 
 
 def count_instructions(command):
-    """Those of the program itself, in user mode."""
+    """Returns the user-mode instructions of the program, without child processes."""
     tool = ["valgrind", "--log-fd=1", "--tool=callgrind", "--callgrind-out-file=/dev/null"]
     return int(re.search(r"Collected : (\d+)", run([*tool, *command]))[1])
 
 
 def count_system_calls(command, output):
-    """Includes those of the programs that it starts."""
+    """Returns the number of system calls, including child processes."""
     run(["strace", f"--output={output}", "-c", "-f", "-U", "calls", *command])
     return int(output.read_text().split()[-2])
 
 
 def list_system_calls(command, output):
-    """Calls and results from the first look at the device on, except memory and process ids."""
+    """Returns the calls and results after startup, except calls for memory and process IDs."""
     filtered = "trace=!%memory,getpid,gettid,clone3,vfork,wait4"
     run(["strace", f"--output={output}", "-e", filtered, *command])
     text = output.read_text()
@@ -103,29 +104,29 @@ def list_system_calls(command, output):
 
 
 def quartiles(values):
-    """Lower quartile, median, upper quartile."""
+    """Returns the lower quartile, the median and the upper quartile."""
     return quantiles(values, method="inclusive")
 
 
 def ratios(values, measure):
-    """Quartiles of the ratio of tpd to its baseline, pair by pair."""
+    """Returns the quartiles of the ratio of tpd to the baseline in each round."""
     pairs = zip(values["tpd"][measure], values["baseline"][measure])
     return quartiles([tpd / baseline for tpd, baseline in pairs])
 
 
 def summarize(values, ratio_measures):
-    """From {program: {measure: [value]}} to quartiles, with "ratio" as one more program."""
+    """Turns {program: {measure: [value]}} into quartiles and adds the program "ratio"."""
     row = {
         program: {measure: quartiles(series) for measure, series in measures.items()}
         for program, measures in values.items()
     }
-    if "baseline" in row:  # a filtered log call has none
+    if "baseline" in row:  # a filtered log call has no baseline
         row["ratio"] = {measure: ratios(values, measure) for measure in ratio_measures}
     return row
 
 
 class Bench:
-    """Measures all tables on one device, {table: {row: {program: {measure: quartiles}}}}."""
+    """Measures all tables as {table: {row: {program: {measure: quartiles}}}}."""
 
     def __init__(self, options):
         self.build = options.build.resolve()
@@ -147,7 +148,7 @@ class Bench:
             print(f"[{self.step}/{STEPS}] {what}", file=sys.stderr, flush=True)
 
     def write_property(self, name, value):
-        """As set_property, without a process that would disturb the caches before a timed run."""
+        """Like set_property, without a process that would disturb the caches before a timed run."""
         (self.root / "properties" / name).write_text(value)
 
     def measure_all(self):
@@ -160,7 +161,7 @@ class Bench:
         tables["properties"] = self.measure_properties()
         return tables
 
-    # Timing: rounds of runs, in which the programs take turns.
+    # Timing: the programs take turns in each round.
 
     def time_rounds(self, commands, runs, prepare):
         """Returns {program: {measure: [median of each round]}}."""
@@ -236,7 +237,7 @@ class Bench:
         return summarize(values, TIMES)
 
     def require_same_behaviour(self, commands, prepare):
-        """Compares the output and the system calls of the baseline and of tpd."""
+        """Exits if the output or the system calls of tpd and the baseline differ."""
         behaviour = {}
         for program in "baseline", "tpd":
             prepare()
@@ -257,7 +258,7 @@ class Bench:
         return rows
 
     def measure_clients(self):
-        """Times of one of the commands of a batch."""
+        """Divides the times of a batch by the number of its commands."""
         rows = {}
         batch = self.root / "batch"
         batch.write_text("run\n" * BATCH)
@@ -300,7 +301,7 @@ def number(value):
 
 
 def spread(summary):
-    """The median, with the quartiles unless they read the same."""
+    """Formats the median, and the quartiles unless all three look the same."""
     low, middle, high = map(number, summary)
     return middle if low == high else f"{middle} ({low} to {high})"
 
@@ -375,7 +376,7 @@ def print_parts(parts):
 
 
 def cases(tables):
-    """The rows of the tables of forwarded commands, under the names that the page gives them."""
+    """Returns the rows for forwarded commands, with the names that the page uses."""
     rows = {}
     for length, row in tables["reply"].items():
         largest = length == LARGEST_REPLY
@@ -391,7 +392,7 @@ def cases(tables):
 
 
 def write_gnuplot_data(path, title, tables):
-    """Writes each table as a data block: row, then three columns for each program."""
+    """Writes each table as a data block: the row's name, then the quartiles of each program."""
     lines = [f"title = '{title}'"]
     for table, rows in tables.items():
         if table == "parts":

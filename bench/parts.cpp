@@ -1,6 +1,6 @@
-// Times the tool's parts in one process. Every part has a baseline that does the same work.
-// Needs a new device root. Pin the process to one processor (taskset): otherwise the results
-// depend on where the scheduler runs the service's thread.
+// Measures parts of the tool in one process, beside a baseline that does the same work directly.
+// Needs a new device root. Pin the process to one processor (taskset); otherwise the results depend
+// on where the scheduler runs the service's thread.
 #include <benchmark/benchmark.h>
 
 #include <android/log.h>
@@ -33,9 +33,9 @@ constexpr char kDriver[] = "/dev/vndbinder";
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr char kKey[] = "odm.thp.dae_alive";
 constexpr int kLargestReply =
-        host::kMaxTransactionBytes - 4;  // bytes; the rest is terminator and padding
+        host::kMaxTransactionBytes - 4;  // bytes, without the terminator and padding
 
-// The daemon. The command is the size of its answer in bytes.
+// Stands in for the daemon. The command is the size of the answer in bytes.
 class Service : public android::BBinder {
     android::status_t onTransact(uint32_t /* code */, const android::Parcel& data,
                                  android::Parcel* reply, uint32_t /* flags */) override {
@@ -90,7 +90,7 @@ void RunTpd(State& state) {
 }
 BENCHMARK(RunTpd)->Name("RunCmdParms/tpd")->Apply(EachReply);
 
-// The socket's own cost: the same bytes there and back, into one buffer.
+// Sends and receives the same bytes on an open socket, into one buffer.
 void RunBaseline(State& state) {
     android::Parcel request;
     request.writeInterfaceToken(ICorvaneInterfaceClient::descriptor);
@@ -137,8 +137,8 @@ void PrintfFiltered(State& state) {
 }
 BENCHMARK(PrintfFiltered)->Name("Printf, filtered/tpd");
 
-// Keeps the memory of a large reply for the next call, as the baseline keeps its buffer. Otherwise
-// the loop measures how fast the kernel clears pages, which a command pays once in either program.
+// Keeps freed memory for the next reply, as the baseline keeps its buffer. Otherwise the loop would
+// mainly measure how fast the kernel clears pages.
 void KeepFreedMemory() {
     mallopt(M_MMAP_THRESHOLD, 2 * host::kMaxTransactionBytes);
     mallopt(M_TRIM_THRESHOLD, 8 * host::kMaxTransactionBytes);

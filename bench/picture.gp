@@ -1,5 +1,5 @@
-# Draws the tables that compare.py writes before this script, in processor time of one command.
-# A table's columns are the row's name and, for each program, lower quartile, median, upper quartile.
+# Draws the processor times that compare.py passes as data blocks. The columns of a block are the
+# row's name and, for each program, the lower quartile, the median and the upper quartile.
 set encoding utf8
 set terminal svg size 960,1100 font "sans-serif,12" background "white"
 set multiplot title title noenhanced
