@@ -23,7 +23,8 @@ constexpr char kDirectory[] = "answers";
 // The longest answer that fits in a reply with its terminator.
 constexpr size_t kMaxAnswerBytes = (1 << 20) - 2 * 4096 - 1;
 
-// Returns the path of the command's answer. Bytes other than letters, digits and '_' become %XX.
+// Returns the path of the command's answer, with bytes other than letters, digits and '_' as %XX.
+// CommandOf() is the inverse.
 std::string AnswerPath(const std::string& command) {
     std::string path = std::string(kDirectory) + "/";
     for (const char c : command) {
@@ -61,7 +62,7 @@ std::optional<std::string> ReadAnswer(const std::string& command) {
     return answer;
 }
 
-// Returns standard input without its final newline: the tool appends one to an answer.
+// Returns standard input without its final newline, because the tool appends one to an answer.
 std::string ReadInput() {
     std::string text(kMaxAnswerBytes + 2, '\0');
     text.resize(fread(text.data(), 1, text.size(), stdin));

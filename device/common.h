@@ -23,28 +23,28 @@ namespace device {
 constexpr int kFailure = 1;
 constexpr int kUsageError = 2;
 
-// Prints the error after the program's name. Returns the exit status.
+// Prints the program's name and the error to standard error. Returns `status`.
 inline int Fail(const std::string& error, int status = kFailure) {
     fprintf(stderr, "%s: %s\n", program_invocation_short_name, error.c_str());
     return status;
 }
 
-// The same, with the reason in errno.
+// Like Fail(), with the reason from errno.
 inline int FailForErrno(const std::string& what) { return Fail(what + ": " + strerror(errno)); }
 
-// Returns the property's value, or an empty string when it is not set.
+// Returns the property's value, or an empty string if it is not set.
 inline std::string GetProperty(const char* key) {
     char value[PROP_VALUE_MAX];
     __system_property_get(key, value);
     return value;
 }
 
-// Returns the property's value as a decimal number, or 0 when it does not begin with one.
+// Returns the decimal number that the property's value begins with, or 0 without a number.
 inline int64_t GetPropertyNumber(const char* key) {
     return strtoll(GetProperty(key).c_str(), nullptr, 10);
 }
 
-// Whether the whole text is a decimal number from `min` to `max`.
+// Returns true if the whole text is a decimal number from `min` to `max`.
 inline bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
     char* end = nullptr;
     errno = 0;
@@ -52,18 +52,18 @@ inline bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
     return errno == 0 && !text.empty() && *end == '\0' && number >= min && number <= max;
 }
 
-// Whether the daemon reports that it is alive and has published its service.
+// Returns true if the daemon reports that it is alive and has published its service.
 inline bool IsDaemonAlive() {
     return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";
 }
 
-// Whether the property tells init to keep the daemon running.
+// Returns true if the property tells init to keep the daemon running.
 inline bool IsDaemonEnabled() {
     const std::string enable = GetProperty(kServiceEnableKey);
     return enable == "1" || enable == "true";
 }
 
-// Returns the contents of a file in the device root, or `missing` when it cannot be read. Reads at
+// Returns the contents of a file in the device root, or `missing` if it cannot be read. Reads at
 // most 128 KiB, the size limit of a program argument.
 inline std::string ReadText(const std::string& path, const char* missing) {
     const host::UniqueFd file = host::OpenFile(path, O_RDONLY);
@@ -75,7 +75,7 @@ inline std::string ReadText(const std::string& path, const char* missing) {
 // Returns what `getenforce` prints: Enforcing, Permissive or Disabled.
 inline std::string SelinuxMode() { return ReadText(host::kSelinuxFile, "Enforcing"); }
 
-// Returns the sorted names in a directory of the device root; none when it cannot be read.
+// Returns the names in a directory of the device root, or an empty set if it cannot be read.
 inline std::set<std::string> FilesIn(const std::string& path) {
     const host::UniqueFd directory = host::OpenDirectory(path);
     const std::string opened = "/proc/self/fd/" + std::to_string(directory.get());
@@ -88,7 +88,8 @@ inline std::set<std::string> FilesIn(const std::string& path) {
     return names;
 }
 
-// Returns the path of a file beside the running executable. Without /proc the path does not exist.
+// Returns the path of a file in the directory of the running executable. Without /proc, returns a
+// path that does not exist.
 inline std::string PathBesideProgram(const char* name) {
     std::error_code error;
     const std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe", error);

@@ -1,5 +1,5 @@
-// The simulated touch daemon: publishes its service on the vendor binder and answers commands. The
-// properties in keys.h and faults.h make it fail.
+// The simulated touch daemon: publishes its service on the vendor binder and answers commands.
+// Properties make it fail; see keys.h and faults.h.
 #include <android/log.h>
 #include <sys/system_properties.h>
 #include <sys/time.h>
@@ -36,7 +36,7 @@ constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr uint32_t kExecuteCommandCode = 0;
 // Just long enough to send the reply.
 constexpr int kDieAfterReplyUs = 2000;
-// The names of the phone's commands, each between spaces for the search.
+// The phone's commands, with a space before and after each name for the search.
 constexpr char kCommands[] = " " TPD_DAEMON_COMMANDS " ";
 
 const android::StaticString16 kDescriptor(
@@ -48,7 +48,6 @@ std::string Help() {
     return "corvane_daemon commands:\n" + commands;
 }
 
-// Returns the answer to a command.
 std::string Answer(const std::string& command, const std::string& params) {
     if (const std::optional<std::string> recorded = device::FindAnswer(command, params)) {
         return *recorded;
@@ -79,7 +78,7 @@ std::string Answer(const std::string& command, const std::string& params) {
     abort();
 }
 
-// Kills the process after the reply has been sent. A timer cannot fail to start as a thread can.
+// Kills the process after the reply has been sent. Uses a timer: starting a thread could fail.
 void DieAfterReply() {
     constexpr itimerval kDelay = {{0, 0}, {0, kDieAfterReplyUs}};
     [[maybe_unused]] static const int started = setitimer(ITIMER_REAL, &kDelay, nullptr);

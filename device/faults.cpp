@@ -47,7 +47,7 @@ constexpr struct FaultRow {
         {FaultKind::kHuge, "huge", "replies with a long text", {"BYTES", 0, 64 << 20}},
 };
 
-// Stores the word's value in `number`. Returns an empty string, or an error when it is invalid.
+// Stores the value of `word` in `number`. Returns an empty string, or an error if it is invalid.
 std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
     number = strtoll(word.c_str(), nullptr, 10);
     return IsNumberWithin(word, range.min, range.max)
@@ -87,8 +87,8 @@ std::string ParseFault(const std::string& text, Fault& fault) {
     return error.empty() ? "" : "fault " + name + ": " + error;
 }
 
-// Serializes changes of the fault between processes and threads by locking the directory of
-// properties. Closing the descriptor releases the lock.
+// Locks the properties directory to serialize changes to the fault between processes and threads.
+// Closing the descriptor releases the lock.
 host::UniqueFd LockFault() {
     host::UniqueFd lock = host::OpenDirectory(host::kPropertiesDirectory);
     if (lock.ok() && flock(lock.get(), LOCK_EX) != 0) {

@@ -1,5 +1,5 @@
-// The faults of the simulated daemon. The property sim.fault holds the current one as
-// NAME [ARGUMENT] [COUNT], like the arguments of `device fault`. An invalid value is ignored.
+// The faults of the simulated daemon. The property sim.fault holds the current fault in the form of
+// the arguments of `device fault`: NAME [ARGUMENT] [COUNT]. An invalid value is ignored.
 #pragma once
 
 #include <cstdint>
@@ -21,14 +21,14 @@ enum class FaultKind {
 
 struct Fault {
     FaultKind kind = FaultKind::kNone;
-    int64_t argument = 0;  // the meaning depends on the kind
-    int64_t count = 0;     // of calls that the fault affects; 0: all
+    int64_t argument = 0;  // milliseconds, a status or bytes, depending on the kind
+    int64_t count = 0;     // number of calls that the fault affects, 0 for all
 };
 
-// Returns the fault for a call of this command and decrements its remaining count.
+// Returns the fault that affects this call of the command, and decrements the fault's count.
 Fault TakeFault(const std::string& command);
 
-// `device fault`: sets the fault given by the arguments, or lists all faults without arguments.
+// `device fault`: sets the fault given by the arguments or, without arguments, lists all faults.
 // Returns the exit status, 2 for a usage error.
 int SetOrListFaults(int argc, char** argv);
 

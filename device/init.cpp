@@ -1,9 +1,9 @@
 // The device's init: boots the device and supervises the touch daemon. "odm.thp.service_enable"
 // starts and stops the daemon. Init restarts a daemon that exits, and counts the restarts.
 //
-// init MODE: boots the device root with SELinux in that mode. Writes one byte to standard output
-// when the device has booted; prints earlier failures to standard error. Exits on SIGTERM or
-// SIGINT, or when the directory of properties is removed.
+// init MODE: boots the device with SELinux in MODE. Writes one byte to standard output when the
+// device has booted, and prints earlier failures to standard error. Exits on SIGTERM or SIGINT, or
+// when the properties directory is removed.
 #include <android/log.h>
 #include <fcntl.h>
 #include <poll.h>
@@ -37,7 +37,7 @@ namespace {
 using host::UniqueFd;
 
 constexpr char kDriverDirectory[] = "dev/vndbinder";
-// The pause doubles while the daemon exits before it is alive.
+// The pause doubles each time the daemon exits before it is alive.
 constexpr int kMinRestartPauseMs = 50;
 constexpr int kMaxRestartPauseMs = 5000;
 
@@ -56,8 +56,8 @@ constexpr const char* kBootProperties[][2] = {{device::kBuildIdKey, "VIRTUAL-11.
                                               {device::kIsUpdatingFirmwareKey, "false"},
                                               {device::kServiceEnableKey, "1"}};
 
-// Removes the files of a directory, except those with the kept prefix. Creates the directory when
-// it is missing. Returns false when it cannot be opened.
+// Removes the files in a directory, except those with the kept prefix. Creates a missing directory.
+// Returns false if it cannot be opened.
 bool Empty(const char* path, const std::string& keptPrefix = "/") {
     const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
     if (!directory.ok()) {
@@ -80,7 +80,7 @@ bool LockDevice() {
     return file.ok() && fcntl(file.get(), F_SETLK, &whole) == 0;
 }
 
-// Also replaces read-only properties that another process has just written.
+// Writes the files directly to replace even read-only properties that a process has just set.
 bool SetBootProperties() {
     return std::all_of(
             std::begin(kBootProperties), std::end(kBootProperties), [](const auto& each) {
@@ -88,8 +88,8 @@ bool SetBootProperties() {
             });
 }
 
-// Resets the device's files to the state after power-on. Returns null, or the file or directory
-// that could not be reset.
+// Resets the device's files to their state at power-on. Returns null, or the path that could not be
+// reset.
 const char* Boot(const char* selinuxMode) {
     const host::TraceEvent event("boot");
     if (!Empty(host::kTemporaryDirectory)) {
@@ -107,7 +107,7 @@ const char* Boot(const char* selinuxMode) {
     return host::ReplaceFile(host::kSelinuxFile, selinuxMode) ? nullptr : host::kSelinuxFile;
 }
 
-// Whether a property that init watches was written since the last call.
+// Returns true if a property that init watches has been written since the last call.
 bool DrainEvents(const UniqueFd& watch) {
     alignas(inotify_event) char events[16384];
     const ssize_t size = read(watch.get(), events, sizeof(events));
@@ -124,8 +124,8 @@ bool DrainEvents(const UniqueFd& watch) {
 
 class DaemonSupervisor {
   public:
-    // Applies a write by stopping the daemon first. After quick writes of "0" and "1", only "1" can
-    // be read, but the daemon must still restart. Writes during the stop are applied here, too.
+    // Applies a write. Always stops the daemon: after quick writes of "0" and "1", only "1" can be
+    // read, but the daemon must restart. Also applies writes made during the stop.
     void Restart(const UniqueFd& watch) {
         Stop();
         DrainEvents(watch);
@@ -133,7 +133,7 @@ class DaemonSupervisor {
         mPauseMs = 0;
     }
 
-    // Reaps a daemon that has exited, and starts one if enabled. Returns false when fork() fails.
+    // Reaps a daemon that has exited, and starts one if enabled. Returns false if fork() fails.
     bool ReapAndStart() {
         ReapDaemon();
         if (mDaemon < 0 && mIsEnabled) {
@@ -166,7 +166,7 @@ class DaemonSupervisor {
         if (getppid() == init) {
             host::LookForTrace();
             host::TraceEvent("daemon_start").Add("daemon", getpid());
-            // This path leads to the same directory even when the root was renamed.
+            // This path refers to the same directory even after the root is renamed.
             const std::string root =
                     "/proc/self/fd/" + std::to_string(dup(host::DeviceRoot())) + "/.";
             setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
@@ -210,7 +210,7 @@ class DaemonSupervisor {
 
     pid_t mDaemon = -1;
     bool mIsEnabled = false;
-    int mPauseMs = 0;  // before the next daemon runs; the child process waits
+    int mPauseMs = 0;  // before the next daemon starts; the child process waits
 };
 
 // Drops the caller's descriptors, signal handling, session and working directory.
@@ -234,7 +234,7 @@ UniqueFd OpenSignals() {
     return UniqueFd(signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK));
 }
 
-// Watches for writes of properties and for the removal of their directory.
+// Returns a descriptor that reports writes of properties and the removal of their directory.
 UniqueFd OpenWatch() {
     UniqueFd watch(inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
     const auto add = [&watch](int directory, uint32_t events) {
@@ -252,7 +252,7 @@ bool ExitRequested(const UniqueFd& signals) {
     return isSignaled && signal.ssi_signo != SIGCHLD;
 }
 
-// Whether the directory of properties is still the one that init watches.
+// Returns true if the properties directory is still the one that init watches.
 bool PropertiesExist() {
     struct stat followed = {};
     struct stat found = {};

@@ -1,9 +1,9 @@
-// The property keys shared by init, the daemon and the other programs of the device.
+// The property keys shared by the programs of the device.
 #pragma once
 
 namespace device {
 
-// The same as on a phone.
+// As on a phone.
 constexpr char kBootCompletedKey[] = "sys.boot_completed";
 constexpr char kBuildIdKey[] = "ro.build.display.id";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
@@ -14,8 +14,8 @@ constexpr char kPermissiveFlagKey[] = "odm.thp.debug.selinux.permissive";
 constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 
-// Control the simulated daemon: its startup delay, whether a firmware update is in progress
-// ("true"), and its fault (see faults.h).
+// Control the simulated daemon: its startup delay in milliseconds, a firmware update ("true" while
+// in progress) and its fault (see faults.h).
 constexpr char kBootDelayKey[] = "sim.boot_delay_ms";
 constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 constexpr char kFaultKey[] = "sim.fault";

@@ -25,8 +25,8 @@ int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
     return FailForErrno(program);
 }
 
-// Returns the directory of the device's commands. Prints an error and returns an empty string when
-// the directory cannot be in PATH.
+// Returns the directory of the device's commands. If it cannot be in PATH, prints an error and
+// returns an empty string.
 std::string CommandDirectory() {
     std::string bin = PathBesideProgram("bin");
     if (bin.find(':') != std::string::npos) {
@@ -64,7 +64,7 @@ int Shell(int argc, char** argv) {
     if (bin.empty()) {
         return 1;
     }
-    // The startup file and the prompt of an interactive shell.
+    // Startup file and prompt of an interactive shell.
     setenv("ENV", "/dev/null", 1);
     setenv("PS1", "virtual:$PWD # ", 1);
     if (argc == 0) {
