@@ -1,5 +1,5 @@
 #!/usr/bin/python3
-"""Prints, follows or clears the log of the device whose root is the descriptor ROOT"""
+"""logcat.py ROOT [OPTION...]: the device's logcat; ROOT is a descriptor of the device root"""
 import argparse
 import os
 import re
@@ -26,7 +26,7 @@ FOLLOW_PAUSE_MS = 50
 
 
 def buffers(names):
-    """Checks the names of log buffers; they share one log"""
+    """Checks the names of log buffers, all of which share one log"""
     if not BUFFERS.issuperset(names.split(",")):
         raise ValueError
 
@@ -45,7 +45,7 @@ def pattern(text):
 
 
 def tag_filter(text):
-    """The tag of a filter TAG[:PRIORITY] and its lowest priority to show"""
+    """Returns the tag of a filter TAG[:PRIORITY] and the lowest priority to show"""
     tag, _, letter = text.rpartition(":") if ":" in text else (text, ":", "V")
     if not tag or letter.upper() not in LEVELS:
         raise ValueError
@@ -54,21 +54,21 @@ def tag_filter(text):
 
 def parse(arguments):
     parser = argparse.ArgumentParser(prog="logcat", description="Prints the device's log.")
-    parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="ignored")
+    parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="has no effect")
     parser.add_argument("-c", dest="clear", action="store_true", help="clear the log")
     parser.add_argument("-d", dest="dump", action="store_true", help="do not follow the log")
-    parser.add_argument("-e", "--regex", type=pattern, help="show matching texts only")
-    parser.add_argument("-f", dest="file", help="append to a file")
-    parser.add_argument("--pid", type=positive, help="show this process only")
-    parser.add_argument("-s", dest="silent", action="store_true", help="as the filter *:S")
-    parser.add_argument("-t", dest="count", type=positive, help="show the last entries only")
+    parser.add_argument("-e", "--regex", type=pattern, help="show only matching texts")
+    parser.add_argument("-f", dest="file", help="append the output to a file")
+    parser.add_argument("--pid", type=positive, help="show only entries of this process")
+    parser.add_argument("-s", dest="silent", action="store_true", help="same as the filter *:S")
+    parser.add_argument("-t", dest="count", type=positive, help="show only the last entries")
     parser.add_argument("-v", dest="format", choices=FORMATS, default="threadtime")
     parser.add_argument(
         "filters",
         type=tag_filter,
         nargs="*",
         metavar="TAG[:PRIORITY]",
-        help="lowest priority to show, one of V, D, I, W, E, F and S; * is all other tags",
+        help="lowest priority to show: V, D, I, W, E, F or S (none); * stands for all other tags",
     )
     return parser.parse_intermixed_args(arguments)
 
@@ -81,7 +81,7 @@ class Log:
         self.first, self.position = b"", 0
 
     def read_new(self):
-        """The complete entries since the last call; all when the log was cleared meanwhile"""
+        """Yields the complete entries since the last call, or all if the log was cleared"""
         first = os.pread(self.file, HEADER.size, 0)
         if first != self.first:
             self.first, self.position = first, 0

@@ -52,12 +52,12 @@ ARROWS = {
 
 
 def shown(text):
-    """Decodes recorded text, in which each code point is one byte, and escapes it"""
+    """Decodes and escapes a recorded text, in which each code point stands for one byte"""
     return escaped(text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace"))
 
 
 def escaped(text):
-    """Escapes control characters and other unprintable characters"""
+    """Escapes unprintable characters"""
     return "".join(c if c.isprintable() else repr(c)[1:-1] for c in text)
 
 
@@ -87,7 +87,7 @@ def hexdump(request):
 
 @contextlib.contextmanager
 def recording(root):
-    """Turns tracing on. Holds the file's lock, taken before the file gets its final name."""
+    """Turns tracing on. Locks the trace file before it gets its final name."""
     temporary = f"{os.getpid()}.{TRACE}"
     directory = os.open("tmp", os.O_DIRECTORY | os.O_NOFOLLOW, dir_fd=root)
     trace = os.open(temporary, os.O_RDWR | os.O_CREAT | os.O_EXCL, 0o600, dir_fd=directory)
@@ -115,7 +115,7 @@ def read_trace(trace):
 
 
 def is_idle(events):
-    """Whether there are no recent events and no daemon is starting"""
+    """Returns true if there are no recent events and no daemon is starting"""
     life = [
         event["what"]
         for event in events
