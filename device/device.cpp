@@ -1,5 +1,5 @@
 // The command that starts, stops and uses the virtual device. Init holds a record lock while the
-// device runs; F_GETLK finds the holder without taking the lock.
+// device runs. F_GETLK finds the holder without taking the lock.
 #include <fcntl.h>
 #include <limits.h>
 #include <poll.h>
@@ -50,7 +50,7 @@ int UsageError(const std::string& error) {
     return device::Fail(error + "; see 'device --help'", device::kUsageError);
 }
 
-// Prints a message for people. Returns the exit status of success.
+// Prints a message on standard error. Returns 0, the exit status of success.
 int Say(const std::string& what) {
     fprintf(stderr, "device: %s\n", what.c_str());
     return 0;
@@ -71,8 +71,8 @@ std::filesystem::path ProgramOf(pid_t process, std::error_code& error) {
     return std::filesystem::read_symlink("/proc/" + std::to_string(process) + "/exe", error);
 }
 
-// Returns the process that holds init's lock, 0 when it is free, or -1 with the reason when the
-// holder cannot be identified.
+// Returns the ID of the process that holds init's lock, or 0 if the lock is free. If the holder
+// cannot be identified, stores the reason and returns -1.
 pid_t LookForInit(std::string& reason) {
     const UniqueFd lock = host::OpenFile(host::kInitLockFile, O_RDONLY);
     if (!lock.ok() && errno == ENOENT) {
@@ -98,8 +98,8 @@ pid_t LookForInit(std::string& reason) {
     return -1;
 }
 
-// Returns init's process, 0 when the device is stopped, or -1 after an error message. Retries
-// because an exiting init loses its /proc executable link before its lock.
+// Returns init's process ID, 0 if the device is stopped, or -1 after an error message. Retries
+// because an exiting init loses its /proc/PID/exe link before its lock.
 pid_t FindInit() {
     pid_t init = -1;
     std::string reason;
@@ -110,7 +110,7 @@ pid_t FindInit() {
     return init;
 }
 
-// Returns whether the device is running; prints an error when it is not.
+// Returns true if the device is running. Otherwise prints an error.
 bool ExpectRunning() {
     const pid_t init = FindInit();
     if (init == 0) {
@@ -119,14 +119,14 @@ bool ExpectRunning() {
     return init > 0;
 }
 
-// Whether the process runs the current init executable. True when it has just exited.
+// Returns true if the process runs this build's init, or has just exited.
 bool IsCurrentBuild(pid_t init) {
     std::error_code error;
     const std::filesystem::path program = ProgramOf(init, error);
     return error || program == device::PathBesideProgram("init");
 }
 
-// Sends SIGTERM, then SIGKILL after a time-out. The pidfd protects against a reused process number.
+// Sends SIGTERM, then SIGKILL after a time-out. The pidfd protects against a reused process ID.
 int Stop(int argc, char** argv) {
     const pid_t init = FindInit();
     if (init <= 0) {
@@ -174,7 +174,7 @@ int AwaitDaemon() {
 int Boot(const char* selinuxMode) {
     int report[2];
     if (pipe2(report, O_CLOEXEC) != 0) {
-        return FailForErrno("cannot make a pipe");
+        return FailForErrno("cannot create a pipe");
     }
     const UniqueFd reader(report[0]);
     UniqueFd writer(report[1]);
@@ -198,7 +198,7 @@ int Boot(const char* selinuxMode) {
     return AwaitDaemon();
 }
 
-// Boots the device unless it already runs from this build. A lock on the root serializes starts.
+// Boots the device unless this build's init is running. A lock on the root serializes starts.
 int BringUp(const char* selinuxMode) {
     const UniqueFd root = host::OpenDirectory(".");
     const auto isFree = [&root] {
@@ -282,7 +282,7 @@ int Run(int argc, char** argv) {
     return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
 }
 
-// Passes trace.py the number of a device root descriptor as its first argument.
+// The first argument of trace.py is the number of a device root descriptor.
 int Trace(int argc, char** argv) {
     if (!ExpectRunning()) {
         return 1;
@@ -307,24 +307,24 @@ constexpr struct Verb {
     int (*run)(int argc, char** argv);
 } kVerbs[] = {
         {"start", " [--permissive]",
-         "boots the device, with SELinux enforcing without the option, and waits for its daemon", 1,
+         "boots the device and waits for its daemon; without the option, SELinux is enforcing", 1,
          Start},
-        {"reboot", "", "stops the device and boots it, with SELinux enforcing", 0, Reboot},
+        {"reboot", "", "reboots the device, with SELinux enforcing", 0, Reboot},
         {"stop", "", "stops the device", 0, Stop},
-        {"status", "", "prints its state; exits with 3 when it is stopped, 4 when unknown", 0,
+        {"status", "", "prints the device's state; exits with 3 if stopped, 4 if unknown", 0,
          Status},
-        {"root", "", "prints the directory of its files; creates it when it is missing", 0, Root},
-        {"shell", " [COMMAND...]", "runs a command or the interactive shell, as `adb shell`",
+        {"root", "", "prints the device's directory; creates it if missing", 0, Root},
+        {"shell", " [COMMAND...]", "runs a command or an interactive shell, like `adb shell`",
          INT_MAX, Shell},
         {"run", " [ARGUMENT...]", "runs the tool; boots a stopped device in permissive mode",
          INT_MAX, Run},
         {"trace", " [--bytes] [--json | --mermaid] ARGUMENT...",
-         "runs the tool and shows what all processes did", INT_MAX, Trace},
+         "runs the tool and shows what the tool, the daemon and init did", INT_MAX, Trace},
         {"fault", " [NAME [ARGUMENT] [COUNT] | none]",
-         "sets the daemon's fault; lists the faults without arguments", 3, Fault},
+         "sets the daemon's fault; without arguments, lists the faults", 3, Fault},
         {"answer", " [COMMAND TEXT | COMMAND - | --remove COMMAND]",
-         "records an answer, `-` from standard input; lists them without arguments", INT_MAX,
-         device::ListOrRecordAnswers}};
+         "records an answer (-: from standard input); without arguments, lists the commands",
+         INT_MAX, device::ListOrRecordAnswers}};
 
 void PrintUsage(FILE* stream, const Verb& verb) {
     fprintf(stream, "    device %s%s\n        %s\n", verb.name, verb.arguments, verb.effect);
