@@ -1,5 +1,5 @@
-// The device's own shell commands in one program, selected by argv[0]. They use the platform's
-// functions, so the same rules for names, sizes and access apply.
+// The device's own shell commands, selected by argv[0]. They use the platform's functions, so the
+// same rules for names, sizes and access apply.
 #include <android/log.h>
 #include <limits.h>
 #include <strings.h>
@@ -23,7 +23,7 @@
 namespace {
 
 using device::FailForErrno;
-using device::kUsageError;  // of a command; main() prints the usage
+using device::kUsageError;  // makes main() print the usage
 
 // Returns the whole value; __system_property_get() truncates a long one.
 std::string WholeProperty(const std::string& name) {
@@ -75,7 +75,7 @@ int Setenforce(int /* argc */, char** argv) {
     }
     return host::ReplaceFile(host::kSelinuxFile, isPermissive ? "Permissive" : "Enforcing")
                    ? 0
-                   : FailForErrno("cannot set the mode");
+                   : FailForErrno("cannot set the SELinux mode");
 }
 
 int ListSettings(const std::string& directory) {
@@ -115,7 +115,7 @@ int Settings(int argc, char** argv) {
     return kUsageError;
 }
 
-// Returns the log priority for the letter, or -1 when it is unknown.
+// Returns the log priority for the letter, or -1 if it is unknown.
 int PriorityOf(const std::string& letter) {
     int priority = ANDROID_LOG_SILENT;
     while (priority >= ANDROID_LOG_VERBOSE &&
@@ -153,7 +153,7 @@ int Log(int argc, char** argv) {
                                                                        : FailForErrno("cannot log");
 }
 
-// Passes logcat.py the number of a device root descriptor as its first argument.
+// The first argument of logcat.py is the number of a device root descriptor.
 int Logcat(int argc, char** argv) {
     const std::string script = device::PathBesideProgram("logcat.py");
     const std::string root = std::to_string(dup(host::DeviceRoot()));
