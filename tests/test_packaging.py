@@ -119,28 +119,59 @@ def test_builds_the_same_sources_for_a_device():
     assert sorted(for_device) == sorted(path for path in here if path.split("/")[0] in directories)
 
 
-def fenced(text):
-    """The first fenced block of a page's text."""
-    return re.search(r"^```\w*\n(.*?)^```", text, re.S | re.M)[1]
-
-
 def is_idle(device):
     is_enabled = device.getprop("odm.thp.service_enable") == "1"
     return device.is_up() == is_enabled or not device.processes("/init")
 
 
-def test_replays_the_session_of_the_readme(stopped_device):
-    session = fenced(source("README.md"))
+def steps(session):
+    """The commands of a session, each after "$ ", with the output that it shows"""
     for step in session.removeprefix("$ ").split("\n$ "):
-        command, _, expected = step.partition("\n")
-        stdout = stopped_device.output("bash", "-c", command, cwd=SOURCE)
-        assert stdout.rstrip("\n") == expected.rstrip("\n"), command
-        wait_until(lambda: is_idle(stopped_device))
+        lines = step.splitlines()
+        count = 1 + sum(line.startswith("> ") for line in lines)
+        command = [line.removeprefix("> ") for line in lines[:count]]
+        yield "\n".join(command), "\n".join(lines[count:])
+
+
+def replay(device, session, directory):
+    """Runs the commands of a session in one shell and compares their output."""
+    pipes = {"stdin": subprocess.PIPE, "stdout": subprocess.PIPE, "text": True}
+    with subprocess.Popen(["bash"], env=device.env, cwd=directory, **pipes) as bash:
+        for command, expected in steps(session):
+            bash.stdin.write("{ %s\n} </dev/null; printf '\\0'\n" % command)
+            bash.stdin.flush()
+            shown = iter(lambda: bash.stdout.read(1) or "\0", "\0")
+            assert "".join(shown).rstrip("\n") == expected.rstrip("\n"), command
+            wait_until(lambda: is_idle(device))
+
+
+@pytest.mark.parametrize("page", ["README.md", "docs/automation.md"])
+def test_replays_the_sessions_of_a_page(installed, installed_device, tmp_path, page):
+    text = source(page).replace("/usr/share/", f"{installed}/usr/share/")
+    directory = SOURCE if page == "README.md" else tmp_path
+    for session in re.findall(r"^```\n(\$ .*?)^```", text, re.S | re.M):
+        replay(installed_device, session, directory)
+
+
+@pytest.mark.parametrize("page", ["tpd.1", "tpd-device.1"])
+def test_runs_the_examples_of_a_manual(installed, installed_device, build, page):
+    text = (
+        (build / "docs" / page)
+        .read_text()
+        .replace(r"\-", "-")
+        .replace("/usr/", f"{installed}/usr/")
+    )
+    blocks = re.findall(r"^\.nf\n(?:\.RS\n)?(.*?)^\.(?:RE|fi)", text, re.S | re.M)
+    examples = [block for block in blocks if re.match("adb|export|tpd-device", block)]
+    assert len(examples) > 3
+    for example in examples:
+        installed_device.output("tpd-device", "reboot")
+        installed_device.output("bash", "-ec", example)
 
 
 def test_runs_the_ci_example(installed, installed_device):
-    page = source("docs/automation.md").partition("<!-- ci-example -->\n")[2]
-    example = fenced(page).replace("/usr/", f"{installed}/usr/")
+    page = source("docs/automation.md").replace("/usr/", f"{installed}/usr/")
+    example = re.search(r"^```sh\n(.*?)^```", page, re.S | re.M)[1]
     done = installed_device.run("sh", "-xc", example)
     assert done.returncode == 0, done.stderr
 
