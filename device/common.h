@@ -32,6 +32,11 @@ inline int Fail(const std::string& error, int status = kFailure) {
 // Like Fail(), with the reason from errno.
 inline int FailForErrno(const std::string& what) { return Fail(what + ": " + strerror(errno)); }
 
+// Returns the command that the user would type to run this program with these arguments, quoted.
+inline std::string Command(const std::string& arguments) {
+    return std::string("'") + program_invocation_short_name + " " + arguments + "'";
+}
+
 // Returns the property's value, or an empty string if it is not set.
 inline std::string GetProperty(const char* key) {
     char value[PROP_VALUE_MAX];

@@ -47,14 +47,11 @@ constexpr int kStopLimitMs = 5000;
 constexpr std::chrono::milliseconds kPollPause(5);
 
 int UsageError(const std::string& error) {
-    return device::Fail(error + "; see 'device --help'", device::kUsageError);
+    return device::Fail(error + "; see " + device::Command("--help"), device::kUsageError);
 }
 
-// Prints a message on standard error. Returns 0, the exit status of success.
-int Say(const std::string& what) {
-    fprintf(stderr, "device: %s\n", what.c_str());
-    return 0;
-}
+// Prints a message on standard error. Returns the exit status of success.
+int Say(const std::string& what) { return Fail(what, 0); }
 
 bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(limitMs);
@@ -114,7 +111,7 @@ pid_t FindInit() {
 bool ExpectRunning() {
     const pid_t init = FindInit();
     if (init == 0) {
-        Fail("the device is stopped; `device start` boots it");
+        Fail("the device is stopped; " + device::Command("start") + " boots it");
     }
     return init > 0;
 }
@@ -166,8 +163,8 @@ int AwaitDaemon() {
     }
     return device::IsDaemonAlive()
                    ? 0
-                   : Fail("the daemon is not alive; see `device shell logcat -d`, or start a "
-                          "stopped daemon with `device shell tpd start`");
+                   : Fail("the daemon is not alive; see " + device::Command("shell logcat -d") +
+                          ", or start a stopped daemon with " + device::Command("shell tpd start"));
 }
 
 // Starts init and waits until it has booted the device. Init prints its own errors.
@@ -327,7 +324,8 @@ constexpr struct Verb {
          INT_MAX, device::ListOrRecordAnswers}};
 
 void PrintUsage(FILE* stream, const Verb& verb) {
-    fprintf(stream, "    device %s%s\n        %s\n", verb.name, verb.arguments, verb.effect);
+    fprintf(stream, "    %s %s%s\n        %s\n", program_invocation_short_name, verb.name,
+            verb.arguments, verb.effect);
 }
 
 bool AsksForHelp(const char* word) {

@@ -68,7 +68,7 @@ std::string ParseFault(const std::string& text, Fault& fault) {
     const auto* const row = std::find_if(std::begin(kFaults), std::end(kFaults),
                                          [&](const FaultRow& each) { return name == each.name; });
     if (row == std::end(kFaults)) {
-        return "unknown fault '" + name + "'; 'device fault' lists them";
+        return "unknown fault '" + name + "'; " + Command("fault") + " lists them";
     }
     fault.kind = row->kind;
     std::string error;

@@ -6,7 +6,7 @@ import subprocess
 
 import pytest
 
-from virtual_device import LIMIT_S, PASS, wait_until
+from virtual_device import LIMIT_S, PASS, SOURCE, wait_until
 
 
 @pytest.fixture
@@ -29,13 +29,15 @@ def test_shows_the_steps_of_a_command(trace):
         "tool calls code 0, two-way",
         r'daemon receives captest, parameters ""a\b\x1b[2J"',
         "daemon answers",
-        "tool has its reply",
+        "tool receives the reply",
         r'result: captest "a\b\x1b[2J: PASS',
     )
 
 
-def test_shows_the_bytes_of_the_request(trace):
-    assert "00000080: 6361 7074 6573 7400 0000 0000" in trace("--bytes", "captest")
+def test_shows_the_bytes_on_the_page_of_the_wire_format(trace):
+    page = (SOURCE / "docs/wire-format.md").read_text()
+    dump = re.findall("^[0-9a-f]{8}: .*", page, re.M)
+    assert_in_order(trace("--bytes", "THP_SetFoldState", "1"), *dump)
 
 
 def test_prints_the_events_as_they_were_recorded(trace):
