@@ -1,10 +1,12 @@
 """Fixtures: a virtual device, running or stopped
 
 TPD_BUILD_DIR names the build under test. TPD_COMMAND names another tool to drive on its device,
-for example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK selects the long forms, too.
+for example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK selects the long forms, too. TPD_SEED
+repeats the choices of a random test, which prints its seed.
 """
 import os
 import pathlib
+import random
 import shlex
 import tempfile
 
@@ -21,6 +23,14 @@ def pytest_collection_modifyitems(items):
 @pytest.fixture(scope="session")
 def build():
     return pathlib.Path(os.environ.get("TPD_BUILD_DIR", SOURCE / "build")).resolve()
+
+
+@pytest.fixture
+def chance():
+    """A test's random choices. A failing test prints the seed."""
+    seed = int(os.environ.get("TPD_SEED", random.randrange(1 << 32)))
+    print(f"TPD_SEED={seed}")
+    return random.Random(seed)
 
 
 @pytest.fixture

@@ -2,7 +2,6 @@
 import concurrent.futures
 import fcntl
 import os
-import random
 import shutil
 
 import pytest
@@ -24,12 +23,30 @@ def in_parallel(device, commands):
 
 
 @pytest.mark.parametrize("repeats", [3, pytest.param(100, marks=pytest.mark.soak)])
-def test_concurrent_commands_leave_at_most_one_init(device, repeats):
+def test_concurrent_commands_leave_at_most_one_init(device, chance, repeats):
     for _ in range(repeats):
-        in_parallel(device, random.choices(["start", "stop", "status"], k=20))
+        in_parallel(device, chance.choices(["start", "stop", "status"], k=20))
         assert len(device.processes("/init")) <= 1
     device.start()
     assert device.is_up()
+
+
+def test_restarts_the_daemon_when_the_caller_ignored_sigchld(device):
+    device.output("env", "--ignore-signal=CHLD", "device", "start")
+    device.kill("corvane_daemon")
+    wait_until(lambda: device.restarts() == 1 and device.is_up())
+
+
+def test_waits_longer_before_each_restart_of_a_daemon_that_cannot_start(device):
+    device.start_tracing()
+    device.start()
+    (device.root / "dev").rename(device.root / "away")
+    (device.root / "dev").write_text("not a directory")
+    device.kill("corvane_daemon")
+    wait_until(lambda: len(device.events("restart_pause")) > 4)
+    pauses = [event["ms"] for event in device.events("restart_pause")]
+    assert pauses == sorted(set(pauses))
+    assert len(device.events("log", who="init")) == 1
 
 
 def test_init_is_detached_from_its_caller(device, tmp_path):

@@ -1,7 +1,6 @@
 """Many clients at once, on a steady and on a faulty device"""
 import concurrent.futures
 import os
-import random
 import time
 
 import pytest
@@ -45,7 +44,7 @@ FAULTS = [
 
 
 @pytest.mark.parametrize("commands", COMMANDS)
-def test_fails_only_with_known_results(device, commands):
+def test_fails_only_with_known_results(device, chance, commands):
     def check(state):
         text = device.tpd("captest", state)
         known = f"captest {state}: PASS\n", TIMEOUT, NO_SERVICE
@@ -54,7 +53,7 @@ def test_fails_only_with_known_results(device, commands):
     with concurrent.futures.ThreadPoolExecutor() as pool:
         clients = pool.submit(run_clients, commands, check)
         while not clients.done():
-            random.choice(FAULTS)(device)
+            chance.choice(FAULTS)(device)
             time.sleep(0.2)
     clients.result()
     device.fault("none")

@@ -97,6 +97,18 @@ def test_serves_adb_shell(device):
     assert device.shell("a=(1 2); [[ ${#a[@]} = 2 ]] && echo ${a[1]}") == "2\n"
 
 
+@pytest.mark.parametrize("option, count", [("", 1), ("-n", 3)])
+def test_adb_shell_reads_standard_input_without_n(device, option, count):
+    loop = f"while read -r x; do echo $x; adb shell {option} true; done"
+    shown = device.output("bash", "-c", loop, input="a\nb\nc\n")
+    assert len(shown.split()) == count
+
+
+def test_keeps_settings_in_their_directory(device):
+    device.run("settings", "put", "system", "../../selinux", "Permissive")
+    assert device.output("getenforce") == "Enforcing\n"
+
+
 def test_finds_the_listed_commands_and_no_others(device):
     lines = (SOURCE / "device/commands").read_text().splitlines()
     rows = [line.split() for line in lines if not line.startswith("#")]
