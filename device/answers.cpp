@@ -1,9 +1,5 @@
 #include "answers.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <cctype>
 #include <cerrno>
 #include <cstdio>
@@ -13,7 +9,6 @@
 #include "common.h"
 #include "platform/files.h"
 #include "platform/trace.h"
-#include "platform/unique_fd.h"
 
 namespace device {
 
@@ -50,15 +45,10 @@ std::string CommandOf(const std::string& file) {
 }
 
 std::optional<std::string> ReadAnswer(const std::string& command) {
-    const host::UniqueFd file = host::OpenFile(AnswerPath(command), O_RDONLY);
-    struct stat status = {};
-    if (!file.ok() || fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode)) {
-        return std::nullopt;
+    std::optional<std::string> answer = ReadFile(AnswerPath(command));
+    if (answer.has_value()) {
+        host::TraceEvent("recorded_answer").Add("command", command);
     }
-    std::string answer(static_cast<size_t>(status.st_size), '\0');
-    const ssize_t length = read(file.get(), answer.data(), answer.size());
-    answer.resize(length > 0 ? static_cast<size_t>(length) : 0);
-    host::TraceEvent("recorded_answer").Add("command", command);
     return answer;
 }
 

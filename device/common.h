@@ -2,6 +2,7 @@
 #pragma once
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
 
@@ -11,6 +12,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
+#include <optional>
 #include <set>
 #include <string>
 
@@ -68,17 +70,21 @@ inline bool IsDaemonEnabled() {
     return enable == "1" || enable == "true";
 }
 
-// Returns the contents of a file in the device root, or `missing` if it cannot be read. Reads at
-// most 128 KiB, the size limit of a program argument.
-inline std::string ReadText(const std::string& path, const char* missing) {
+// Returns the contents of a regular file in the device root; none if it cannot be read.
+inline std::optional<std::string> ReadFile(const std::string& path) {
     const host::UniqueFd file = host::OpenFile(path, O_RDONLY);
-    std::string text(131072, '\0');
+    struct stat status = {};
+    if (!file.ok() || fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode)) {
+        return std::nullopt;
+    }
+    std::string text(static_cast<size_t>(status.st_size), '\0');
     const ssize_t length = read(file.get(), text.data(), text.size());
-    return length < 0 ? missing : text.substr(0, static_cast<size_t>(length));
+    text.resize(length > 0 ? static_cast<size_t>(length) : 0);
+    return text;
 }
 
 // Returns what `getenforce` prints: Enforcing, Permissive or Disabled.
-inline std::string SelinuxMode() { return ReadText(host::kSelinuxFile, "Enforcing"); }
+inline std::string SelinuxMode() { return ReadFile(host::kSelinuxFile).value_or("Enforcing"); }
 
 // Returns the names in a directory of the device root, or an empty set if it cannot be read.
 inline std::set<std::string> FilesIn(const std::string& path) {

@@ -29,7 +29,8 @@ using device::kUsageError;  // makes main() print the usage
 std::string WholeProperty(const std::string& name) {
     const std::string value = device::GetProperty(name.c_str());
     const bool isCut = value.length() == PROP_VALUE_MAX - 1;
-    return isCut ? device::ReadText(std::string(host::kPropertiesDirectory) + "/" + name, "")
+    return isCut ? device::ReadFile(std::string(host::kPropertiesDirectory) + "/" + name)
+                           .value_or("")
                  : value;
 }
 
@@ -80,7 +81,7 @@ int Setenforce(int /* argc */, char** argv) {
 
 int ListSettings(const std::string& directory) {
     for (const std::string& key : device::FilesIn(directory)) {
-        printf("%s=%s\n", key.c_str(), device::ReadText(directory + key, "null").c_str());
+        printf("%s=%s\n", key.c_str(), device::ReadFile(directory + key).value_or("null").c_str());
     }
     return 0;
 }
@@ -102,7 +103,7 @@ int Settings(int argc, char** argv) {
     }
     const std::string path = directory + key;
     if (verb == "get" && argc == 4) {
-        puts(device::ReadText(path, "null").c_str());
+        puts(device::ReadFile(path).value_or("null").c_str());
         return 0;
     }
     if (verb == "delete" && argc == 4) {
