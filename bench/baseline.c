@@ -62,7 +62,6 @@ static void Log(uint8_t priority, const char* tag, const char* text) {
 // Opens the properties directory on first use.
 static void ReadProperty(const char* name) {
     if (properties == 0) {
-        mkdirat(root, "properties", 0700);
         properties = openat(root, "properties", kDirectory);
     }
     const int file = openat(properties, name, O_RDONLY | kFile);
@@ -78,7 +77,6 @@ static void WriteProperty(const char* name, const char* text) {
     char temporary[64];
     fstatat(properties, name, &status, AT_SYMLINK_NOFOLLOW);
     snprintf(temporary, sizeof(temporary), "%d.0", getpid());
-    mkdirat(root, "tmp", 0700);
     const int directory = openat(root, "tmp", kDirectory);
     const int file = openat(directory, temporary, O_WRONLY | O_CREAT | O_TRUNC | kFile, 0600);
     WriteAll(file, text, strlen(text));

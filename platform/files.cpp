@@ -39,10 +39,12 @@ UniqueFd OpenDirectory(const path& path, IfMissing ifMissing) {
         if (name.empty()) {
             break;  // a trailing slash
         }
-        if (ifMissing == IfMissing::kMake) {
+        UniqueFd next(openat(above, name.c_str(), kDirectory));
+        if (!next.ok() && errno == ENOENT && ifMissing == IfMissing::kMake) {
             mkdirat(above, name.c_str(), 0700);
+            next.reset(openat(above, name.c_str(), kDirectory));
         }
-        directory = UniqueFd(openat(above, name.c_str(), kDirectory));
+        directory = std::move(next);
         above = directory.get();
         if (!directory.ok()) {
             break;
