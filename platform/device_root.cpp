@@ -26,8 +26,8 @@ int Refuse(const std::string& path, const char* why) {
     return -1;
 }
 
-// Opens closed standard descriptors. Otherwise a file of the device could get such a number, and
-// the program's output would go to that file.
+// Opens closed standard descriptors on /dev/null. Otherwise a file of the device could become
+// standard output.
 void FillStandardDescriptors() {
     UniqueFd null(open("/dev/null", O_RDWR));
     while (null.ok() && null.get() <= STDERR_FILENO) {
@@ -41,7 +41,7 @@ bool IsMarked(int root) {
     return fstatat(root, kMark, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
 }
 
-// Marks an empty directory as a device root. Returns null, or why that is impossible.
+// Marks an empty directory as a device root. Returns null, or the reason for the failure.
 const char* Mark(int root) {
     std::error_code error;
     if (std::filesystem::is_empty("/proc/self/fd/" + std::to_string(root), error)) {
@@ -51,11 +51,11 @@ const char* Mark(int root) {
     if (error) {
         return strerror(error.value());
     }
-    // Another process may have marked it meanwhile.
+    // Another process may have marked it in the meantime.
     return IsMarked(root) ? nullptr : "contains files that do not belong to a device";
 }
 
-// Returns null, or why the directory cannot be the device root.
+// Returns null, or the reason why the directory cannot be the device root.
 const char* Check(int root) {
     struct stat status = {};
     if (fstat(root, &status) != 0) {
@@ -105,7 +105,7 @@ std::string DeviceRootPath() {
     } else if (const char* const home = getenv("HOME"); IsSet(home)) {
         path = std::string(home) + "/.local/state/tpd-device";
     }
-    // open() follows a symbolic link with a trailing slash.
+    // With a trailing slash, open() would follow a symbolic link despite O_NOFOLLOW.
     while (path.length() > 1 && path.back() == '/') {
         path.pop_back();
     }

@@ -1,5 +1,5 @@
-// Files of the device, by their paths below the device root. Symbolic links are not followed in any
-// component of a path. A function that fails sets errno.
+// The device's files. Paths are relative to the device root; symbolic links are not followed in any
+// component. Functions set errno on failure.
 #pragma once
 
 #include <filesystem>
@@ -10,13 +10,13 @@
 
 namespace host {
 
-// The contents of the device root, except "settings/SPACE/KEY" and the binder driver.
+// Paths in the device root.
 constexpr char kCommandLineFile[] = "proc/cmdline";
-constexpr char kInitLockFile[] = "init.lock";  // init holds a record lock on it while it runs
+constexpr char kInitLockFile[] = "init.lock";  // locked by init while it runs
 constexpr char kLogFile[] = "log";
 constexpr char kPropertiesDirectory[] = "properties";
 constexpr char kSelinuxFile[] = "selinux";
-constexpr char kTemporaryDirectory[] = "tmp";  // new files are written here first
+constexpr char kTemporaryDirectory[] = "tmp";  // files are written here, then renamed
 constexpr char kTraceFile[] = "trace";
 
 enum class IfMissing { kFail, kMake };
@@ -25,20 +25,21 @@ enum class IfMissing { kFail, kMake };
 // with a slash.
 UniqueFd OpenDirectory(const std::filesystem::path& path, IfMissing ifMissing = IfMissing::kFail);
 
-// The properties directory, made when missing. It stays open. -1 on failure.
+// Returns a descriptor of the properties directory, which stays open, or -1. Creates a missing
+// directory.
 int PropertiesDirectory();
 
-// Opens a file with these flags of open().
+// Opens a file. `flags` are those of open().
 UniqueFd OpenFile(const std::filesystem::path& path, int flags);
 UniqueFd OpenFileAt(int directory, const std::string& name, int flags);
 
-// Opens a regular file in the root itself for appending. The caller closes the descriptor. Rejects
-// a pipe: a write to one without a reader would kill the process. O_CREAT in `flags` makes a
-// missing file.
+// Opens a regular file directly in the device root for appending. The caller closes the descriptor.
+// Rejects pipes: a write without a reader would kill the process. Creates a missing file if `flags`
+// contains O_CREAT.
 int OpenForAppending(const char* name, int flags);
 
-// Replaces a file atomically, or makes it and its missing directories. `flags` are those of
-// renameat2().
+// Replaces or creates a file atomically. ReplaceFile() also creates missing directories. `flags`
+// are those of renameat2().
 bool ReplaceFile(const std::filesystem::path& path, std::string_view content);
 bool ReplaceFileAt(int directory, const std::string& name, std::string_view content,
                    unsigned flags = 0);

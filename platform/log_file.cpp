@@ -16,7 +16,7 @@ namespace host {
 
 namespace {
 
-// The bytes of a string with its terminator. writev() only reads them.
+// Returns the bytes of a string and its terminator. The cast is safe: writev() only reads them.
 iovec Bytes(const char* text) { return {const_cast<char*>(text), strlen(text) + 1}; }
 
 }  // namespace
@@ -34,7 +34,7 @@ int AppendLogEntry(int priority, const char* tag, const char* text) {
     const iovec parts[] = {
             {&header, sizeof(header)}, {&level, sizeof(level)}, Bytes(tag), Bytes(text)};
     header.size = static_cast<uint32_t>(parts[1].iov_len + parts[2].iov_len + parts[3].iov_len);
-    // One write keeps the entry in one piece when other processes append.
+    // A single write, because other processes append, too.
     const ssize_t written = writev(log, parts, std::size(parts));
     return written < 0 ? -errno : static_cast<int>(written);
 }

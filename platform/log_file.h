@@ -1,6 +1,6 @@
-// An entry of the device's log, which is the file `log` in the device root: this header, then
-// `size` bytes with the priority (one byte), the tag and the text, both with a terminating zero.
-// Writers append an entry in one call.
+// The device's log, which is the file `log` in the device root. An entry is a header and `size`
+// bytes: the priority (one byte), the tag and the text, both zero-terminated. Writers append an
+// entry with a single write.
 #pragma once
 
 #include <android/log.h>
@@ -12,7 +12,7 @@
 
 namespace host {
 
-constexpr size_t kMaxLogText = 1023;  // bytes of a text before its terminator, as on a device
+constexpr size_t kMaxLogText = 1023;  // bytes, without the terminator, as on a device
 
 // In the machine's byte order.
 struct LogEntryHeader {
@@ -23,15 +23,15 @@ struct LogEntryHeader {
     uint32_t nanoseconds;
 };
 
-// The letter that readers show for a priority; '?' for an unknown one.
+// Returns the letter that logcat prints for a priority, or '?' if it is unknown.
 constexpr char LogPriorityLetter(int priority) {
     return priority >= ANDROID_LOG_VERBOSE && priority <= ANDROID_LOG_SILENT
                    ? "VDIWEFS"[priority - ANDROID_LOG_VERBOSE]
                    : '?';
 }
 
-// Appends an entry of this thread, time-stamped now. Returns the number of bytes written or a
-// negative errno value.
+// Appends an entry with this thread's ID and the current time. Returns the number of bytes written
+// or a negative errno value.
 int AppendLogEntry(int priority, const char* tag, const char* text);
 
 }  // namespace host

@@ -20,8 +20,8 @@ std::atomic<int> gTraced{-1};  // negative until the first check
 
 constexpr char kHexDigits[] = "0123456789abcdef";
 
-// Whether a recorder holds the lock on the file. A process that gets the lock removes the file,
-// unless another process was faster: then the name may belong to a new recorder.
+// Returns true if a recorder holds the lock on the trace file. Otherwise removes the file, unless
+// another process has already done so: the name may then belong to a new recorder.
 bool IsRecorded() {
     const UniqueFd trace = OpenFileAt(DeviceRoot(), kTraceFile, O_RDONLY);
     if (!trace.ok()) {
@@ -67,7 +67,7 @@ TraceEvent::~TraceEvent() {
     }
     const int error = errno;
     mLine += "}\n";
-    // Opened for every event: the file may be gone, and threads do not share a descriptor.
+    // Reopened for every event, because the file may have been removed.
     const UniqueFd file(OpenForAppending(kTraceFile, 0));
     const ssize_t written = write(file.get(), mLine.data(), mLine.size());
     if (written != static_cast<ssize_t>(mLine.size())) {

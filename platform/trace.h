@@ -1,11 +1,12 @@
-// A record of what the device's processes do. Tracing is on while a recorder holds a flock() on the
-// file `trace` in the device root. Every process appends its events, one JSON object a line:
+// A record of what the device's processes do. Tracing is on while a recorder holds a flock() lock
+// on the file `trace` in the device root. Every process appends its events, one JSON object per
+// line:
 //
 //   {"time":12.345678,"pid":7,"who":"tpd","what":"pause","us":100}
 //
-// "time" is when the event began, in seconds of CLOCK_MONOTONIC; the lines are in the order in
-// which events ended. A byte that is not printable ASCII is written as \u00XX. A process that
-// cannot append an event, for example on a full disk, removes the file's write permission.
+// "time" is the start of the event in seconds of CLOCK_MONOTONIC. Lines are in the order in which
+// events ended. Bytes other than printable ASCII are written as \u00XX. A process that cannot
+// append an event, for example on a full disk, makes the file read-only.
 #pragma once
 
 #include <cstdint>
@@ -14,16 +15,19 @@
 
 namespace host {
 
-// Whether tracing was on when this process last checked: at its first event or in LookForTrace().
+// Returns true if tracing was on at this process's last check, at its first event or in
+// LookForTrace().
 bool IsTraced();
 
-// Checks again, for processes that outlive one command. Removes the file of a killed recorder.
+// Checks again whether tracing is on, for long-running processes. Removes the file of a killed
+// recorder.
 void LookForTrace();
 
 // CLOCK_MONOTONIC in microseconds.
 int64_t MonotonicUs();
 
-// One event. The destructor appends it. Does nothing while tracing is off; preserves errno.
+// An event, which the destructor appends to the trace. Does nothing while tracing is off. Preserves
+// errno.
 class TraceEvent {
   public:
     explicit TraceEvent(const char* what);
@@ -33,7 +37,7 @@ class TraceEvent {
 
     TraceEvent& Add(const char* name, std::string_view value);
     TraceEvent& Add(const char* name, int64_t value);
-    // The bytes as hexadecimal digits.
+    // Adds the bytes as hexadecimal digits.
     TraceEvent& AddHex(const char* name, const uint8_t* bytes, size_t size);
 
   private:

@@ -1,4 +1,4 @@
-// The owner of a file descriptor.
+// Owns a file descriptor.
 #pragma once
 
 #include <unistd.h>
@@ -8,7 +8,7 @@
 
 namespace host {
 
-// Closes its descriptor, if any, and preserves errno.
+// Closes its descriptor when destroyed. Preserves errno.
 class UniqueFd {
   public:
     UniqueFd() = default;
@@ -23,7 +23,7 @@ class UniqueFd {
     int get() const { return mFd; }  // -1 when empty
     bool ok() const { return mFd >= 0; }
 
-    // Hands the descriptor to the caller, who closes it.
+    // Transfers the descriptor to the caller, who must close it.
     [[nodiscard]] int release() { return std::exchange(mFd, -1); }
 
     void reset(int fd = -1) {

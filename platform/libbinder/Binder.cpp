@@ -33,7 +33,7 @@ std::string ServiceName(const String16& name) {
     return {name.string(), name.string() + name.size()};
 }
 
-// The services are the sockets in the driver's directory.
+// Finds services as sockets in the driver's directory.
 class DriverServiceManager : public IServiceManager {
   public:
     sp<IBinder> getService(const String16& name) const override {
@@ -71,8 +71,8 @@ sp<ProcessState> ProcessState::initWithDriver(const char* driver) {
     if (gProcess == nullptr) {
         gProcess = new ProcessState(driver);
     } else if (gProcess->mDriver != driver) {
-        fprintf(stderr, "binder: the driver is %s already, not %s\n", gProcess->mDriver.c_str(),
-                driver);
+        fprintf(stderr, "binder: the driver is already %s; cannot use %s\n",
+                gProcess->mDriver.c_str(), driver);
         abort();
     }
     return gProcess;

@@ -25,8 +25,8 @@ uint8_t* Parcel::resize(size_t size) {
     return mData.data();
 }
 
-// Moves past the next `size` bytes and their padding, which may be missing at the end. Returns the
-// bytes, or null when fewer are left.
+// Consumes the next `size` bytes and their padding, which may be missing at the end. Returns the
+// bytes, or null if fewer are left.
 const uint8_t* Parcel::take(size_t size) const {
     if (size > mData.size() - mPosition) {
         return nullptr;

@@ -1,5 +1,5 @@
-// A binder driver in the device root: a published service is a socket in the driver's directory, a
-// proxy is a connection to one.
+// A binder driver in the device root: a published service is a socket in the driver's directory,
+// and a proxy is a connection to a service.
 #pragma once
 
 #include <sys/un.h>
@@ -15,12 +15,12 @@
 
 namespace host {
 
-// The size of the driver's receive buffer: 1 MiB less two pages. A request or a reply must fit into
+// The size of the driver's receive buffer: 1 MiB minus two pages. A request or reply must fit into
 // it, a one-way request into half of it.
 constexpr size_t kMaxTransactionBytes = (1 << 20) - 2 * 4096;
 constexpr size_t kMaxOneWayBytes = kMaxTransactionBytes / 2;
 
-// Returns a proxy of the service, or null when the service is not published or too busy to accept
+// Returns a proxy for the service, or null if the service is not published or too busy to accept
 // another client. `driver` is the driver's path on the device, `name` a file name of at most 64
 // bytes.
 android::sp<android::IBinder> ConnectService(const std::string& driver, const std::string& name);
@@ -28,32 +28,31 @@ android::sp<android::IBinder> ConnectService(const std::string& driver, const st
 // Returns a proxy over a connected socket.
 android::sp<android::IBinder> NewProxy(UniqueFd connection);
 
-// Publishes a binder of this process, replaces an earlier one of that name, and serves its clients
-// on other threads. Returns 0 or a negative status.
+// Publishes a binder of this process, replacing any earlier one of that name, and serves its
+// clients on other threads. Returns 0 or a negative status.
 android::status_t PublishService(const std::string& driver, const std::string& name,
                                  const android::sp<android::IBinder>& binder);
 
-// A request of a proxy: this header and `size` parcel bytes. All numbers are in the machine's byte
-// order.
+// A request: this header, then `size` bytes of parcel. Numbers are in the machine's byte order.
 struct RequestHeader {
     uint32_t code;
     uint32_t flags;
     uint32_t size;
 };
 
-// A service's reply to a two-way request: this header and `size` parcel bytes.
+// A service's reply to a two-way request: this header, then `size` bytes of parcel.
 struct ReplyHeader {
     int32_t status;
     uint32_t size;
 };
 
-// Sends all these bytes. False when the peer is gone.
+// Sends all bytes. Returns false if the peer is gone.
 bool Send(const UniqueFd& connection, const std::string& bytes);
 
-// Receives exactly `size` bytes. False when the peer hangs up first.
+// Receives exactly `size` bytes. Returns false if the peer hangs up first.
 bool Receive(const UniqueFd& connection, void* buffer, size_t size);
 
-// Sends a header, completed with the parcel's size, and the parcel. False when the peer is gone.
+// Sets the header's size and sends the header and the parcel. Returns false if the peer is gone.
 template <typename Header>
 bool SendMessage(const UniqueFd& connection, Header header, const android::Parcel& parcel) {
     header.size = static_cast<uint32_t>(parcel.dataSize());
@@ -62,19 +61,19 @@ bool SendMessage(const UniqueFd& connection, Header header, const android::Parce
     return Send(connection, message);
 }
 
-// Receives a header and its parcel. False when the peer hangs up first or the parcel does not fit
-// into the driver's buffer; then the connection is unusable.
+// Receives a header and its parcel. If the peer hangs up first or the parcel exceeds the driver's
+// buffer, the connection becomes unusable and the function returns false.
 template <typename Header>
 bool ReceiveMessage(const UniqueFd& connection, Header* header, android::Parcel* parcel) {
     return Receive(connection, header, sizeof(Header)) && header->size <= kMaxTransactionBytes &&
            Receive(connection, parcel->resize(header->size), header->size);
 }
 
-// A new, unconnected socket.
+// Returns a new, unconnected socket.
 UniqueFd NewSocket();
 
-// The address of the file `name` in the directory `fd`; without a name, of the file `fd` itself.
-// The length of the device root's path does not matter.
+// Returns the address of the socket `name` in the directory `fd` or, without a name, of the socket
+// `fd`. The path of the device root may be longer than a socket address.
 sockaddr_un Address(const UniqueFd& fd, const std::string& name = "");
 
 }  // namespace host

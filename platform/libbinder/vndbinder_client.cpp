@@ -23,7 +23,7 @@ namespace {
 // reply.
 constexpr uint32_t kAcceptFds = 0x10;
 
-// A client's proxy of one service. Not thread-safe.
+// A client's proxy for a service. Not thread-safe.
 class RemoteBinder : public IBinder {
   public:
     explicit RemoteBinder(UniqueFd connection) : mConnection(std::move(connection)) {}
@@ -90,7 +90,7 @@ class RemoteBinder : public IBinder {
         return std::min<status_t>(header.status, android::OK);
     }
 
-    // Notifies the recipients, once, on this thread.
+    // Notifies each recipient once, on this thread.
     status_t OwnerDied() {
         const TraceEvent event("binder_died");
         mConnection.reset();
@@ -115,7 +115,7 @@ sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
     const UniqueFd service(openat(directory.get(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
     const sockaddr_un address = Address(service);
     UniqueFd connection = NewSocket();
-    // Does not wait for a busy service; the next lookup may reach it.
+    // Do not wait for a busy service; a later lookup may reach it.
     fcntl(connection.get(), F_SETFL, O_NONBLOCK);
     if (connect(connection.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) !=
         0) {

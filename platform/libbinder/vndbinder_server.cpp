@@ -27,12 +27,13 @@ namespace host {
 namespace {
 
 constexpr std::chrono::milliseconds kRetryPause(10);
-// The kernel closes the descriptors of a dying process from the highest down. The listener is above
-// the connections, so a client whose call fails cannot find it again, as with a real driver.
+// The kernel closes a dying process's descriptors from the highest down. The listener must be
+// closed before the connections: a client whose call fails must not connect to the dying process
+// again.
 constexpr int kListenerDescriptor = 900;
 
-// Runs `work` on a detached thread. Retries until the system can make one; std::thread would abort
-// the process instead.
+// Runs `work` on a detached thread. Retries if no thread can be created; std::thread would abort
+// the process.
 template <typename Work>
 void StartThread(Work work) {
     const auto run = [](void* argument) -> void* {
@@ -72,8 +73,8 @@ class Service {
         mHasCalls.notify_one();
     }
 
-    // Executes the one-way calls of all clients in sequence, in the order of their arrival. Two-way
-    // calls do not wait for them. Never returns.
+    // Executes the one-way calls of all clients one at a time, in order of arrival. Two-way calls
+    // do not wait for them. Never returns.
     [[noreturn]] void Drain() {
         std::unique_lock<std::mutex> lock(mMutex);
         for (;;) {
@@ -95,7 +96,7 @@ class Service {
     std::deque<Request> mCalls;
 };
 
-// Replaces the socket of an earlier service of that name, but no other kind of file.
+// Replaces the socket of an earlier service, but no other kind of file.
 bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::string& name) {
     struct stat old = {};
     if (fstatat(directory.get(), name.c_str(), &old, AT_SYMLINK_NOFOLLOW) == 0 &&
@@ -108,7 +109,7 @@ bool Listen(const UniqueFd& listener, const UniqueFd& directory, const std::stri
            listen(listener.get(), SOMAXCONN) == 0;
 }
 
-// Serves one client until it hangs up or sends something that is not a request.
+// Serves one client until it hangs up or sends an invalid request.
 void ServeClient(const UniqueFd& connection, Service* service) {
     for (;;) {
         Request request;

@@ -1,4 +1,4 @@
-// Every property is a file: properties/KEY in the device root contains the value.
+// Properties are files: properties/KEY in the device root contains the value of KEY.
 #include <sys/system_properties.h>
 
 #include <fcntl.h>
@@ -24,7 +24,7 @@ bool IsLegalName(const std::string& name) {
            name.find_first_not_of(kLegal) == std::string::npos;
 }
 
-// Whether the value is valid UTF-8, without overlong forms and surrogates.
+// Returns true if the value is valid UTF-8, without overlong forms or surrogates.
 bool IsUtf8(const std::string& value) {
     int following = 0;  // continuation bytes that the character still needs
     int least = 0;      // the range of the next one
@@ -50,7 +50,7 @@ bool IsUtf8(const std::string& value) {
     return following == 0;
 }
 
-// Whether the owner's write permission is missing. Then not even root may write the property.
+// Returns true if the owner has no write permission. Then even root cannot write the property.
 bool IsWriteProtected(int properties, const std::string& name) {
     struct stat status = {};
     return fstatat(properties, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&

@@ -5,7 +5,7 @@
 
 namespace host {
 
-// Returns the rule that the name or the value breaks, as a sentence, or nullptr.
+// Returns a sentence that says why the name or the value is invalid, or nullptr if both are valid.
 const char* BrokenPropertyRule(const std::string& name, const std::string& value);
 
 }  // namespace host

@@ -1,5 +1,5 @@
-// C library calls that the linker redirects here (--wrap): the device implements some itself and
-// traces the others.
+// C library calls that the linker redirects here (--wrap). fopen() opens the device's kernel
+// command line; the others are traced.
 #include <fcntl.h>
 #include <unistd.h>
 
@@ -20,7 +20,7 @@ int __real_system(const char* command);
 FILE* __real_popen(const char* command, const char* mode);
 int __real_pclose(FILE* stream);
 
-// The kernel command line in the device root, otherwise the machine's.
+// Opens the kernel command line in the device root if there is one, otherwise the machine's.
 FILE* __wrap_fopen(const char* path, const char* mode) {
     if (strcmp(path, "/proc/cmdline") != 0 || host::DeviceRoot() < 0) {
         return __real_fopen(path, mode);
@@ -42,7 +42,7 @@ int __wrap_system(const char* command) {
     return status;
 }
 
-// The event of the open pipe. The tool opens one at a time, on its only thread.
+// The event of the open pipe. The tool is single-threaded and opens one pipe at a time.
 static std::optional<host::TraceEvent> gPipe;
 
 FILE* __wrap_popen(const char* command, const char* mode) {

@@ -1,4 +1,4 @@
-// Sends the messages of the platform's own liblog to the device root's log, as log.cpp does.
+// Redirects the platform's own liblog to the device root's log.
 #include <android/log.h>
 
 #include "platform/log_file.h"
@@ -9,7 +9,6 @@ void AppendMessage(const __android_logger_data* data, const char* message) {
     host::AppendLogEntry(data->priority, data->tag, message);
 }
 
-// Runs before main.
 [[gnu::constructor]] void SetLogger() { __android_log_set_logger(AppendMessage); }
 
 }  // namespace

@@ -1,11 +1,11 @@
-// Host implementation of the platform's binder objects on the service side of a call.
+// Host implementation of the platform's local binder object.
 #pragma once
 
 #include <binder/IBinder.h>
 
 namespace android {
 
-// A binder of this process. Calls from several threads arrive at once.
+// A binder of this process. Calls may arrive on several threads at once.
 class BBinder : public IBinder {
   public:
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags = 0) final {

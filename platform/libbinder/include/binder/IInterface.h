@@ -1,4 +1,4 @@
-// Host implementation of the platform's bases of binder interfaces.
+// Host implementation of the platform's base classes of binder interfaces.
 #pragma once
 
 #include <binder/IBinder.h>
@@ -7,7 +7,7 @@ namespace android {
 
 class IInterface : public virtual RefBase {};
 
-// Client side: the interface on a remote binder, to which it keeps a reference.
+// The client side of an interface. Holds a reference to the remote binder.
 template <typename INTERFACE>
 class BpInterface : public INTERFACE {
   public:

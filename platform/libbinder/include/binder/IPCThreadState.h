@@ -1,4 +1,4 @@
-// Host implementation of the platform's serving threads.
+// Host implementation of the platform's binder threads.
 #pragma once
 
 #include <unistd.h>

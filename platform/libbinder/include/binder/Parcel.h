@@ -1,4 +1,4 @@
-// Host implementation of the platform's message buffer, with the same bytes as on the wire.
+// Host implementation of the platform's message buffer, identical on the wire.
 #pragma once
 
 #include <cstddef>
@@ -22,8 +22,8 @@ class Parcel {
     size_t dataPosition() const { return mPosition; }
     void setDataPosition(size_t position) const;
 
-    // Sets the size of the content and returns the content for the caller to fill. A host
-    // extension: it lets a transport receive without another copy.
+    // Resizes the content and returns it for the caller to fill. A host extension that saves the
+    // transport a copy.
     uint8_t* resize(size_t size);
 
     // Writers return 0, or BAD_VALUE for a null string.
@@ -31,11 +31,11 @@ class Parcel {
     status_t writeInt32(int32_t value);
     status_t writeCString(const char* text);
 
-    // Whether the next value is the token of this interface.
+    // Returns true if the next value is the token of this interface.
     bool enforceInterface(const String16& interface) const;
-    // The next number; 0 at the end.
+    // Returns the next number, or 0 at the end.
     int32_t readInt32() const;
-    // The next string, which the parcel owns; null when no terminator is left.
+    // Returns the next string, owned by the parcel, or null if it is not terminated.
     const char* readCString() const;
 
   private:
@@ -43,7 +43,7 @@ class Parcel {
     const uint8_t* take(size_t size) const;
 
     std::vector<uint8_t> mData;
-    mutable size_t mPosition = 0;  // always at most the size
+    mutable size_t mPosition = 0;  // at most the size
 };
 
 }  // namespace android

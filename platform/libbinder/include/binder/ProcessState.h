@@ -9,11 +9,12 @@ namespace android {
 
 class ProcessState : public virtual RefBase {
   public:
-    // The process's only instance, on "/dev/binder" unless initWithDriver() came first.
+    // Returns the process's only instance, for "/dev/binder" unless initWithDriver() was called
+    // first.
     static sp<ProcessState> self();
 
-    // Chooses the driver: the directory of this path in the device root. A later call with another
-    // path aborts the process.
+    // Selects the driver, a directory in the device root. A later call with another path aborts the
+    // process.
     static sp<ProcessState> initWithDriver(const char* driver);
 
     const std::string& getDriverName() const { return mDriver; }

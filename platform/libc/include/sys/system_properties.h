@@ -8,11 +8,11 @@ extern "C" {
 #endif
 
 // Copies the value, at most 91 bytes and a terminator, into a buffer of PROP_VALUE_MAX bytes and
-// returns its length. The empty string and 0 when the property is unset or cannot be read.
+// returns its length. If the property is unset or unreadable, the value is empty.
 int __system_property_get(const char* name, char* value);
 
-// Returns 0 when the value is stored. -1 for a name or value that the platform rejects, for a "ro."
-// property that has a value already, and when the file cannot be written.
+// Returns 0 on success, or -1 if the name or value is invalid, a "ro." property is already set, or
+// the file cannot be written.
 int __system_property_set(const char* name, const char* value);
 
 #ifdef __cplusplus

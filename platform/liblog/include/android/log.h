@@ -1,4 +1,4 @@
-// Host implementation of the platform's log interface: lines go to the device root's log.
+// Host implementation of the platform's log interface: entries go to the device root's log.
 #pragma once
 
 typedef enum android_LogPriority {
@@ -17,8 +17,8 @@ typedef enum android_LogPriority {
 extern "C" {
 #endif
 
-// Writes one entry, cut after 1023 bytes as on the device. A null tag shows as the program's name.
-// Returns the number of bytes written to the log, or a negative errno value.
+// Writes one entry, truncated to 1023 bytes as on a device. A null tag is replaced by the program's
+// name. Returns the number of bytes written to the log, or a negative errno value.
 int __android_log_print(int priority, const char* tag, const char* format, ...)
         __attribute__((format(printf, 3, 4)));
 

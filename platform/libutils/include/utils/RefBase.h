@@ -1,4 +1,4 @@
-// Host implementation of the platform's reference-counted base and weak references to it.
+// Host implementation of the platform's reference-counted base class and weak references.
 #pragma once
 
 #include <memory>
@@ -7,7 +7,7 @@
 
 namespace android {
 
-// The last strong reference destroys the object.
+// The object is destroyed with its last strong reference.
 class RefBase : public std::enable_shared_from_this<RefBase> {
   public:
     RefBase(const RefBase&) = delete;
@@ -18,7 +18,7 @@ class RefBase : public std::enable_shared_from_this<RefBase> {
     RefBase() = default;
 };
 
-// A weak reference, empty or to an object that has a strong reference at that time.
+// A weak reference. When it is constructed, the object must have a strong reference.
 template <typename T>
 class wp : public std::weak_ptr<T> {
   public:
@@ -27,7 +27,7 @@ class wp : public std::weak_ptr<T> {
     template <typename U>
     wp(const sp<U>& object) : std::weak_ptr<T>(object) {}  // NOLINT(google-explicit-constructor)
 
-    // A strong reference; null when the object has been destroyed.
+    // Returns a strong reference, or null if the object has been destroyed.
     sp<T> promote() const { return this->lock(); }
 
     bool operator==(const wp& other) const {

@@ -11,14 +11,14 @@ class String16 {
     explicit String16(const char* ascii) : mText(ascii, ascii + strlen(ascii)) {}
     String16(const char16_t* text, size_t size) : mText(text, size) {}
 
-    const char16_t* string() const { return mText.c_str(); }  // ends with a zero unit
+    const char16_t* string() const { return mText.c_str(); }  // zero-terminated
     size_t size() const { return mText.size(); }              // code units
 
   private:
     std::u16string mText;
 };
 
-// A constant, to construct String16 objects from. On a device it needs no heap storage.
+// A constant String16. On a device, it needs no heap storage.
 template <size_t N>
 class StaticString16 : public String16 {
   public:

@@ -7,7 +7,7 @@ namespace android {
 
 class RefBase;
 
-// Unlike a std::shared_ptr, it can be made from the same raw pointer more than once.
+// Unlike std::shared_ptr, it can be constructed from the same raw pointer more than once.
 template <typename T>
 class sp : public std::shared_ptr<T> {
   public:
