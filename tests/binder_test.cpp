@@ -19,7 +19,7 @@ const Call kNotFound = UntaggedLog(ERROR, "ThpGetBinder, failed to get binder se
 const Call kNewRecipient = UntaggedLog(ERROR, "enter");
 const Call kLinked = UntaggedLog(ERROR, "ThpGetBinder ret = 0");
 
-// The bytes of a value in a parcel.
+// These functions return the bytes of a value in a parcel.
 std::string Padded(std::string bytes) {
     bytes.resize((bytes.size() + 3) / 4 * 4);
     return bytes;
@@ -31,7 +31,7 @@ std::string Utf16(const std::u16string& text) {
     return Padded({reinterpret_cast<const char*>(text.c_str()), bytes});
 }
 
-TEST_F(BinderTest, WritesTheRequestInTheDaemonsFormat) {
+TEST_F(BinderTest, EncodesTheRequestForTheDaemon) {
     RunCmdParms("[TPD]TSA_ExecuteCommand", "captest");
     const std::string strictMode = Int32(INT32_MIN);
     const std::string workSource = Int32(-1);
@@ -42,7 +42,7 @@ TEST_F(BinderTest, WritesTheRequestInTheDaemonsFormat) {
     EXPECT_EQ(device.request, strictMode + workSource + "RDNV" + descriptor + command + parameters);
 }
 
-TEST_F(BinderTest, SendsMarkedCommandsTwoWayAndNamedOnesOneWay) {
+TEST_F(BinderTest, SendsOnlyUnmarkedListedCommandsOneWay) {
     const struct {
         const char* command;
         const char* parameters;
@@ -63,7 +63,7 @@ TEST_F(BinderTest, SendsMarkedCommandsTwoWayAndNamedOnesOneWay) {
     EXPECT_EQ(device.calls({kLog}).back(), UntaggedLog(ERROR, "Async"));
 }
 
-TEST_F(BinderTest, SendsThePhonesThpCommandsOneWay) {
+TEST_F(BinderTest, ListsThePhonesCommandsAsOneWay) {
     std::vector<std::string> names = Split(TPD_DAEMON_COMMANDS, " ");
     names.erase(std::find(names.begin(), names.end(), "TSA_ExecuteCommand"), names.end());
     EXPECT_EQ(g_asyncThpCmds, names);
@@ -134,7 +134,7 @@ TEST_F(BinderTest, StoresAScreenStateBeforeTheLookup) {
                             Write("odm.thp.screen_status", "a version:3+whole,1")));
 }
 
-TEST_F(BinderTest, GivesUpAScreenStateAfterSixRejectedWrites) {
+TEST_F(BinderTest, GivesUpStoringAScreenStateAfterSixRejectedWrites) {
     device.rejectedWrites = {"odm.thp.screen_status"};
     StoreScreenState("version:3+main");
     EXPECT_THAT(device.calls({kRead, kWrite}), SizeIs(12));

@@ -21,7 +21,7 @@ TEST(StringPairParserTest, KeepsTheFirstValueOfAKey) {
     EXPECT_THAT(std::vector({a, b, c}), ElementsAre("1", "3", " 5"));
 }
 
-TEST(StringPairParserTest, IgnoresFieldsThatAreNotPairs) {
+TEST(StringPairParserTest, IgnoresInvalidPairs) {
     StringPairParser pairs;
     pairs.Init("flag quiet= =value x=y=z", " ", "=");
     std::string value = "before";
@@ -33,7 +33,7 @@ TEST(StringPairParserTest, IgnoresFieldsThatAreNotPairs) {
     EXPECT_FALSE(pairs.GetIntValue("x", number));
 }
 
-TEST(StringPairParserTest, ReadsNumbersWithinTheRangeOfInt) {
+TEST(StringPairParserTest, AcceptsOnlyNumbersWithinTheRangeOfInt) {
     constexpr int kBefore = 99;
     const struct {
         const char* text;
@@ -81,7 +81,7 @@ TEST_F(CmdLineTest, ReportsTheBootMode) {
     }
 }
 
-TEST_F(CmdLineTest, ReadsTheFirstLineUpToItsLimitAndClosesTheFile) {
+TEST_F(CmdLineTest, ReadsTheFirstLineUpToTheLimitAndClosesTheFile) {
     device.kernelCommandLine = "first\nsecond";
     EXPECT_EQ(CmdLine::GetCmdLine(), "first");
     device.kernelCommandLine = std::string(9000, 'x');

@@ -1,7 +1,7 @@
 """Fixtures: a virtual device, running or stopped
 
-TPD_BUILD_DIR names the build under test. TPD_COMMAND names another tool to drive on its device,
-for example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK selects the long forms, too. TPD_SEED
+TPD_BUILD_DIR is the build to test. TPD_COMMAND is the command that runs the tool, if it is not the
+build's, for example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK adds the long tests. TPD_SEED
 repeats the choices of a random test, which prints its seed.
 """
 import os
@@ -35,7 +35,7 @@ def chance():
 
 @pytest.fixture
 def stopped_device(build):
-    """A device that was never started and has no root yet. Removed after the test."""
+    """A device that has never been started. Its root does not exist yet."""
     tool = shlex.split(os.environ.get("TPD_COMMAND", f"{build}/tpd"))
     with tempfile.TemporaryDirectory(prefix="tpd-") as directory:
         device = Device(pathlib.Path(directory), build, tool)
@@ -46,7 +46,7 @@ def stopped_device(build):
 
 @pytest.fixture
 def device(stopped_device):
-    """A running device, with tracing on, that forwards commands."""
+    """A running device that forwards commands, with tracing on."""
     stopped_device.start_tracing()
     stopped_device.start()
     stopped_device.setprop(PERMISSIVE, "true")

@@ -1,5 +1,5 @@
-# The product's front end on the fake device, for the unit tests and the fuzz targets. Its main is
-# called like any function; the linker redirects the C library's calls to the fake device.
+# The tool on the fake device, for unit tests and fuzz targets. They call its main() as tpd_main().
+# The linker redirects C library calls to the fake device.
 include_guard(GLOBAL)
 
 add_library(tpd_front_end STATIC ${PROJECT_SOURCE_DIR}/main/TpdMain.cpp)
@@ -7,13 +7,13 @@ export_headers(tpd_front_end main)
 target_compile_definitions(tpd_front_end PRIVATE main=tpd_main)
 target_link_libraries(tpd_front_end PUBLIC tpd_daemon PRIVATE tpd_build_options)
 
-# An object library: the linker takes its definitions of the platform's calls before it looks into
-# the archives of the virtual device.
+# An object library: its definitions of the platform's functions take precedence over those in the
+# virtual device's archives.
 add_library(fake_device OBJECT ${CMAKE_CURRENT_LIST_DIR}/fake_device.cpp)
 export_headers(fake_device tests)
 target_link_libraries(
     fake_device
     PUBLIC tpd_front_end tpd_log device_files wrapped_calls
     PRIVATE tpd_build_options)
-# It counts the streams that the tool closes.
+# The fake device tracks the open streams.
 target_link_options(fake_device INTERFACE -Wl,--wrap=fclose)

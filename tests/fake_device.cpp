@@ -164,7 +164,7 @@ void* operator new(size_t size, const std::nothrow_t& /* tag */) noexcept {
     return fails ? nullptr : operator new(size);
 }
 
-// The linker redirects the C library's calls here.
+// The linker redirects these C library calls here (--wrap).
 extern "C" {
 
 FILE* __real_fopen(const char* path, const char* mode);

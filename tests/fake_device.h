@@ -1,5 +1,4 @@
-// A device in memory. It implements the calls that the tool makes to the platform and to the C
-// library, and records them.
+// A device in memory. It implements and records the tool's calls to the platform and the C library.
 #pragma once
 
 #include <android/log.h>
@@ -17,8 +16,7 @@
 
 namespace test {
 
-// A recorded call: the function and its arguments. The functions below make the calls that a test
-// expects.
+// A recorded call: the function and its arguments. The functions below construct expected calls.
 using Call = std::pair<std::string, std::string>;
 
 constexpr char kRead[] = "Read", kWrite[] = "Write", kLog[] = "Log", kPause[] = "Pause",
@@ -46,7 +44,7 @@ inline Call Pause(std::chrono::microseconds time) {
 }
 inline Call Shell(const std::string& command) { return {kShell, command}; }
 
-// A service is numbered by the lookup that found it.
+// Services are numbered in the order in which they are found.
 inline Call GetService() { return {kGetService, "service.corvaneinterfaceservice"}; }
 inline Call LinkToDeath(int service) { return {kLinkToDeath, std::to_string(service)}; }
 inline Call UnlinkToDeath(int service) { return {kUnlinkToDeath, std::to_string(service)}; }
@@ -55,13 +53,14 @@ inline Call UnlinkToDeath(int service) { return {kUnlinkToDeath, std::to_string(
 inline Call Transact(const std::string& request) { return {kTransact, request}; }
 inline Call TransactOneWay(const std::string& request) { return {kTransactOneWay, request}; }
 
-// What the daemon answers to a call.
+// The daemon's answer to a call.
 struct Answer {
     android::status_t status = android::OK;
     const char* text = "answer";  // null: the reply has no text
 };
 
-// A device with a living daemon, and the tool's process state before main. One instance at a time.
+// A device whose daemon is alive. The constructor resets the tool's global variables, so only one
+// instance can exist at a time.
 class FakeDevice {
   public:
     FakeDevice();
@@ -73,24 +72,24 @@ class FakeDevice {
             {"odm.thp.dae_reboot_times", "0"},
             {"odm.thp.is_updating_fw", "false"},
     };
-    std::set<std::string> rejectedWrites;               // writes to these properties are rejected
-    std::optional<std::string> kernelCommandLine = "";  // nullopt: cannot be opened
+    std::set<std::string> rejectedWrites;                   // properties that reject writes
+    std::optional<std::string> kernelCommandLine = "";      // nullopt: cannot be opened
     std::optional<std::string> getenforce = "Enforcing\n";  // its output; nullopt: cannot be run
-    int getenforceStatus = 0;                               // what closing its output returns
-    int failingAllocation = 0;  // the nothrow allocation that fails, counted from 1
-    std::deque<bool> lookups;   // whether they find the service; later ones do
-    // The answers to the first calls; later calls get the default. DEAD_OBJECT first notifies the
-    // service's death recipient.
+    int getenforceStatus = 0;                               // what pclose() returns
+    int failingAllocation = 0;  // the nothrow allocation that fails, from 1; 0: none
+    std::deque<bool> lookups;   // results of the first lookups; later ones succeed
+    // Answers to the first calls; later calls get the default answer. DEAD_OBJECT also notifies the
+    // death recipient.
     std::deque<Answer> answers;
-    // The property that changes during a call, and its new value.
+    // Properties that change during a call, and their new values.
     std::map<Call, std::pair<std::string, std::string>> changes;
 
-    // The recorded calls of these functions, or of all when none is named.
+    // Returns the recorded calls of these functions, or all calls if none is named.
     std::vector<Call> calls(const std::set<std::string>& functions = {}) const;
     std::string request;          // the bytes of the last call's parcel
-    std::set<FILE*> openStreams;  // of the kernel command line and of getenforce
+    std::set<FILE*> openStreams;  // the kernel command line and getenforce
 
-    // For the redirected functions.
+    // Used by the redirected functions.
     void Record(const Call& call);
     int servicesFound = 0;
 

@@ -6,7 +6,7 @@ namespace test {
 
 using LogTest = DeviceTest;
 
-// Also writes debug lines and keeps messages in memory.
+// A log that also writes debug lines and keeps messages in memory.
 class DebugLog : public LogBase {
   public:
     DebugLog() : LogBase("debug") {}
@@ -38,7 +38,7 @@ TEST_F(LogTest, WritesAnEmptyMessage) {
     EXPECT_THAT(device.calls(), ElementsAre(Log(INFO, "f[1] ")));
 }
 
-TEST_F(LogTest, ReportsAMessageThatIsTooLong) {
+TEST_F(LogTest, TruncatesAndReportsAnOverlongMessage) {
     const std::string longest(2047, 'x');
     gSysLog.Printf(LOG_INFO, "f", 1, "%s", longest.c_str());
     gSysLog.Printf(LOG_INFO, "f", 2, "%sy", longest.c_str());

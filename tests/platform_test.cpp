@@ -1,4 +1,4 @@
-// The host implementation of the platform, on this process's own device root.
+// Tests of the host implementation of the platform, on a temporary device root.
 #include <binder/Binder.h>
 #include <binder/Parcel.h>
 #include <fcntl.h>
@@ -34,13 +34,13 @@ const struct TemporaryRoot {
     std::string path = testing::TempDir() + "tpd-XXXXXX";
 } kRoot;
 
-// Exits with 0 when this root is refused; for a death test's child process.
+// For death tests: exits with 0 if DeviceRoot() refuses this root.
 void ExpectRefusal(const std::string& root) {
     setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
     _exit(host::DeviceRoot() == -1 ? 0 : 1);
 }
 
-TEST(DeviceRootDeathTest, RefusesDirectoriesThatAreNotPrivate) {
+TEST(DeviceRootDeathTest, RefusesUnsafePaths) {
     const std::string directory = kRoot.path + "/directory";
     const std::string link = kRoot.path + "/link";
     std::filesystem::create_directory(directory);
@@ -56,7 +56,7 @@ TEST(DeviceRootDeathTest, RefusesDirectoriesThatAreNotPrivate) {
     }
 }
 
-TEST(DeviceRootDeathTest, RefusesUnmarkedDirectoriesWithFiles) {
+TEST(DeviceRootDeathTest, RefusesUnmarkedNonEmptyDirectories) {
     const std::string root = kRoot.path + "/other";
     std::filesystem::create_directory(root);
     chmod(root.c_str(), 0700);
@@ -77,7 +77,7 @@ TEST(DeviceRootPathTest, DefaultsToTheStateDirectory) {
     setenv("TPD_DEVICE_ROOT", kRoot.path.c_str(), 1);
 }
 
-TEST(FilesTest, RefusesLinks) {
+TEST(FilesTest, RefusesSymbolicLinks) {
     const std::string outside = kRoot.path + "-outside";
     std::filesystem::create_directory(outside);
     std::ofstream(outside + "/file");
@@ -118,7 +118,7 @@ TEST(PropertiesTest, RejectsWritesToReadOnlyProperties) {
     EXPECT_FALSE(SetProperty("protected", "2"));
 }
 
-TEST(ParcelTest, RejectsAnInterfaceNameOfTheSameLength) {
+TEST(ParcelTest, RejectsAnotherInterfaceNameOfTheSameLength) {
     Parcel request;
     request.writeInterfaceToken(android::String16("interface.a"));
     EXPECT_FALSE(request.enforceInterface(android::String16("interface.b")));
@@ -126,7 +126,8 @@ TEST(ParcelTest, RejectsAnInterfaceNameOfTheSameLength) {
     EXPECT_TRUE(request.enforceInterface(android::String16("interface.a")));
 }
 
-// Gets calls from two clients. A call's code is twice its number, plus 1 for the second client.
+// Checks the order of calls from two clients. A call's code is twice its sequence number, plus 1
+// for the second client.
 class OneWayService : public android::BBinder {
   public:
     std::atomic<uint32_t> calls[2] = {};
@@ -144,7 +145,7 @@ class OneWayService : public android::BBinder {
     }
 };
 
-TEST(ServiceTest, IsNotFoundThroughALink) {
+TEST(ServiceTest, IsNotFoundThroughASymbolicLink) {
     EXPECT_EQ(host::PublishService(kDriver, "target", new OneWayService), android::OK);
     std::filesystem::create_symlink("target", kRoot.path + kDriver + "/link");
     EXPECT_NE(host::ConnectService(kDriver, "target"), nullptr);
@@ -166,7 +167,7 @@ TEST(ServiceTest, ExecutesOneWayCallsInSequence) {
     EXPECT_EQ(service->misplaced, 0);
 }
 
-// A proxy, and the other end of its connection.
+// A proxy and the service's end of its connection.
 class ProxyTest : public testing::Test {
   protected:
     ProxyTest() {

@@ -13,7 +13,7 @@ class PropertyTest : public DeviceTest {
     std::string value = "before";
 };
 
-TEST_F(PropertyTest, ReadsAnEmptyPropertyASecondTime) {
+TEST_F(PropertyTest, RereadsAnEmptyProperty) {
     device.changes[Pause(100us)] = {"k", "y"};
     EXPECT_EQ(property.Get("k", value, "default"), 1);
     EXPECT_EQ(value, "y");
@@ -38,12 +38,12 @@ TEST_F(PropertyTest, GivesUpAfterSixRejectedWrites) {
     EXPECT_EQ(device.calls().back(), Pause(100us));
 }
 
-TEST_F(PropertyTest, WritesTheInputTriggerWithoutALogLine) {
+TEST_F(PropertyTest, DoesNotLogWritesOfTheInputTrigger) {
     property.Set("odm.thp.trigger_input", "1");
     EXPECT_THAT(device.calls({kWrite, kLog}), ElementsAre(Write("odm.thp.trigger_input", "1")));
 }
 
-TEST_F(PropertyTest, FindsARowByItsExactAlias) {
+TEST_F(PropertyTest, FindsItemsByExactAlias) {
     EXPECT_EQ(property.GetItem("Rotate").key, "odm.thp.rotate");
     EXPECT_EQ(property.GetItem("rotate").alias, "VerSys");
 }
@@ -84,7 +84,7 @@ TEST_F(PropertyTest, OnlyTrueAndOneSetAFlag) {
     }
 }
 
-TEST_F(PropertyTest, ReadsTheUserTypeWithinTheRangeOfInt) {
+TEST_F(PropertyTest, AcceptsOnlyUserTypesWithinTheRangeOfInt) {
     constexpr int kBefore = 99;
     const struct {
         const char* text;

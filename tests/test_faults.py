@@ -1,4 +1,4 @@
-"""The tool with a faulty daemon or unusable output, and the daemon with another client"""
+"""Faults of the daemon, of the tool's output and of clients"""
 import signal
 import socket
 import struct
@@ -31,7 +31,7 @@ def test_fault_has_its_documented_result(device, fault, text, dies):
     wait_until(lambda: bool(device.events("daemon_exit")) == dies)
 
 
-def test_daemon_sends_no_reply_larger_than_the_receive_buffer(device):
+def test_oversized_reply_fails_the_call_but_keeps_the_connection(device):
     device.fault("huge 1040384 1")
     assert device.tpd("captest") == PASS
     assert device.events("binder_died") == []
@@ -63,7 +63,7 @@ OUTPUTS = {
 
 
 @pytest.mark.parametrize("redirection", OUTPUTS.values(), ids=OUTPUTS)
-def test_sends_the_command_when_output_fails(device, redirection):
+def test_sends_the_command_even_if_output_fails(device, redirection):
     script = f'exec {redirection}; "$@"'
     device.output("bash", "-c", script, "bash", *device.tool, "captest")
     assert len(device.events("command")) == 1

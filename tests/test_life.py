@@ -11,12 +11,12 @@ from virtual_device import PASS, PERMISSIVE, Device, wait_until
 
 @pytest.fixture
 def device(stopped_device):
-    """A stopped device; the tests here start it themselves."""
+    """A stopped device; these tests start it themselves."""
     return stopped_device
 
 
 def in_parallel(device, commands):
-    """Runs `device COMMAND` for all of the commands at once."""
+    """Runs `device COMMAND` for all commands concurrently."""
     runs = [["device", *command.split()] for command in commands]
     with concurrent.futures.ThreadPoolExecutor(len(runs)) as pool:
         return list(pool.map(lambda run: device.run(*run), runs))
@@ -83,7 +83,7 @@ def test_reboot_keeps_persistent_properties_only(device):
     assert device.output("getenforce") == "Enforcing\n"
 
 
-def test_device_stays_in_a_renamed_root(device, build, tmp_path):
+def test_device_keeps_running_when_its_root_is_renamed(device, build, tmp_path):
     device.start()
     moved = Device(tmp_path, build, device.tool)
     device.root.rename(moved.root)
@@ -116,7 +116,7 @@ def test_second_init_fails(device, build):
     assert len(device.processes("/init")) == 1
 
 
-def test_tells_a_stopped_device(device):
+def test_reports_a_stopped_device(device):
     device.output("device", "root")
     assert "device is stopped" in device.run("device", "shell", "true").stderr
     assert device.run("device", "status").returncode == 3

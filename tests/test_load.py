@@ -1,4 +1,4 @@
-"""Many clients at once, on a steady and on a faulty device"""
+"""Many concurrent clients, with and without faults"""
 import concurrent.futures
 import os
 import time
@@ -11,14 +11,14 @@ COMMANDS = [300, pytest.param(9000, marks=pytest.mark.soak)]
 
 
 def run_clients(commands, check):
-    """Runs 16 clients that check the commands with different parameters."""
+    """Calls `check` with as many different parameters, from 16 threads."""
     states = [f"version:3+main,{number},{number}" for number in range(commands)]
     with concurrent.futures.ThreadPoolExecutor(16) as pool:
         list(pool.map(check, states))
 
 
 def descriptors(device):
-    """The number of open descriptors of every process."""
+    """Returns the number of open descriptors of each process."""
     return {process: len(os.listdir(f"/proc/{process}/fd")) for process in device.processes()}
 
 

@@ -1,4 +1,4 @@
-"""The files shipped with the program, and their agreement with it"""
+"""The packages, completions, manuals and pages"""
 import re
 import stat
 import subprocess
@@ -30,7 +30,7 @@ def source(path):
 
 @pytest.fixture(scope="session")
 def installed(build, tmp_path_factory):
-    """The root directory below which both packages are unpacked"""
+    """A directory into which both packages are unpacked"""
     directory = tmp_path_factory.mktemp("packages")
     root = directory / "root"
     config = build / "CPackConfig.cmake"
@@ -45,14 +45,14 @@ def installed(build, tmp_path_factory):
 
 @pytest.fixture
 def installed_device(installed, stopped_device):
-    """A device that is used through the packages"""
+    """A device that uses the unpacked packages"""
     env = stopped_device.env
     usr = f"{installed}/usr"
     env["PATH"] = f"{usr}/lib/tpd-device/host:{usr}/bin:{env['PATH']}"
     return stopped_device
 
 
-def test_modes_do_not_depend_on_the_umask(installed):
+def test_file_modes_do_not_depend_on_the_umask(installed):
     files = (installed / "usr").rglob("*")
     modes = {stat.filemode(file.lstat().st_mode) for file in files}
     assert modes == {"drwxr-xr-x", "-rw-r--r--", "-rwxr-xr-x", "lrwxrwxrwx"}
@@ -60,7 +60,7 @@ def test_modes_do_not_depend_on_the_umask(installed):
 
 @pytest.fixture(params=COMPLETIONS)
 def complete(request, installed, installed_device):
-    """The shell's completions of the last of these words"""
+    """Returns the shell's completions of the last word"""
     shell = request.param, "-f", "-c", COMPLETIONS[request.param]
 
     def last_word(*words):
@@ -84,7 +84,7 @@ def test_completes_parameters(complete):
     assert complete("tpd", "stop", "") == []
 
 
-def test_completes_the_words_of_the_device_command(complete, installed_device):
+def test_completes_tpd_device(complete, installed_device):
     installed_device.output("tpd-device", "answer", "captest", "done")
     assert {"start", "trace", "answer"}.issubset(complete("tpd-device", ""))
     assert complete("tpd-device", "start", "") == ["--permissive"]
@@ -93,7 +93,7 @@ def test_completes_the_words_of_the_device_command(complete, installed_device):
 
 
 def described(page, section):
-    """The names that a section of a manual page describes after its first paragraph"""
+    """Returns the names that a section of a manual page describes"""
     groff = "groff -man -Tascii -P-cbou -ww -rLL=80n".split()
     shown = subprocess.run([*groff, page], capture_output=True, text=True)
     assert (shown.returncode, shown.stderr) == (0, "")
@@ -112,7 +112,7 @@ def test_manual_describes_the_faults(stopped_device, build):
     assert set(listed).issubset(described(build / "docs/tpd-device.1", "FAULTS"))
 
 
-def test_builds_the_same_sources_for_a_device():
+def test_android_bp_lists_the_sources_of_the_product():
     directories = "binder bounded_libc cmdline daemon log main property".split()
     for_device = re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp"))
     here = [str(path.relative_to(SOURCE)) for path in SOURCE.glob("*/*.cpp")]
@@ -125,7 +125,7 @@ def is_idle(device):
 
 
 def steps(session):
-    """The commands of a session, each after "$ ", with the output that it shows"""
+    """Yields the commands of a session, which follow "$ ", and their output"""
     for step in session.removeprefix("$ ").split("\n$ "):
         lines = step.splitlines()
         count = 1 + sum(line.startswith("> ") for line in lines)

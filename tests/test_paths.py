@@ -1,4 +1,4 @@
-"""Every path of a command through the tool, with the simulated daemon"""
+"""Every path that a command can take through the tool"""
 from virtual_device import NO_SERVICE, PASS, PERMISSIVE, RESTART, SERVICE, wait_until
 
 

@@ -91,7 +91,7 @@ def test_reports_usage_errors(device, command):
     assert USAGE_ERRORS[command] in done.stderr
 
 
-def test_serves_adb_shell(device):
+def test_adb_shell_runs_the_phones_shell(device):
     done = device.run("adb", "shell", "tpd", "captest;", "exit", "3")
     assert (done.returncode, done.stdout) == (3, PASS)
     assert device.shell("a=(1 2); [[ ${#a[@]} = 2 ]] && echo ${a[1]}") == "2\n"
@@ -109,7 +109,7 @@ def test_keeps_settings_in_their_directory(device):
     assert device.output("getenforce") == "Enforcing\n"
 
 
-def test_finds_the_listed_commands_and_no_others(device):
+def test_shell_finds_exactly_the_listed_commands(device):
     lines = (SOURCE / "device/commands").read_text().splitlines()
     rows = [line.split() for line in lines if not line.startswith("#")]
     listed = {name for row in rows for name in row[1:]}

@@ -1,4 +1,4 @@
-"""The output of scripts/device trace"""
+"""The output of `device trace`"""
 import json
 import re
 import signal
@@ -11,7 +11,7 @@ from virtual_device import LIMIT_S, PASS, SOURCE, wait_until
 
 @pytest.fixture
 def trace(stopped_device):
-    """Runs `device trace` on a running device and returns its output."""
+    """Returns a function that runs `device trace` and returns its output."""
     stopped_device.output("device", "start", "--permissive")
     return lambda *arguments: stopped_device.output("device", "trace", *arguments)
 
@@ -34,7 +34,7 @@ def test_shows_the_steps_of_a_command(trace):
     )
 
 
-def test_shows_the_bytes_on_the_page_of_the_wire_format(trace):
+def test_shows_the_bytes_of_the_wire_format_page(trace):
     page = (SOURCE / "docs/wire-format.md").read_text()
     dump = re.findall("^[0-9a-f]{8}: .*", page, re.M)
     assert_in_order(trace("--bytes", "THP_SetFoldState", "1"), *dump)
@@ -51,7 +51,7 @@ def test_draws_a_sequence_diagram(trace):
     assert_in_order(shown, "sequenceDiagram\n", "tool->>", '"#35;#59;"', "daemon-->>")
 
 
-def test_recorder_exits_with_its_terminal(trace, stopped_device):
+def test_recorder_exits_when_its_terminal_closes(trace, stopped_device):
     stopped_device.fault("hang 60000")
     command = ["device", "trace", "captest"]
     recorder = subprocess.Popen(command, env=stopped_device.env, stdout=subprocess.DEVNULL)
@@ -62,6 +62,6 @@ def test_recorder_exits_with_its_terminal(trace, stopped_device):
     assert not (stopped_device.root / "trace").exists()
 
 
-def test_clears_the_file_of_a_killed_recorder(trace, stopped_device):
+def test_removes_the_file_of_a_killed_recorder(trace, stopped_device):
     (stopped_device.root / "trace").write_text("{}\n")
     assert_in_order(trace("captest"), "tool calls", PASS)

@@ -24,7 +24,7 @@ TEST_F(TpdClientTest, TreatsTheDaemonAsUnavailableBeforeTheFirstWait) {
     EXPECT_EQ(client.daemonUnavailable, 1);
 }
 
-TEST_F(TpdClientTest, ChecksALivingDaemonOnceForAllCommands) {
+TEST_F(TpdClientTest, ChecksALivingDaemonOncePerProcess) {
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 0.thp.dae_alive : 1. thp.binder: 1");
     EXPECT_EQ(client.daemonUnavailable, 0);
     TpdClient another;
@@ -33,7 +33,7 @@ TEST_F(TpdClientTest, ChecksALivingDaemonOnceForAllCommands) {
     EXPECT_THAT(device.calls(), ElementsAre(Read(kAliveKey), Read(kBinderKey)));
 }
 
-TEST_F(TpdClientTest, WaitsForADaemonThatStarts) {
+TEST_F(TpdClientTest, WaitsForAStartingDaemon) {
     device.properties[kBinderKey] = "0";
     device.changes[Log(INFO, "CheckAlive 2")] = {kBinderKey, "1"};
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 3.thp.dae_alive : 1. thp.binder: 1");
@@ -51,7 +51,7 @@ TEST_F(TpdClientTest, ReportsADaemonThatStaysDown) {
     EXPECT_EQ(client.daemonUnavailable, 1);
 }
 
-TEST_F(TpdClientTest, DoesNotWaitForAFirmwareUpdate) {
+TEST_F(TpdClientTest, DoesNotWaitDuringAFirmwareUpdate) {
     device.properties[kAliveKey] = "false";
     device.properties["odm.thp.is_updating_fw"] = "true";
     EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", "p"),
@@ -103,7 +103,7 @@ TEST(IsCaptestInRtTest, AcceptsAnySubstringOfTheModeNames) {
     EXPECT_FALSE(TpdClient::IsCaptestInRt("[TPD]captest", "running_test"));
 }
 
-TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonDied) {
+TEST_F(TpdClientTest, ReportsThatTheDaemonDiedDuringACapacityTest) {
     device.properties[kAliveKey] = "false";
     EXPECT_EQ(client.RunCmd("captest", "running_test"), "answerthp.dae_alive : 0. thp.binder: 1" +
                                                                 std::string(kCaptestFailure) +
@@ -111,7 +111,7 @@ TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonDied) {
     EXPECT_EQ(client.RunCmd("captest", "other"), "answer");
 }
 
-TEST_F(TpdClientTest, JudgesACapacityTestWhoseDaemonRestarted) {
+TEST_F(TpdClientTest, ReportsThatTheDaemonRestartedDuringACapacityTest) {
     device.changes[Transact("captest, running_test")] = {kRebootTimesKey, "1"};
     EXPECT_EQ(client.RunCmd("captest", "running_test"), "answerthp.dae_alive : 1. thp.binder: 1" +
                                                                 std::string(kCaptestFailure) +

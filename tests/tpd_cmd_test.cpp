@@ -20,7 +20,7 @@ TEST_F(TpdCmdTest, ReportsWhetherTheThplogIsOn) {
     }
 }
 
-TEST_F(TpdCmdTest, LeavesTheThplogAloneInItsStateAndInUpgradeMode) {
+TEST_F(TpdCmdTest, DoesNotSwitchTheThplogUnnecessarilyOrInUpgradeMode) {
     TpdCmd().DisableThplog();
     device.properties[kThplogKey] = "true";
     TpdCmd().EnableThplog();
@@ -48,7 +48,7 @@ TEST_F(TpdCmdTest, StoresThatSelinuxIsPermissive) {
                             Write(kPermissiveKey, "true")));
 }
 
-TEST_F(TpdCmdTest, ReadsTheStoredFlagBeforeTheBootMode) {
+TEST_F(TpdCmdTest, ChecksTheStoredFlagBeforeTheBootMode) {
     for (const char* line : {"enter_recovery=1", "androidboot.swtype=factory"}) {
         device.kernelCommandLine = line;
         device.properties.erase(kPermissiveKey);
@@ -58,8 +58,9 @@ TEST_F(TpdCmdTest, ReadsTheStoredFlagBeforeTheBootMode) {
     EXPECT_THAT(device.calls({kShell, kWrite}), ElementsAre(storeDefault, storeDefault));
 }
 
-TEST_F(TpdCmdTest, AllowsCommandsOnlyWhenGetenforceSaysPermissive) {
-    const std::string longest = "Permissive" + std::string(189, 'x');  // 200 bytes with its zero
+TEST_F(TpdCmdTest, AllowsCommandsOnlyIfGetenforcePrintsPermissive) {
+    const std::string longest =
+            "Permissive" + std::string(189, 'x');  // 200 bytes with the terminator
     const struct {
         const char* name;
         std::optional<std::string> output;

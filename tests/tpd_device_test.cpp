@@ -1,4 +1,4 @@
-// The proxy and the platform's binder objects in one process. It also runs on a device.
+// Tests the proxy with a service in the same process. Also runs on a device.
 #include <binder/Binder.h>
 #include <binder/Parcel.h>
 #include <gtest/gtest.h>

@@ -12,7 +12,7 @@ constexpr char kHelpText[] =
         "debugDifEnable\ndebugRawEnable\nlog_afe_disable\nlog_afe_enable\nlog_disable\n"
         "log_enable\nreboot\nshowtouch\nshowtouch_close\nstart\nstop\n";
 
-// What the tool prints when it is called with these arguments.
+// Runs the tool with these arguments and returns its output.
 std::string RunTool(std::vector<std::string> arguments) {
     std::vector<char*> argv;
     for (std::string& argument : arguments) {
@@ -46,7 +46,7 @@ TEST(TpdMainTest, MarksForwardedCommandsAsTwoWay) {
     }
 }
 
-TEST(TpdMainTest, DoesNothingWithOtherArguments) {
+TEST(TpdMainTest, IgnoresInvalidArguments) {
     const std::vector<std::string> kRows[] = {
             {},
             {"tpd", "TSA_ExecuteCommand", "", "b"},
@@ -124,7 +124,7 @@ TEST(TpdMainTest, SendsNothingWhileSelinuxIsEnforcing) {
     EXPECT_THAT(gTpdCmds, IsEmpty());
 }
 
-TEST(TpdMainTest, ReportsThatMemoryIsExhausted) {
+TEST(TpdMainTest, ReportsFailedAllocations) {
     FakeDevice device;
     device.failingAllocation = 1;
     EXPECT_EQ(RunTool({"tpd", "start"}), "can NOT alloc memory for g_tpdCmd");

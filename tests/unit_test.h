@@ -1,4 +1,4 @@
-// For all unit tests: GoogleMock, and a new fake device for every test.
+// Shared by the unit tests: GoogleMock matchers and a fixture with a fake device.
 #pragma once
 
 #include <gmock/gmock.h>

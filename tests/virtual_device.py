@@ -24,12 +24,12 @@ RESTART = [("odm.thp.service_enable", "0"), ("odm.thp.service_enable", "1")]
 def wait_until(condition):
     deadline = time.monotonic() + LIMIT_S
     while not condition():
-        assert time.monotonic() < deadline, "waited too long"
+        assert time.monotonic() < deadline, "timed out"
         time.sleep(0.02)
 
 
 class Device:
-    """A device root in `directory`, and the programs of a build that use it."""
+    """A virtual device in `directory`, and the programs of a build."""
 
     def __init__(self, directory, build, tool):
         self.root = directory / "device"
@@ -80,24 +80,24 @@ class Device:
         return int(self.getprop("odm.thp.dae_reboot_times"))
 
     def start_tracing(self):
-        """Turns tracing on while the file is locked."""
+        """Turns tracing on by locking the trace file."""
         self.output("device", "root")
         self.recorder = open(self.root / "trace", "w")
         fcntl.flock(self.recorder, fcntl.LOCK_EX)
 
     def events(self, what, who=""):
-        """The recorded events of one kind, of one program or of all."""
+        """Returns the recorded events of one kind, from one program or from all."""
         lines = (self.root / "trace").read_text().splitlines()
         events = [json.loads(line) for line in lines]
         return [event for event in events if event["what"] == what and who in event["who"]]
 
     def written(self):
-        """The properties that the tool wrote, in order."""
+        """Returns the properties that the tool wrote, in order."""
         writes = self.events("property_write", who="tpd")
         return [(write["name"], write["new"]) for write in writes]
 
     def processes(self, program=""):
-        """The processes of this device that run the program."""
+        """Returns the IDs of the device's processes that run the program."""
         known = f"TPD_DEVICE_PROCESS={self.root}".encode()
         found = []
         for process in pathlib.Path("/proc").glob("[0-9]*"):
