@@ -14,12 +14,12 @@ import time
 
 TRACE = "trace"
 ESCAPES = {ord("#"): "#35;", ord(";"): "#59;"}  # in Mermaid text
-QUIET_S = 0.15  # The device is idle after this time without an event.
+QUIET_S = 0.15  # The device is idle if no event has occurred for this time.
 IDLE_TIMEOUT_S = 5
 NAMES = {"tpd": "tool", "corvane_daemon": "daemon"}
 
 
-# describe() computes `end`, `found`, `size` and `way`; the other fields are as recorded.
+# describe() computes `end`, `found`, `size` and `way`; the other fields are recorded.
 DESCRIPTIONS = {
     "property_read": 'reads {name}: "{value}"',
     "property_write": 'writes {name}: "{old}" -> "{new}", status {status}',
@@ -52,7 +52,7 @@ ARROWS = {
 
 
 def shown(text):
-    """Decodes and escapes a recorded text, in which each code point stands for one byte"""
+    """Decodes and escapes a recorded text, whose code points are bytes"""
     return escaped(text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace"))
 
 
@@ -68,7 +68,7 @@ def actor(event):
 def describe(event):
     fields = {name: shown(str(value)) for name, value in event.items()}
     signaled, status = event.get("signal"), event.get("status", 0)
-    if event["what"] == "shell":  # as wait() returns it
+    if event["what"] == "shell":  # a wait status
         signaled, status = status & 0x7F, status >> 8
     fields["end"] = f"signal {signaled}" if signaled else f"status {status}"
     fields["found"] = "found" if event.get("found") else "not found"
@@ -87,7 +87,7 @@ def hexdump(request):
 
 @contextlib.contextmanager
 def recording(root):
-    """Turns tracing on. Locks the trace file before it gets its final name."""
+    """Turns tracing on. Locks the trace file before linking it to its final name."""
     temporary = f"{os.getpid()}.{TRACE}"
     directory = os.open("tmp", os.O_DIRECTORY | os.O_NOFOLLOW, dir_fd=root)
     trace = os.open(temporary, os.O_RDWR | os.O_CREAT | os.O_EXCL, 0o600, dir_fd=directory)
@@ -108,14 +108,14 @@ def recording(root):
 def read_trace(trace):
     events = []
     for line in os.pread(trace, os.fstat(trace).st_size, 0).decode("ascii").splitlines():
-        # The last line may be incomplete, and a full disk truncates lines.
+        # Skip incomplete lines: the last one, or those that a full disk truncated.
         with contextlib.suppress(json.JSONDecodeError):
             events.append(json.loads(line))
     return sorted(events, key=lambda event: event["time"])
 
 
 def is_idle(events):
-    """Returns true if there are no recent events and no daemon is starting"""
+    """Returns true if no event is recent and no daemon is starting"""
     life = [
         event["what"]
         for event in events

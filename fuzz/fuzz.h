@@ -7,7 +7,7 @@
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size);
 
-// Aborts the run and keeps the input when the condition is false.
+// Aborts if the condition is false; libFuzzer then saves the input.
 inline void Check(bool condition) {
     if (!condition) {
         abort();

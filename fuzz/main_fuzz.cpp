@@ -1,6 +1,6 @@
-// The tool with any arguments, on any device. The bits of the input's first two bytes choose the
-// state of the device; the arguments follow as zero-terminated strings. The last one is also
-// the kernel command line, getenforce's output and the daemon's answer.
+// Runs the tool with arbitrary arguments on a fake device. The first two bytes of the input are
+// bits that set the device's state; the arguments follow as zero-terminated strings. The last
+// argument is also the kernel command line, the output of getenforce and the daemon's answer.
 #include <bitset>
 #include <cstdio>
 #include <sstream>
@@ -45,8 +45,8 @@ int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     Check(silent && tpd_main(static_cast<int>(argv.size()), argv.data()) == 0);
     Check(device.calls({test::kTransact}).size() <= 2);
     Check(device.openStreams.empty());
-    // The tool marks each command as two-way. Without the mark, names are sent one-way and a
-    // capacity test is judged.
+    // The tool marks every command as two-way. RunCmd() without the mark reaches the one-way calls
+    // and the check of a capacity test.
     if (argv.size() == 3) {
         TpdClient().RunCmd(argv[1], argv[2]);
     }

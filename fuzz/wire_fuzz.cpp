@@ -1,4 +1,4 @@
-// Tests a published service and a client's proxy. Their peer sends the input and hangs up.
+// Feeds the input to a published service and to a proxy; the peer then hangs up.
 #include <binder/Parcel.h>
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -13,7 +13,7 @@ namespace {
 
 using namespace android;
 
-// The request says where to read.
+// Reads at a position given by the request.
 class EchoService : public BBinder {
     status_t onTransact(uint32_t, const Parcel& data, Parcel* reply, uint32_t) override {
         data.setDataPosition(static_cast<size_t>(data.readInt32()));
@@ -29,14 +29,14 @@ struct Recipient : IBinder::DeathRecipient {
     int deaths = 0;
 };
 
-// This process's device root.
+// The device root of this process.
 const struct TemporaryRoot {
     TemporaryRoot() { setenv("TPD_DEVICE_ROOT", mkdtemp(path), 1); }
     ~TemporaryRoot() { std::filesystem::remove_all(path); }
     char path[32] = "/tmp/tpd-fuzz-XXXXXX";
 } kRoot;
 
-// Every input from scripts/fuzz fits into a socket's buffer.
+// The inputs of scripts/fuzz fit into a socket's buffer.
 void SendAndHangUp(int socket, const uint8_t* data, size_t size) {
     Check(send(socket, data, size, MSG_NOSIGNAL) == static_cast<ssize_t>(size));
     shutdown(socket, SHUT_WR);
@@ -55,7 +55,7 @@ void CallService(const uint8_t* data, size_t size) {
     }
     close(peer);
 
-    // The service still accepts clients. Their empty request has no text.
+    // The service must still accept clients. An empty request has no text.
     const sp<IBinder> proxy = host::ConnectService("/driver", "echo");
     Check(proxy != nullptr && proxy->transact(0, Parcel(), nullptr) == BAD_VALUE);
 }
@@ -67,7 +67,7 @@ void AnswerProxy(const uint8_t* data, size_t size) {
     const sp<IBinder> proxy = host::NewProxy(host::UniqueFd(ends[0]));
     const sp<Recipient> recipient = new Recipient;
     Check(proxy->linkToDeath(recipient) == OK);
-    // The peer never reads: few enough calls that its buffer does not fill.
+    // The peer never reads, so the calls must be few enough to fit into its buffer.
     for (int i = 0; i < 100 && recipient->deaths == 0; ++i) {
         Parcel reply;
         proxy->transact(0, Parcel(), &reply);

@@ -1,7 +1,7 @@
-# Adapts the files of the packages to Debian's rules before CPack builds the packages.
+# Adapts the packages' files to Debian policy before CPack builds the packages.
 file(GLOB packages ${CPACK_TEMPORARY_DIRECTORY}/*/usr)
 
-# Links within /usr are relative.
+# Make links within /usr relative.
 file(GLOB links ${CPACK_TEMPORARY_DIRECTORY}/*/usr/lib/tpd-device/bin/*)
 foreach(link IN LISTS links)
     file(READ_SYMLINK ${link} target)
@@ -10,9 +10,9 @@ foreach(link IN LISTS links)
 endforeach()
 
 foreach(package IN LISTS packages)
-    # Packages have a directory of their own for zsh.
+    # Debian packages install zsh completions in vendor-completions.
     file(RENAME ${package}/share/zsh/site-functions ${package}/share/zsh/vendor-completions)
-    # Directories were made with the caller's umask.
+    # CPack created the directories with the caller's umask.
     execute_process(
         COMMAND find ${package} -type d -exec chmod 755 {} + COMMAND_ERROR_IS_FATAL ANY)
 endforeach()
