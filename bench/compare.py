@@ -291,7 +291,7 @@ class Bench:
         return rows
 
 
-# The tables of docs/performance.md, in its order
+# The tables of docs/performance.md, in the order of the page
 
 
 def number(value):

@@ -34,7 +34,7 @@ constexpr char kTimeoutText[] =
 // does not mean a failure; "retry:" is always followed by 1.
 constexpr const char* kNoTag = nullptr;
 
-// Writes the property until the value reads back, at most six times. A failure shows only in the
+// Writes the property up to six times, until it reads back as `value`. A failure shows only in the
 // log. Does not use Property::Set(), which logs other lines and which binder/ must not include.
 void SetProperty(std::string key, std::string value) {
     char current[kPropertyBufferBytes] = {};

@@ -46,7 +46,7 @@ inline std::string GetProperty(const char* key) {
     return value;
 }
 
-// Returns the decimal number that the property's value begins with, or 0 without a number.
+// Returns the decimal number at the start of the property's value, or 0 if there is none.
 inline int64_t GetPropertyNumber(const char* key) {
     return strtoll(GetProperty(key).c_str(), nullptr, 10);
 }

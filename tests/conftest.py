@@ -1,8 +1,8 @@
 """Fixtures: a virtual device, running or stopped
 
-TPD_BUILD_DIR is the build to test. TPD_COMMAND is the command that runs the tool, if it is not the
-build's, for example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK adds the long tests. TPD_SEED
-repeats the choices of a random test, which prints its seed.
+TPD_BUILD_DIR is the build to test. TPD_COMMAND overrides the command that runs the tool: for
+example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK adds the long tests. TPD_SEED repeats the
+random choices of an earlier run; every test prints its seed.
 """
 import os
 import pathlib

@@ -59,8 +59,8 @@ struct Answer {
     const char* text = "answer";  // null: the reply has no text
 };
 
-// A device whose daemon is alive. The constructor resets the tool's global variables, so only one
-// instance can exist at a time.
+// A device whose daemon is alive. Only one instance may exist at a time, because the constructor
+// resets the tool's global variables.
 class FakeDevice {
   public:
     FakeDevice();
@@ -74,9 +74,9 @@ class FakeDevice {
     };
     std::set<std::string> rejectedWrites;                   // properties that reject writes
     std::optional<std::string> kernelCommandLine = "";      // nullopt: cannot be opened
-    std::optional<std::string> getenforce = "Enforcing\n";  // its output; nullopt: cannot be run
+    std::optional<std::string> getenforce = "Enforcing\n";  // output; nullopt: cannot be run
     int getenforceStatus = 0;                               // what pclose() returns
-    int failingAllocation = 0;  // the nothrow allocation that fails, from 1; 0: none
+    int failingAllocation = 0;  // which nothrow allocation fails, from 1; 0: none
     std::deque<bool> lookups;   // results of the first lookups; later ones succeed
     // Answers to the first calls; later calls get the default answer. DEAD_OBJECT also notifies the
     // death recipient.

@@ -11,7 +11,7 @@ COMMANDS = [300, pytest.param(9000, marks=pytest.mark.soak)]
 
 
 def run_clients(commands, check):
-    """Calls `check` with as many different parameters, from 16 threads."""
+    """Calls `check` with that many different parameters, from 16 threads."""
     states = [f"version:3+main,{number},{number}" for number in range(commands)]
     with concurrent.futures.ThreadPoolExecutor(16) as pool:
         list(pool.map(check, states))

@@ -33,14 +33,14 @@ android::sp<android::IBinder> NewProxy(UniqueFd connection);
 android::status_t PublishService(const std::string& driver, const std::string& name,
                                  const android::sp<android::IBinder>& binder);
 
-// A request: this header, then `size` bytes of parcel. Numbers are in the machine's byte order.
+// A request: this header, then a parcel of `size` bytes. Numbers are in the machine's byte order.
 struct RequestHeader {
     uint32_t code;
     uint32_t flags;
     uint32_t size;
 };
 
-// A service's reply to a two-way request: this header, then `size` bytes of parcel.
+// A service's reply to a two-way request: this header, then a parcel of `size` bytes.
 struct ReplyHeader {
     int32_t status;
     uint32_t size;
