@@ -70,7 +70,7 @@ inline bool IsDaemonEnabled() {
     return enable == "1" || enable == "true";
 }
 
-// Returns the contents of a regular file in the device root; none if it cannot be read.
+// Returns the contents of a regular file in the device root, or nullopt if it cannot be read.
 inline std::optional<std::string> ReadFile(const std::string& path) {
     const host::UniqueFd file = host::OpenFile(path, O_RDONLY);
     struct stat status = {};

@@ -2,7 +2,7 @@
 
 TPD_BUILD_DIR is the build to test. TPD_COMMAND overrides the command that runs the tool: for
 example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK adds the long tests. TPD_SEED repeats the
-random choices of an earlier run; every test prints its seed.
+choices of a random test, which prints its seed when it fails.
 """
 import os
 import pathlib
@@ -27,7 +27,7 @@ def build():
 
 @pytest.fixture
 def chance():
-    """A test's random choices. A failing test prints the seed."""
+    """Returns a random generator. A failing test prints its seed."""
     seed = int(os.environ.get("TPD_SEED", random.randrange(1 << 32)))
     print(f"TPD_SEED={seed}")
     return random.Random(seed)
