@@ -59,8 +59,7 @@ TEST_F(TpdCmdTest, ChecksTheStoredFlagBeforeTheBootMode) {
 }
 
 TEST_F(TpdCmdTest, AllowsCommandsOnlyIfGetenforcePrintsPermissive) {
-    const std::string longest =
-            "Permissive" + std::string(189, 'x');  // 200 bytes with the terminator
+    const std::string longest = "Permissive" + std::string(189, 'x');  // 200 bytes with the NUL
     const struct {
         const char* name;
         std::optional<std::string> output;
