@@ -46,8 +46,7 @@ inline std::string GetProperty(const char* key) {
     return value;
 }
 
-// Returns the decimal number at the start of the property's value, or 0 if it starts with something
-// else.
+// Returns the decimal number at the start of the property's value, or 0 if it has none.
 inline int64_t GetPropertyNumber(const char* key) {
     return strtoll(GetProperty(key).c_str(), nullptr, 10);
 }
