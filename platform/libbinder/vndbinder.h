@@ -73,7 +73,7 @@ bool ReceiveMessage(const UniqueFd& connection, Header* header, android::Parcel*
 UniqueFd NewSocket();
 
 // Returns the address of the socket `name` in the directory `fd` or, without a name, of the socket
-// `fd`. The path of the device root may be longer than a socket address.
+// `fd`. The path of the device root may be longer than a socket address can hold.
 sockaddr_un Address(const UniqueFd& fd, const std::string& name = "");
 
 }  // namespace host
