@@ -57,7 +57,7 @@ tpd_alive() {
 #   failed    no answer; the daemon may have executed the command, even twice
 #   late      no answer within TPD_LIMIT; the daemon is being restarted
 #   unusable  not sent: tpd does not accept these arguments
-#   broken    adb or the device failed; TPD_RESULT is what they printed
+#   broken    adb or the device failed; see their messages on standard error
 #
 # Returns 0 for "answered", otherwise 1.
 tpd_send() {
