@@ -75,6 +75,15 @@ int RecordAnswer(const std::string& command, const std::string& answer) {
                    : FailForErrno("answer '" + command + "'");
 }
 
+int RemoveAnswer(const std::string& command) {
+    if (host::RemoveFile(AnswerPath(command))) {
+        return 0;
+    }
+    return errno == ENOENT ? Fail("no recorded answer for '" + command + "'; " + Command("answer") +
+                                  " lists them")
+                           : FailForErrno("answer '" + command + "'");
+}
+
 }  // namespace
 
 std::set<std::string> RecordedCommands() {
@@ -108,9 +117,7 @@ int ListOrRecordAnswers(int argc, char** argv) {
                     kUsageError);
     }
     if (command == "--remove") {
-        return host::RemoveFile(AnswerPath(argv[1]))
-                       ? 0
-                       : FailForErrno("answer '" + std::string(argv[1]) + "'");
+        return RemoveAnswer(argv[1]);
     }
     if (command.empty() || command.front() == '-') {
         return Fail("answer: invalid command '" + command + "'", kUsageError);

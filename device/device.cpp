@@ -222,7 +222,7 @@ int BringUp(const char* selinuxMode) {
 
 int Start(int argc, char** argv) {
     if (argc > 0 && strcmp(argv[0], "--permissive") != 0) {
-        return UsageError(std::string("start: unknown option '") + argv[0] + "'");
+        return UsageError(std::string("start: unexpected argument '") + argv[0] + "'");
     }
     const pid_t init = FindInit();
     const int status = BringUp(argc > 0 ? "Permissive" : "Enforcing");
@@ -315,9 +315,9 @@ constexpr struct Verb {
          INT_MAX, Shell},
         {"run", " [ARGUMENT...]", "runs the tool; boots a stopped device in permissive mode",
          INT_MAX, Run},
-        {"trace", " [--bytes] [--json | --mermaid] ARGUMENT...",
+        {"trace", " [--bytes] [--json | --mermaid] [ARGUMENT...]",
          "runs the tool and shows what the tool, the daemon and init did", INT_MAX, Trace},
-        {"fault", " [NAME [ARGUMENT] [COUNT] | none]",
+        {"fault", " [FAULT [ARGUMENT] [COUNT]]",
          "sets the daemon's fault; without arguments, lists the faults", 3, Fault},
         {"answer", " [COMMAND TEXT | COMMAND - | --remove COMMAND]",
          "records an answer (-: from standard input); without arguments, lists the commands",

@@ -50,10 +50,12 @@ constexpr struct FaultRow {
 // Stores the value of `word` in `number`. Returns an empty string, or an error if it is invalid.
 std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
     number = strtoll(word.c_str(), nullptr, 10);
-    return IsNumberWithin(word, range.min, range.max)
-                   ? ""
-                   : std::string("invalid ") + range.name + " '" + word + "'; use " +
-                             std::to_string(range.min) + " to " + std::to_string(range.max);
+    if (IsNumberWithin(word, range.min, range.max)) {
+        return "";
+    }
+    const std::string name = range.name;
+    return (word.empty() ? "missing " + name : "invalid " + name + " '" + word + "'") + "; use " +
+           std::to_string(range.min) + " to " + std::to_string(range.max);
 }
 
 // Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error that names the invalid word.

@@ -155,7 +155,7 @@ def print_diagram(events):
 
 
 def main():
-    parser = argparse.ArgumentParser(prog="device trace", description=__doc__)
+    parser = argparse.ArgumentParser(prog="device trace", allow_abbrev=False)
     parser.add_argument("--bytes", action="store_true", help="show the bytes of each request")
     form = parser.add_mutually_exclusive_group()
     form.add_argument("--json", action="store_true", help="print the events as recorded")

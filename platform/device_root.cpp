@@ -52,7 +52,8 @@ const char* Mark(int root) {
         return strerror(error.value());
     }
     // Another process may have marked it in the meantime.
-    return IsMarked(root) ? nullptr : "contains files that do not belong to a device";
+    return IsMarked(root) ? nullptr
+                          : "contains files that do not belong to a device; use an empty directory";
 }
 
 // Returns null, or the reason why the directory cannot be the device root.
