@@ -67,8 +67,9 @@ std::string ParseFault(const std::string& text, Fault& fault) {
         return word;
     };
     const std::string name = nextWord();
-    const auto* const row = std::find_if(std::begin(kFaults), std::end(kFaults),
-                                         [&](const FaultRow& each) { return name == each.name; });
+    const auto* const row =
+            std::find_if(std::begin(kFaults), std::end(kFaults),
+                         [&](const FaultRow& candidate) { return name == candidate.name; });
     if (row == std::end(kFaults)) {
         return "unknown fault '" + name + "'; " + Command("fault") + " lists them";
     }

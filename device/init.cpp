@@ -83,8 +83,8 @@ bool LockDevice() {
 // Writes the files directly to replace even read-only properties that a process has just set.
 bool SetBootProperties() {
     return std::all_of(
-            std::begin(kBootProperties), std::end(kBootProperties), [](const auto& each) {
-                return host::ReplaceFileAt(host::PropertiesDirectory(), each[0], each[1]);
+            std::begin(kBootProperties), std::end(kBootProperties), [](const auto& property) {
+                return host::ReplaceFileAt(host::PropertiesDirectory(), property[0], property[1]);
             });
 }
 
