@@ -28,7 +28,7 @@ class ICorvaneInterfaceClient : public android::IInterface {
     // Sends `cmd` with `params` to the daemon and returns the status of the transaction.
     //
     // A command that contains kTwoWayMarker is sent two-way, without the marker and anything before
-    // it. Any other command is sent one-way if the lists below match it or its parameters.
+    // it. Any other command is sent one-way if it or its parameters match the lists below.
     //
     // Two-way: stores the daemon's answer in `reply`, empty if the daemon sent no string; leaves
     // `reply` unchanged on failure. One-way: sets `reply` to "OK" regardless of the status.

@@ -22,7 +22,7 @@ class TpdCmd {
     static bool IsThplogEnable();
 
     // Switch the touch-processing log on or off and restart the daemon to apply the change. Do
-    // nothing in upgrade mode or if the log is already in that state.
+    // nothing in upgrade mode or if the log is already in the requested state.
     void EnableThplog();
     void DisableThplog();
 
