@@ -15,11 +15,11 @@ namespace device {
 namespace {
 
 constexpr char kDirectory[] = "answers";
-// The longest answer that fits in a reply with its terminator.
+// The longest answer that, with its terminator, fits in a reply.
 constexpr size_t kMaxAnswerBytes = (1 << 20) - 2 * 4096 - 1;
 
-// Returns the path of the command's answer, with bytes other than letters, digits and '_' as %XX.
-// CommandOf() is the inverse.
+// Returns the path of the command's answer. Bytes other than letters, digits and '_' are written as
+// %XX. CommandOf() is the inverse.
 std::string AnswerPath(const std::string& command) {
     std::string path = std::string(kDirectory) + "/";
     for (const char c : command) {
@@ -113,7 +113,7 @@ int ListOrRecordAnswers(int argc, char** argv) {
     }
     if (argc > 2) {
         return Fail("answer: unexpected argument '" + std::string(argv[2]) +
-                            "'; quote a command with its parameters",
+                            "'; quote the command and its parameters",
                     kUsageError);
     }
     if (command == "--remove") {

@@ -39,8 +39,10 @@ using device::Fail;
 using device::FailForErrno;
 using host::UniqueFd;
 
-constexpr int kExitStopped = 3;  // of `status`
+// Exit statuses of `device status`.
+constexpr int kExitStopped = 3;
 constexpr int kExitUnknown = 4;
+
 constexpr int kFindLimitMs = 200;
 constexpr int kStartLimitMs = 10000;
 constexpr int kStopLimitMs = 5000;
@@ -50,7 +52,7 @@ int UsageError(const std::string& error) {
     return device::Fail(error + "; see " + device::Command("--help"), device::kUsageError);
 }
 
-// Prints a message on standard error. Returns the exit status of success.
+// Prints a message to standard error. Returns 0, the exit status for success.
 int Say(const std::string& what) { return Fail(what, 0); }
 
 bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
@@ -83,7 +85,7 @@ pid_t LookForInit(std::string& reason) {
     } else if (holder.l_type == F_UNLCK) {
         return 0;
     } else if (holder.l_pid <= 0) {
-        reason = "init runs in another process namespace";
+        reason = "init runs in another PID namespace";
     } else if (const auto program = ProgramOf(holder.l_pid, error); error) {
         reason = "process " + std::to_string(holder.l_pid) + ": " + error.message();
     } else if (program.filename().string().rfind("init", 0) != 0) {
@@ -195,7 +197,8 @@ int Boot(const char* selinuxMode) {
     return AwaitDaemon();
 }
 
-// Boots the device unless this build's init is running. A lock on the root serializes starts.
+// Boots the device unless this build's init is running. A lock on the device root prevents
+// concurrent starts.
 int BringUp(const char* selinuxMode) {
     const UniqueFd root = host::OpenDirectory(".");
     const auto isFree = [&root] {
@@ -279,12 +282,12 @@ int Run(int argc, char** argv) {
     return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
 }
 
-// The first argument of trace.py is the number of a device root descriptor.
+// The first argument of trace.py is a file descriptor of the device root.
 int Trace(int argc, char** argv) {
     if (!ExpectRunning()) {
         return 1;
     }
-    host::LookForTrace();  // removes the file of a killed trace
+    host::LookForTrace();  // removes the trace file if its owner was killed
     const std::string root = std::to_string(dup(host::DeviceRoot()));
     std::vector<const char*> arguments = {root.c_str()};
     arguments.insert(arguments.end(), argv, argv + argc);
@@ -320,7 +323,7 @@ constexpr struct Verb {
         {"fault", " [FAULT [ARGUMENT] [COUNT]]",
          "sets the daemon's fault; without arguments, lists the faults", 3, Fault},
         {"answer", " [COMMAND TEXT | COMMAND - | --remove COMMAND]",
-         "records an answer (-: from standard input); without arguments, lists the commands",
+         "records an answer (-: from standard input) or removes it; without arguments, lists all",
          INT_MAX, device::ListOrRecordAnswers}};
 
 void PrintUsage(FILE* stream, const Verb& verb) {

@@ -1,5 +1,5 @@
 #!/usr/bin/python3
-"""logcat.py ROOT [OPTION...]: the device's logcat; ROOT is a descriptor of the device root"""
+"""logcat.py ROOT [OPTION...]: the device's logcat; ROOT is a file descriptor of the device root"""
 import argparse
 import os
 import re
@@ -26,7 +26,7 @@ FOLLOW_PAUSE_MS = 50
 
 
 def buffers(names):
-    """Checks the names of log buffers, all of which share one log"""
+    """Rejects an unknown buffer name; all buffers share one log, so the names have no effect"""
     if not BUFFERS.issuperset(names.split(",")):
         raise ValueError
 
@@ -54,9 +54,9 @@ def tag_filter(text):
 
 def parse(arguments):
     parser = argparse.ArgumentParser(prog="logcat", description="Prints the device's log.")
-    parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="has no effect")
+    parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="ignored: there is one log")
     parser.add_argument("-c", dest="clear", action="store_true", help="clear the log")
-    parser.add_argument("-d", dest="dump", action="store_true", help="do not follow the log")
+    parser.add_argument("-d", dest="dump", action="store_true", help="print the log and exit")
     parser.add_argument("-e", "--regex", type=pattern, help="show only matching texts")
     parser.add_argument("-f", dest="file", help="append the output to a file")
     parser.add_argument("--pid", type=positive, help="show only entries of this process")
@@ -81,7 +81,7 @@ class Log:
         self.first, self.position = b"", 0
 
     def read_new(self):
-        """Yields the complete entries since the last call, or all if the log was cleared"""
+        """Yields the complete entries written since the last call; all if the log was cleared"""
         first = os.pread(self.file, HEADER.size, 0)
         if first != self.first:
             self.first, self.position = first, 0
