@@ -12,7 +12,7 @@ namespace device {
 std::set<std::string> RecordedCommands();
 
 // Returns the answer recorded for the command with these parameters or else for the command alone,
-// or nothing if there is neither.
+// or nullopt if there is neither.
 std::optional<std::string> FindAnswer(const std::string& command, const std::string& params);
 
 // `device answer`: lists, records or removes answers. Returns the exit status, 2 for a usage error.

@@ -36,7 +36,7 @@ constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr uint32_t kExecuteCommandCode = 0;
 // Just long enough to send the reply.
 constexpr int kDieAfterReplyUs = 2000;
-// The phone's commands, with a space before and after each name for the search.
+// The phone's commands. The spaces around each name let strstr() find whole names only.
 constexpr char kCommands[] = " " TPD_DAEMON_COMMANDS " ";
 
 const android::StaticString16 kDescriptor(
@@ -78,7 +78,8 @@ std::string Answer(const std::string& command, const std::string& params) {
     abort();
 }
 
-// Kills the process after the reply has been sent. Uses a timer: starting a thread could fail.
+// Kills the process after the reply has been sent. Uses a timer, because starting a thread
+// could fail.
 void DieAfterReply() {
     constexpr itimerval kDelay = {{0, 0}, {0, kDieAfterReplyUs}};
     [[maybe_unused]] static const int started = setitimer(ITIMER_REAL, &kDelay, nullptr);

@@ -20,7 +20,7 @@ namespace device {
 namespace {
 
 struct Range {
-    const char* name;  // null when the fault has no argument
+    const char* name;  // null if the fault has no argument
     int64_t min;
     int64_t max;
 };
@@ -47,7 +47,8 @@ constexpr struct FaultRow {
         {FaultKind::kHuge, "huge", "replies with a long text", {"BYTES", 0, 64 << 20}},
 };
 
-// Stores the value of `word` in `number`. Returns an empty string, or an error if it is invalid.
+// Stores the value of `word` in `number`. Returns an empty string, or an error message if the word
+// is invalid.
 std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
     number = strtoll(word.c_str(), nullptr, 10);
     if (IsNumberWithin(word, range.min, range.max)) {
@@ -58,7 +59,8 @@ std::string ParseNumber(const std::string& word, const Range& range, int64_t& nu
            std::to_string(range.min) + " to " + std::to_string(range.max);
 }
 
-// Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error that names the invalid word.
+// Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error message that names
+// the invalid word.
 std::string ParseFault(const std::string& text, Fault& fault) {
     std::istringstream words(text);
     const auto nextWord = [&words] {
@@ -90,7 +92,7 @@ std::string ParseFault(const std::string& text, Fault& fault) {
     return error.empty() ? "" : "fault " + name + ": " + error;
 }
 
-// Locks the properties directory to serialize changes to the fault between processes and threads.
+// Locks the properties directory, so that only one process or thread at a time changes the fault.
 // Closing the descriptor releases the lock.
 host::UniqueFd LockFault() {
     host::UniqueFd lock = host::OpenDirectory(host::kPropertiesDirectory);

@@ -56,8 +56,8 @@ constexpr const char* kBootProperties[][2] = {{device::kBuildIdKey, "VIRTUAL-11.
                                               {device::kIsUpdatingFirmwareKey, "false"},
                                               {device::kServiceEnableKey, "1"}};
 
-// Removes the files in a directory, except those with the kept prefix. Creates a missing directory.
-// Returns false if it cannot be opened.
+// Removes the files in a directory, except those whose names begin with `keptPrefix` (by default,
+// none do). Creates a missing directory. Returns false if the directory cannot be opened.
 bool Empty(const char* path, const std::string& keptPrefix = "/") {
     const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
     if (!directory.ok()) {
@@ -80,7 +80,8 @@ bool LockDevice() {
     return file.ok() && fcntl(file.get(), F_SETLK, &whole) == 0;
 }
 
-// Writes the files directly to replace even read-only properties that a process has just set.
+// Writes the files directly: another process may have just set a "ro." property, which
+// __system_property_set() would not replace.
 bool SetBootProperties() {
     return std::all_of(
             std::begin(kBootProperties), std::end(kBootProperties), [](const auto& property) {
@@ -124,8 +125,9 @@ bool DrainEvents(const UniqueFd& watch) {
 
 class DaemonSupervisor {
   public:
-    // Applies a write. Always stops the daemon: after quick writes of "0" and "1", only "1" can be
-    // read, but the daemon must restart. Also applies writes made during the stop.
+    // Acts on a write. Always stops the daemon: if "0" and "1" are written in quick succession,
+    // init reads only "1", but the daemon must still restart. Also acts on writes made during the
+    // stop.
     void Restart(const UniqueFd& watch) {
         Stop();
         DrainEvents(watch);
@@ -223,7 +225,7 @@ bool Daemonize() {
     return chdir("/") == 0;
 }
 
-// Returns a descriptor that reads SIGCHLD and the signals that terminate init.
+// Returns a signalfd for SIGCHLD and the signals that terminate init.
 UniqueFd OpenSignals() {
     sigset_t signals;
     sigemptyset(&signals);
@@ -234,7 +236,7 @@ UniqueFd OpenSignals() {
     return UniqueFd(signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK));
 }
 
-// Returns a descriptor that reports writes of properties and the removal of their directory.
+// Returns an inotify descriptor for writes to properties and the removal of their directory.
 UniqueFd OpenWatch() {
     UniqueFd watch(inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
     const auto add = [&watch](int directory, uint32_t events) {

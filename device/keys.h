@@ -3,7 +3,7 @@
 
 namespace device {
 
-// As on a phone.
+// The same as on a phone.
 constexpr char kBootCompletedKey[] = "sys.boot_completed";
 constexpr char kBuildIdKey[] = "ro.build.display.id";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";

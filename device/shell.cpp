@@ -64,7 +64,7 @@ int Shell(int argc, char** argv) {
     if (bin.empty()) {
         return 1;
     }
-    // Startup file and prompt of an interactive shell.
+    // The startup file and the prompt of an interactive shell.
     setenv("ENV", "/dev/null", 1);
     setenv("PS1", "virtual:$PWD # ", 1);
     if (argc == 0) {

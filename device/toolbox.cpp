@@ -154,7 +154,7 @@ int Log(int argc, char** argv) {
                                                                        : FailForErrno("cannot log");
 }
 
-// The first argument of logcat.py is the number of a device root descriptor.
+// The first argument of logcat.py is a file descriptor of the device root.
 int Logcat(int argc, char** argv) {
     const std::string script = device::PathBesideProgram("logcat.py");
     const std::string root = std::to_string(dup(host::DeviceRoot()));

@@ -52,7 +52,7 @@ ARROWS = {
 
 
 def shown(text):
-    """Decodes and escapes a recorded text, whose code points are bytes"""
+    """Decodes and escapes a recorded text, in which each code point stands for a byte"""
     return escaped(text.rstrip("\n").encode("latin-1").decode("utf-8", "backslashreplace"))
 
 
