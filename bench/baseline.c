@@ -1,4 +1,5 @@
-// The baseline: makes the tool's system calls in the same order with the same data, nothing else.
+// The baseline makes the tool's system calls, in the same order and with the same data, and does
+// nothing else.
 //   baseline THP_ResetBaseline   forwards the command, or refuses it while SELinux is enforcing
 //   baseline stop                stops the daemon
 #define _GNU_SOURCE

@@ -55,7 +55,7 @@ void CallService(const uint8_t* data, size_t size) {
     }
     close(peer);
 
-    // The service must still accept clients. An empty request has no text.
+    // The service must still accept clients. It rejects an empty request, which contains no text.
     const sp<IBinder> proxy = host::ConnectService("/driver", "echo");
     Check(proxy != nullptr && proxy->transact(0, Parcel(), nullptr) == BAD_VALUE);
 }
