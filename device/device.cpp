@@ -4,14 +4,12 @@
 #include <limits.h>
 #include <poll.h>
 #include <sys/file.h>
-#include <sys/system_properties.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <chrono>
 #include <csignal>
 #include <cstdio>
-#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <functional>

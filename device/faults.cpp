@@ -4,9 +4,7 @@
 #include <sys/system_properties.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdio>
-#include <cstring>
 #include <iterator>
 #include <sstream>
 

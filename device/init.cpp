@@ -16,19 +16,16 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <chrono>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
 #include <string>
 #include <thread>
 
 #include "common.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
-#include "platform/log_file.h"
 #include "platform/trace.h"
 #include "platform/unique_fd.h"
 

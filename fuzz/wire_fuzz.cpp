@@ -1,4 +1,5 @@
 // Feeds the input to a published service and to a proxy; the peer then hangs up.
+#include <binder/Binder.h>
 #include <binder/Parcel.h>
 #include <sys/socket.h>
 #include <sys/un.h>

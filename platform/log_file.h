@@ -8,8 +8,6 @@
 #include <cstddef>
 #include <cstdint>
 
-#include "platform/files.h"
-
 namespace host {
 
 constexpr size_t kMaxLogText = 1023;  // bytes, without the terminator, as on a device

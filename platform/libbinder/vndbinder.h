@@ -8,7 +8,7 @@
 #include <cstdint>
 #include <string>
 
-#include <binder/Binder.h>
+#include <binder/IBinder.h>
 #include <binder/Parcel.h>
 
 #include "platform/unique_fd.h"
