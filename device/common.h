@@ -51,14 +51,6 @@ inline int64_t GetPropertyNumber(const char* key) {
     return strtoll(GetProperty(key).c_str(), nullptr, 10);
 }
 
-// Returns true if the whole text is a decimal number from `min` to `max`.
-inline bool IsNumberWithin(const std::string& text, int64_t min, int64_t max) {
-    char* end = nullptr;
-    errno = 0;
-    const int64_t number = strtoll(text.c_str(), &end, 10);
-    return errno == 0 && !text.empty() && *end == '\0' && number >= min && number <= max;
-}
-
 // Returns true if the daemon reports that it is alive and has published its service.
 inline bool IsDaemonAlive() {
     return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <cstdlib>
 #include <iterator>
 #include <sstream>
 
@@ -48,8 +49,9 @@ constexpr struct FaultRow {
 // Stores the value of `word` in `number`. Returns an empty string, or an error message if the word
 // is invalid.
 std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
-    number = strtoll(word.c_str(), nullptr, 10);
-    if (IsNumberWithin(word, range.min, range.max)) {
+    char* end = nullptr;
+    number = strtoll(word.c_str(), &end, 10);
+    if (!word.empty() && *end == '\0' && number >= range.min && number <= range.max) {
         return "";
     }
     const std::string name = range.name;
