@@ -39,6 +39,15 @@ inline std::string Command(const std::string& arguments) {
     return std::string("'") + program_invocation_short_name + " " + arguments + "'";
 }
 
+// Returns the arguments, at least one, separated by spaces.
+inline std::string Join(int argc, char** argv) {
+    std::string text = argv[0];
+    for (int i = 1; i < argc; ++i) {
+        text.append(" ").append(argv[i]);
+    }
+    return text;
+}
+
 // Returns the property's value, or an empty string if it is not set.
 inline std::string GetProperty(const char* key) {
     char value[PROP_VALUE_MAX];

@@ -137,10 +137,7 @@ int SetOrListFaults(int argc, char** argv) {
     if (argc == 0) {
         return ListFaults();
     }
-    std::string text = argv[0];
-    for (int i = 1; i < argc; ++i) {
-        text.append(" ").append(argv[i]);
-    }
+    const std::string text = Join(argc, argv);
     Fault fault;
     if (const std::string error = ParseFault(text, fault); !error.empty()) {
         return Fail(error, kUsageError);

@@ -69,10 +69,7 @@ int Shell(int argc, char** argv) {
     if (argc == 0) {
         return ExecWithPath(kShell, {"sh"}, bin);
     }
-    std::string command = argv[0];
-    for (int i = 1; i < argc; ++i) {
-        command.append(" ").append(argv[i]);
-    }
+    const std::string command = Join(argc, argv);
     return ExecWithPath(kShell, {"sh", "-c", "--", command.c_str()}, bin);
 }
 

@@ -146,10 +146,7 @@ int Log(int argc, char** argv) {
     if (!valid || optind == argc) {
         return kUsageError;
     }
-    std::string text = argv[optind];
-    for (int i = optind + 1; i < argc; ++i) {
-        text.append(" ").append(argv[i]);
-    }
+    const std::string text = device::Join(argc - optind, argv + optind);
     return __android_log_print(priority, tag, "%s", text.c_str()) >= 0 ? 0
                                                                        : FailForErrno("cannot log");
 }
