@@ -15,24 +15,19 @@ namespace {
 
 constexpr char kShell[] = "/usr/bin/mksh";
 
+// Sets PATH to the directory of the device's commands and the rest.
 int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
-                 const std::string& path) {
+                 const std::string& rest) {
+    const std::string bin = PathBesideProgram("bin");
+    if (bin.find(':') != std::string::npos) {
+        return Fail("'" + bin +
+                    "' cannot be in PATH: it contains ':'; use another build directory");
+    }
     EnterDevice();
-    setenv("PATH", path.c_str(), 1);
+    setenv("PATH", (bin + rest).c_str(), 1);
     arguments.push_back(nullptr);
     execv(program.c_str(), const_cast<char* const*>(arguments.data()));
     return FailForErrno(program);
-}
-
-// Returns the directory of the device's commands. If it cannot be in PATH, prints an error and
-// returns an empty string.
-std::string CommandDirectory() {
-    std::string bin = PathBesideProgram("bin");
-    if (bin.find(':') != std::string::npos) {
-        Fail("'" + bin + "' cannot be in PATH: it contains ':'; use another build directory");
-        return "";
-    }
-    return bin;
 }
 
 }  // namespace
@@ -44,12 +39,10 @@ void EnterDevice() {
 }
 
 int Exec(const std::string& program, std::vector<const char*> arguments) {
-    const std::string bin = CommandDirectory();
     const char* const path = getenv("PATH");
     const bool hasPath = path != nullptr && *path != '\0';
-    return bin.empty() ? 1
-                       : ExecWithPath(program, std::move(arguments),
-                                      bin + ":" + (hasPath ? path : "/usr/bin:/bin"));
+    return ExecWithPath(program, std::move(arguments),
+                        std::string(":") + (hasPath ? path : "/usr/bin:/bin"));
 }
 
 int Shell(int argc, char** argv) {
@@ -59,18 +52,14 @@ int Shell(int argc, char** argv) {
                         "; the shell needs the packages mksh, toybox and original-awk");
         }
     }
-    const std::string bin = CommandDirectory();
-    if (bin.empty()) {
-        return 1;
-    }
     // The startup file and the prompt of an interactive shell.
     setenv("ENV", "/dev/null", 1);
     setenv("PS1", "virtual:$PWD # ", 1);
     if (argc == 0) {
-        return ExecWithPath(kShell, {"sh"}, bin);
+        return ExecWithPath(kShell, {"sh"}, "");
     }
     const std::string command = Join(argc, argv);
-    return ExecWithPath(kShell, {"sh", "-c", "--", command.c_str()}, bin);
+    return ExecWithPath(kShell, {"sh", "-c", "--", command.c_str()}, "");
 }
 
 }  // namespace device
