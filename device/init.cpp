@@ -38,14 +38,14 @@ constexpr char kDriverDirectory[] = "dev/vndbinder";
 constexpr int kMinRestartPauseMs = 50;
 constexpr int kMaxRestartPauseMs = 5000;
 
-constexpr const char* kBootProperties[][2] = {{device::kBuildIdKey, "VIRTUAL-11.0"},
+constexpr const char* kBootProperties[][2] = {{"ro.build.display.id", "VIRTUAL-11.0"},
                                               {"ro.build.version.release", "11"},
                                               {"ro.build.version.sdk", "30"},
                                               {"ro.debuggable", "1"},
                                               {"ro.logsystem.usertype", "1"},
                                               {"ro.product.cpu.abi", "arm64-v8a"},
                                               {"ro.serialno", "virtual"},
-                                              {device::kFirmwareVersionKey, "virtual-1"},
+                                              {"odm.thp.ver_firmware", "virtual-1"},
                                               {"odm.thp.dae_bootflag", "true"},
                                               {device::kDaemonAliveKey, "false"},
                                               {device::kDaemonBinderKey, "0"},

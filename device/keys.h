@@ -5,10 +5,8 @@ namespace device {
 
 // The same as on a phone.
 constexpr char kBootCompletedKey[] = "sys.boot_completed";
-constexpr char kBuildIdKey[] = "ro.build.display.id";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
-constexpr char kFirmwareVersionKey[] = "odm.thp.ver_firmware";
 constexpr char kIsUpdatingFirmwareKey[] = "odm.thp.is_updating_fw";
 constexpr char kPermissiveFlagKey[] = "odm.thp.debug.selinux.permissive";
 constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
