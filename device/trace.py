@@ -116,14 +116,14 @@ def read_trace(trace):
 
 def is_idle(events):
     """Returns true if no event is recent and no daemon is starting"""
-    life = [
-        event["what"]
-        for event in events
-        if event["what"] in ("restart_pause", "daemon_start", "publish", "daemon_stop")
-    ]
-    return life[-1:] not in (["restart_pause"], ["daemon_start"]) and (
-        not events or time.monotonic() - events[-1]["time"] > QUIET_S
-    )
+    is_starting = False
+    for event in events:
+        if event["what"] in ("restart_pause", "daemon_start"):
+            is_starting = True
+        elif event["what"] in ("publish", "daemon_stop"):
+            is_starting = False
+    is_quiet = not events or time.monotonic() - events[-1]["time"] > QUIET_S
+    return is_quiet and not is_starting
 
 
 def record(trace, arguments):
