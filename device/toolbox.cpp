@@ -6,7 +6,6 @@
 #include <sys/system_properties.h>
 #include <unistd.h>
 
-#include <cctype>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
@@ -117,13 +116,14 @@ int Settings(int argc, char** argv) {
 }
 
 // Returns the log priority for the letter, or -1 if it is unknown.
-int PriorityOf(const std::string& letter) {
-    int priority = ANDROID_LOG_SILENT;
-    while (priority >= ANDROID_LOG_VERBOSE &&
-           (letter.length() != 1 || toupper(letter[0]) != host::LogPriorityLetter(priority))) {
-        --priority;
+int PriorityOf(const char* letter) {
+    for (int priority = ANDROID_LOG_VERBOSE; priority <= ANDROID_LOG_SILENT; ++priority) {
+        const char known[] = {host::LogPriorityLetter(priority), '\0'};
+        if (strcasecmp(letter, known) == 0) {
+            return priority;
+        }
     }
-    return priority >= ANDROID_LOG_VERBOSE ? priority : -1;
+    return -1;
 }
 
 int Log(int argc, char** argv) {
