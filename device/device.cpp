@@ -208,11 +208,13 @@ int BringUp(const char* selinuxMode) {
         return FailForErrno("cannot lock the device root");
     }
     const pid_t init = FindInit();
-    const bool isOther = init > 0 && !IsCurrentBuild(init);
-    if (init != 0 && !isOther) {
-        return init < 0 ? 1 : 0;
+    if (init < 0) {
+        return 1;
     }
-    if (isOther) {
+    if (init > 0 && IsCurrentBuild(init)) {
+        return 0;
+    }
+    if (init > 0) {
         Say("the device runs another build; rebooting it");
         if (Stop(0, nullptr) != 0) {
             return 1;
