@@ -86,14 +86,13 @@ class Log:
         if first != self.first:
             self.first, self.position = first, 0
         size = os.fstat(self.file).st_size
-        content = os.pread(self.file, max(size - self.position, 0), self.position)
-        begin = 0
-        while len(content) - begin >= HEADER.size:
-            size, pid, tid, seconds, nanoseconds = HEADER.unpack_from(content, begin)
-            end = begin + HEADER.size + size
-            if size < 3 or end > len(content):
+        left = memoryview(os.pread(self.file, max(size - self.position, 0), self.position))
+        while len(left) >= HEADER.size:
+            size, pid, tid, seconds, nanoseconds = HEADER.unpack_from(left)
+            end = HEADER.size + size
+            if size < 3 or end > len(left):
                 break
-            body = content[begin + HEADER.size : end].decode("latin-1")
+            body = str(left[HEADER.size : end], "latin-1")
             tag, _, text = body[1:-1].partition("\0")
             yield {
                 "letter": PRIORITIES.get(ord(body[0]), "?"),
@@ -106,8 +105,8 @@ class Log:
                 "tid": tid,
                 "when": time.strftime("%m-%d %H:%M:%S", time.localtime(seconds)),
             }
-            self.position += end - begin
-            begin = end
+            self.position += end
+            left = left[end:]
 
 
 def is_shown(entry, options):
