@@ -53,15 +53,15 @@ constexpr const char* kBootProperties[][2] = {{"ro.build.display.id", "VIRTUAL-1
                                               {device::kIsUpdatingFirmwareKey, "false"},
                                               {device::kServiceEnableKey, "1"}};
 
-// Removes the files in a directory, except those whose names begin with `keptPrefix` (by default,
-// none do). Creates a missing directory. Returns false if the directory cannot be opened.
-bool Empty(const char* path, const std::string& keptPrefix = "/") {
+// Removes the files in a directory, except those whose names begin with `keptPrefix`, if any.
+// Creates a missing directory. Returns false if the directory cannot be opened.
+bool Empty(const char* path, const char* keptPrefix = nullptr) {
     const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
     if (!directory.ok()) {
         return false;
     }
     for (const std::string& name : device::FilesIn(path)) {
-        if (name.rfind(keptPrefix, 0) != 0) {
+        if (keptPrefix == nullptr || name.rfind(keptPrefix, 0) != 0) {
             unlinkat(directory.get(), name.c_str(), 0);
         }
     }
@@ -301,7 +301,7 @@ int main(int argc, char** argv) {
         return 1;
     }
     if (!LockDevice()) {
-        return device::FailForErrno("cannot lock init.lock");
+        return device::FailForErrno(std::string("cannot lock ") + host::kInitLockFile);
     }
     const UniqueFd null(open("/dev/null", O_RDWR | O_CLOEXEC));
     if (!null.ok()) {
