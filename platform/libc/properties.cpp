@@ -51,9 +51,9 @@ bool IsUtf8(const std::string& value) {
 }
 
 // Returns true if the owner has no write permission. Then even root cannot write the property.
-bool IsWriteProtected(int properties, const std::string& name) {
+bool IsWriteProtected(const std::string& name) {
     struct stat status = {};
-    return fstatat(properties, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+    return fstatat(host::PropertiesDirectory(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
            (status.st_mode & S_IWUSR) == 0;
 }
 
@@ -68,10 +68,9 @@ int Get(const std::string& name, char* value) {
 }
 
 bool Set(const std::string& name, const std::string& value) {
-    const int properties = host::PropertiesDirectory();
-    return host::BrokenPropertyRule(name, value) == nullptr &&
-           !IsWriteProtected(properties, name) &&
-           host::ReplaceFileAt(properties, name, value, IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0);
+    const unsigned flags = IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0;
+    return host::BrokenPropertyRule(name, value) == nullptr && !IsWriteProtected(name) &&
+           host::ReplaceFileAt(host::PropertiesDirectory(), name, value, flags);
 }
 
 }  // namespace
