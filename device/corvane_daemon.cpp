@@ -60,11 +60,10 @@ std::string Answer(const std::string& command, const std::string& params) {
     }
     if (command == "TSA_ExecuteCommand") {
         // The parameters are another command: its name, a space and its parameters.
-        const size_t space = std::min(params.find(' '), params.length());
-        const std::string name = params.substr(0, space);
-        return name.empty() || name == command
-                       ? command + ": missing or invalid command"
-                       : Answer(name, space < params.length() ? params.substr(space + 1) : "");
+        const std::string name = params.substr(0, params.find(' '));
+        const std::string rest = params.substr(std::min(name.length() + 1, params.length()));
+        return name.empty() || name == command ? command + ": missing or invalid command"
+                                               : Answer(name, rest);
     }
     const bool isName = !command.empty() && command.find(' ') == std::string::npos;
     if (isName && strstr(kCommands, (" " + command + " ").c_str()) != nullptr) {
