@@ -58,13 +58,14 @@ class RemoteBinder : public IBinder {
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* /* cookie */,
                            uint32_t /* flags */, wp<DeathRecipient>* /* outRecipient */) override {
         const auto found = std::find(mRecipients.begin(), mRecipients.end(), recipient);
-        const bool isLinked = found != mRecipients.end();
-        if (isLinked) {
+        status_t status = android::OK;
+        if (!mConnection.ok()) {
+            status = android::DEAD_OBJECT;  // OwnerDied() has removed all recipients
+        } else if (found == mRecipients.end()) {
+            status = android::NAME_NOT_FOUND;
+        } else {
             mRecipients.erase(found);
         }
-        const status_t status = !mConnection.ok() ? android::DEAD_OBJECT
-                                : isLinked        ? android::OK
-                                                  : android::NAME_NOT_FOUND;
         TraceEvent("unlink_to_death").Add("status", status);
         return status;
     }
