@@ -50,8 +50,8 @@ int Setprop(int /* argc */, char** argv) {
     const char* const name = argv[1];
     const std::string value = argv[2];
     // Do not write an unchanged value: init acts on every write.
-    if ((!value.empty() && device::GetProperty(name) == value) ||
-        __system_property_set(name, value.c_str()) == 0) {
+    const bool isUnchanged = !value.empty() && device::GetProperty(name) == value;
+    if (isUnchanged || __system_property_set(name, value.c_str()) == 0) {
         return 0;
     }
     fprintf(stderr, "Failed to set property '%s' to '%s'.\n", name, value.c_str());
