@@ -120,8 +120,9 @@ Fault TakeFault(const std::string& command) {
     const host::UniqueFd lock = LockFault();
     const std::string text = GetProperty(kFaultKey);
     Fault fault;
-    if (!lock.ok() || !ParseFault(text, fault).empty() || fault.kind == FaultKind::kNone ||
-        (fault.kind == FaultKind::kCaptestRestart && command != "captest")) {
+    const bool isValid = lock.ok() && ParseFault(text, fault).empty();
+    const bool isForCaptest = fault.kind == FaultKind::kCaptestRestart;
+    if (!isValid || fault.kind == FaultKind::kNone || (isForCaptest && command != "captest")) {
         return {};
     }
     if (fault.count > 0) {
