@@ -1,4 +1,5 @@
 """The device's shell commands, recorded answers and adb"""
+import os
 from subprocess import PIPE, Popen
 
 import pytest
@@ -107,6 +108,13 @@ def test_adb_shell_reads_standard_input_without_n(device, option, count):
 def test_keeps_settings_in_their_directory(device):
     device.run("settings", "put", "system", "../../selinux", "Permissive")
     assert device.output("getenforce") == "Enforcing\n"
+
+
+def test_refuses_a_fifo_as_the_log(device):
+    (device.root / "log").unlink()
+    os.mkfifo(device.root / "log")
+    assert "not a regular file" in device.run("logcat", "-d").stderr
+    assert device.tpd("captest") == PASS
 
 
 def test_shell_finds_exactly_the_listed_commands(device):
