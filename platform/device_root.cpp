@@ -1,5 +1,6 @@
 #include "platform/device_root.h"
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -41,15 +42,23 @@ bool IsMarked(int root) {
     return fstatat(root, kMark, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
 }
 
-// Marks an empty directory as a device root. Returns null, or the reason for the failure.
+// Marks an empty directory as a device root. Returns null, or the reason for the failure. Does not
+// need /proc, unlike std::filesystem with a file descriptor.
 const char* Mark(int root) {
-    std::error_code error;
-    if (std::filesystem::is_empty("/proc/self/fd/" + std::to_string(root), error)) {
+    const int opened = openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    DIR* const directory = opened < 0 ? nullptr : fdopendir(opened);
+    if (directory == nullptr) {
+        return strerror(errno);
+    }
+    int entries = 0;
+    while (readdir(directory) != nullptr) {
+        ++entries;
+    }
+    closedir(directory);
+    const bool isEmpty = entries == 2;  // "." and ".."
+    if (isEmpty) {
         const UniqueFd mark(openat(root, kMark, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
         return mark.ok() || errno == EEXIST ? nullptr : strerror(errno);
-    }
-    if (error) {
-        return strerror(error.value());
     }
     // Another process may have marked it in the meantime.
     return IsMarked(root) ? nullptr
