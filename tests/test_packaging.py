@@ -1,4 +1,5 @@
 """The packages, completions, manuals and pages"""
+import itertools
 import re
 import stat
 import subprocess
@@ -114,9 +115,9 @@ def test_manual_describes_the_faults(stopped_device, build):
 
 def test_android_bp_lists_the_sources_of_the_product():
     directories = "binder bounded_libc cmdline daemon log main property".split()
-    for_device = re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp"))
-    here = [str(path.relative_to(SOURCE)) for path in SOURCE.glob("*/*.cpp")]
-    assert sorted(for_device) == sorted(path for path in here if path.split("/")[0] in directories)
+    listed = re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp"))
+    paths = [path for name in directories for path in (SOURCE / name).glob("*.cpp")]
+    assert sorted(listed) == sorted(str(path.relative_to(SOURCE)) for path in paths)
 
 
 def is_idle(device):
@@ -138,10 +139,10 @@ def replay(device, session, directory):
     pipes = {"stdin": subprocess.PIPE, "stdout": subprocess.PIPE, "text": True}
     with subprocess.Popen(["bash"], env=device.env, cwd=directory, **pipes) as bash:
         for command, expected in steps(session):
-            bash.stdin.write("{ %s\n} </dev/null; printf '\\0'\n" % command)
+            bash.stdin.write("{ %s\n} </dev/null\necho; echo END\n" % command)
             bash.stdin.flush()
-            shown = iter(lambda: bash.stdout.read(1) or "\0", "\0")
-            assert "".join(shown).rstrip("\n") == expected.rstrip("\n"), command
+            lines = itertools.takewhile(lambda line: line != "END\n", bash.stdout)
+            assert "".join(lines).rstrip("\n") == expected.rstrip("\n"), command
             wait_until(lambda: is_idle(device))
 
 
@@ -155,12 +156,8 @@ def test_replays_the_sessions_of_a_page(installed, installed_device, tmp_path, p
 
 @pytest.mark.parametrize("page", ["tpd.1", "tpd-device.1"])
 def test_runs_the_examples_of_a_manual(installed, installed_device, build, page):
-    text = (
-        (build / "docs" / page)
-        .read_text()
-        .replace(r"\-", "-")
-        .replace("/usr/", f"{installed}/usr/")
-    )
+    text = (build / "docs" / page).read_text().replace(r"\-", "-")
+    text = text.replace("/usr/", f"{installed}/usr/")
     blocks = re.findall(r"^\.nf\n(?:\.RS\n)?(.*?)^\.(?:RE|fi)", text, re.S | re.M)
     examples = [block for block in blocks if re.match("adb|export|tpd-device", block)]
     assert len(examples) > 3

@@ -58,7 +58,7 @@ class Device:
         return self.output(*self.tool, *arguments, **options)
 
     def shell(self, command):
-        return self.run("adb", "shell", command).stdout
+        return self.output("adb", "shell", command)
 
     def fault(self, text):
         self.output("device", "fault", *text.split())
