@@ -47,7 +47,7 @@ constexpr int kStopLimitMs = 5000;
 constexpr std::chrono::milliseconds kPollPause(5);
 
 int UsageError(const std::string& error) {
-    return device::Fail(error + "; see " + device::Command("--help"), device::kUsageError);
+    return Fail(error + "; see " + device::Command("--help"), device::kUsageError);
 }
 
 // Prints a message to standard error. Returns 0, the exit status for success.
@@ -282,14 +282,14 @@ int Run(int argc, char** argv) {
     return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
 }
 
-// The first argument of trace.py is a file descriptor of the device root.
+// The first arguments of trace.py are a file descriptor of the device root and this program's name.
 int Trace(int argc, char** argv) {
     if (!ExpectRunning()) {
         return 1;
     }
     host::LookForTrace();  // removes the trace file if its owner was killed
     const std::string root = std::to_string(dup(host::DeviceRoot()));
-    std::vector<const char*> arguments = {root.c_str()};
+    std::vector<const char*> arguments = {root.c_str(), program_invocation_short_name};
     arguments.insert(arguments.end(), argv, argv + argc);
     return ExecSibling("trace.py", arguments);
 }

@@ -59,8 +59,8 @@ std::string ParseNumber(const std::string& word, const Range& range, int64_t& nu
            std::to_string(range.min) + " to " + std::to_string(range.max);
 }
 
-// Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error message that names
-// the invalid word.
+// Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error message that names the
+// invalid word.
 std::string ParseFault(const std::string& text, Fault& fault) {
     std::istringstream words(text);
     const auto nextWord = [&words] {

@@ -85,8 +85,8 @@ class Log:
         first = os.pread(self.file, HEADER.size, 0)
         if first != self.first:
             self.first, self.position = first, 0
-        size = os.fstat(self.file).st_size
-        left = memoryview(os.pread(self.file, max(size - self.position, 0), self.position))
+        unread = max(os.fstat(self.file).st_size - self.position, 0)
+        left = memoryview(os.pread(self.file, unread, self.position))
         while len(left) >= HEADER.size:
             size, pid, tid, seconds, nanoseconds = HEADER.unpack_from(left)
             end = HEADER.size + size

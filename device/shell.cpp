@@ -15,16 +15,17 @@ namespace {
 
 constexpr char kShell[] = "/usr/bin/mksh";
 
-// Sets PATH to the directory of the device's commands and the rest.
+// Runs the program with the directory of the device's commands first in PATH. `others` is the rest
+// of PATH, with a colon before every directory.
 int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
-                 const std::string& rest) {
+                 const std::string& others) {
     const std::string bin = PathBesideProgram("bin");
     if (bin.find(':') != std::string::npos) {
         return Fail("'" + bin +
                     "' cannot be in PATH: it contains ':'; use another build directory");
     }
     EnterDevice();
-    setenv("PATH", (bin + rest).c_str(), 1);
+    setenv("PATH", (bin + others).c_str(), 1);
     arguments.push_back(nullptr);
     execv(program.c_str(), const_cast<char* const*>(arguments.data()));
     return FailForErrno(program);

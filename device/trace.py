@@ -12,6 +12,8 @@ import subprocess
 import sys
 import time
 
+# The command that runs this script passes a file descriptor of the device root, and its own name.
+ROOT, PROGRAM = int(sys.argv[1]), sys.argv[2]
 TRACE = "trace"
 ESCAPES = {ord("#"): "#35;", ord(";"): "#59;"}  # in Mermaid text
 QUIET_S = 0.15  # The device is idle if no event has occurred for this time.
@@ -95,7 +97,7 @@ def recording(root):
     try:
         os.link(temporary, TRACE, src_dir_fd=directory, dst_dir_fd=root)
     except FileExistsError:
-        sys.exit("device: another trace is running")
+        sys.exit(f"{PROGRAM}: another trace is running")
     finally:
         os.unlink(temporary, dir_fd=directory)
     try:
@@ -155,24 +157,23 @@ def print_diagram(events):
 
 
 def main():
-    parser = argparse.ArgumentParser(prog="device trace", allow_abbrev=False)
+    parser = argparse.ArgumentParser(prog=f"{PROGRAM} trace", allow_abbrev=False)
     parser.add_argument("--bytes", action="store_true", help="show the bytes of each request")
     form = parser.add_mutually_exclusive_group()
     form.add_argument("--json", action="store_true", help="print the events as recorded")
     form.add_argument("--mermaid", action="store_true", help="print a sequence diagram")
     parser.add_argument("arguments", nargs=argparse.REMAINDER, metavar="ARGUMENT")
-    root = int(sys.argv[1])  # `device` passes the device root's descriptor.
-    options = parser.parse_args(sys.argv[2:])
+    options = parser.parse_args(sys.argv[3:])
     if options.arguments[:1] == ["--"]:
         del options.arguments[0]
     sys.stdout.reconfigure(errors="backslashreplace")
     for number in signal.SIGTERM, signal.SIGHUP:
         signal.signal(number, signal.default_int_handler)
-    with recording(root) as trace:
+    with recording(ROOT) as trace:
         start = time.monotonic()
         events, result = record(trace, options.arguments)
         if not os.fstat(trace).st_mode & stat.S_IWUSR:
-            print("device: events were lost; is the file system full?", file=sys.stderr)
+            print(f"{PROGRAM}: events were lost; is the file system full?", file=sys.stderr)
     signal.signal(signal.SIGPIPE, signal.SIG_DFL)
     if options.json:
         print(*map(json.dumps, events), sep="\n")
@@ -187,4 +188,4 @@ if __name__ == "__main__":
     try:
         main()
     except OSError as error:
-        sys.exit(f"device: {error}")
+        sys.exit(f"{PROGRAM}: {error}")
