@@ -31,6 +31,12 @@ def test_fault_has_its_documented_result(device, fault, text, dies):
     wait_until(lambda: bool(device.events("daemon_exit")) == dies)
 
 
+def test_captest_restart_does_not_apply_to_other_commands(device):
+    device.fault("captest_restart")
+    device.tpd("help")
+    assert device.events("fault") == []
+
+
 def test_oversized_reply_fails_the_call_but_keeps_the_connection(device):
     device.fault("huge 1040384 1")
     assert device.tpd("captest") == PASS
