@@ -2,7 +2,6 @@
 // Properties make it fail; see keys.h and faults.h.
 #include <android/log.h>
 #include <sys/system_properties.h>
-#include <sys/time.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -23,6 +22,7 @@
 #include "answers.h"
 #include "common.h"
 #include "faults.h"
+#include "platform/libbinder/vndbinder.h"
 #include "platform/trace.h"
 
 namespace {
@@ -34,8 +34,6 @@ using std::chrono::milliseconds;
 
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr uint32_t kExecuteCommandCode = 0;
-// Just long enough to send the reply.
-constexpr int kDieAfterReplyUs = 2000;
 // The phone's commands. The spaces around each name let strstr() find whole names only.
 constexpr char kCommands[] = " " TPD_DAEMON_COMMANDS " ";
 
@@ -75,13 +73,6 @@ std::string Answer(const std::string& command, const std::string& params) {
 [[noreturn]] void Die() {
     raise(SIGKILL);
     abort();
-}
-
-// Kills the process after the reply has been sent. Uses a timer, because starting a thread
-// could fail.
-void DieAfterReply() {
-    constexpr itimerval kDelay = {{0, 0}, {0, kDieAfterReplyUs}};
-    [[maybe_unused]] static const int started = setitimer(ITIMER_REAL, &kDelay, nullptr);
 }
 
 class DaemonService : public android::BBinder {
@@ -124,7 +115,7 @@ class DaemonService : public android::BBinder {
                 Die();
             case FaultKind::kDieAfter:
             case FaultKind::kCaptestRestart:
-                DieAfterReply();
+                host::AfterReply(Die);
                 break;
             case FaultKind::kHang:
                 std::this_thread::sleep_for(milliseconds(fault.argument));

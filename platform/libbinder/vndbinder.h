@@ -33,6 +33,9 @@ android::sp<android::IBinder> NewProxy(UniqueFd connection);
 android::status_t PublishService(const std::string& driver, const std::string& name,
                                  const android::sp<android::IBinder>& binder);
 
+// Calls `action` on this thread when the reply to the call that it executes has been sent.
+void AfterReply(void (*action)());
+
 // A request: this header, then a parcel of `size` bytes. Numbers are in the machine's byte order.
 struct RequestHeader {
     uint32_t code;

@@ -1,5 +1,4 @@
 #include <fcntl.h>
-#include <pthread.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -9,7 +8,6 @@
 #include <chrono>
 #include <condition_variable>
 #include <deque>
-#include <memory>
 #include <mutex>
 #include <thread>
 #include <utility>
@@ -32,21 +30,12 @@ constexpr std::chrono::milliseconds kRetryPause(10);
 // again.
 constexpr int kListenerDescriptor = 900;
 
-// Runs `work` on a detached thread. Retries if no thread can be created; std::thread would abort
-// the process.
-template <typename Work>
-void StartThread(Work work) {
-    const auto run = [](void* argument) -> void* {
-        const std::unique_ptr<Work> owned(static_cast<Work*>(argument));
-        (*owned)();
-        return nullptr;
-    };
-    auto* const argument = new Work(std::move(work));
-    pthread_t thread;
-    while (pthread_create(&thread, nullptr, run, argument) != 0) {
-        std::this_thread::sleep_for(kRetryPause);
+thread_local void (*gAfterReply)() = nullptr;
+
+void Replied() {
+    if (gAfterReply != nullptr) {
+        gAfterReply();
     }
-    pthread_detach(thread);
 }
 
 struct Request {
@@ -84,6 +73,7 @@ class Service {
             for (const Request& call : calls) {
                 Parcel reply;
                 Execute(call, &reply);
+                Replied();
             }
             lock.lock();
         }
@@ -128,7 +118,9 @@ void ServeClient(const UniqueFd& connection, Service* service) {
         if (status != android::OK) {
             reply.resize(0);
         }
-        if (!SendMessage(connection, ReplyHeader{status, 0}, reply)) {
+        const bool isSent = SendMessage(connection, ReplyHeader{status, 0}, reply);
+        Replied();
+        if (!isSent) {
             return;
         }
     }
@@ -143,13 +135,15 @@ void ServeClient(const UniqueFd& connection, Service* service) {
             std::this_thread::sleep_for(kRetryPause);
             continue;
         }
-        StartThread([connection = std::move(connection), service] {
+        std::thread([connection = std::move(connection), service] {
             ServeClient(connection, service);
-        });
+        }).detach();
     }
 }
 
 }  // namespace
+
+void AfterReply(void (*action)()) { gAfterReply = action; }
 
 status_t PublishService(const std::string& driver, const std::string& name,
                         const sp<IBinder>& binder) {
@@ -165,8 +159,10 @@ status_t PublishService(const std::string& driver, const std::string& name,
         return -errno;
     }
     auto* const service = new Service(binder);  // its threads use it until the process exits
-    StartThread([service] { service->Drain(); });
-    StartThread([listener = std::move(listener), service] { AcceptClients(listener, service); });
+    std::thread([service] { service->Drain(); }).detach();
+    std::thread([listener = std::move(listener), service] {
+        AcceptClients(listener, service);
+    }).detach();
     return android::OK;
 }
 
