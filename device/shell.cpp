@@ -1,10 +1,12 @@
 #include "shell.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 
 #include "common.h"
 #include "platform/device_root.h"
@@ -34,9 +36,14 @@ int ExecWithPath(const std::string& program, std::vector<const char*> arguments,
 }  // namespace
 
 void EnterDevice() {
-    const std::string root = host::DeviceRootPath();
-    setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
-    setenv("TPD_DEVICE_PROCESS", root.c_str(), 1);
+    struct stat root = {};
+    fstat(host::DeviceRoot(), &root);
+    const std::string identity = std::to_string(root.st_dev) + ":" + std::to_string(root.st_ino);
+    setenv("TPD_DEVICE_PROCESS", identity.c_str(), 1);
+    std::error_code error;
+    const std::string opened = "/proc/self/fd/" + std::to_string(host::DeviceRoot());
+    const std::filesystem::path path = std::filesystem::read_symlink(opened, error);
+    setenv("TPD_DEVICE_ROOT", error ? host::DeviceRootPath().c_str() : path.c_str(), 1);
 }
 
 int Exec(const std::string& program, std::vector<const char*> arguments) {

@@ -98,7 +98,10 @@ class Device:
 
     def processes(self, program=""):
         """Returns the IDs of the device's processes that run the program."""
-        known = f"TPD_DEVICE_PROCESS={self.root}".encode()
+        if not self.root.exists():
+            return []
+        root = self.root.stat()
+        known = f"TPD_DEVICE_PROCESS={root.st_dev}:{root.st_ino}".encode()
         found = []
         for process in pathlib.Path("/proc").glob("[0-9]*"):
             with contextlib.suppress(OSError):
