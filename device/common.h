@@ -25,9 +25,14 @@ namespace device {
 constexpr int kFailure = 1;
 constexpr int kUsageError = 2;
 
-// Prints the program's name and the error to standard error. Returns `status`.
+// Prints the program's name and the message to standard error.
+inline void Inform(const std::string& message) {
+    fprintf(stderr, "%s: %s\n", program_invocation_short_name, message.c_str());
+}
+
+// Like Inform(). Returns `status`.
 inline int Fail(const std::string& error, int status = kFailure) {
-    fprintf(stderr, "%s: %s\n", program_invocation_short_name, error.c_str());
+    Inform(error);
     return status;
 }
 

@@ -1,241 +1,60 @@
-// The command that starts, stops and uses the virtual device. Init holds a record lock while the
-// device runs. F_GETLK finds the holder without taking the lock.
-#include <fcntl.h>
+// The command that starts, stops and uses the virtual device.
 #include <limits.h>
-#include <poll.h>
-#include <sys/file.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <chrono>
-#include <csignal>
 #include <cstdio>
 #include <cstring>
-#include <filesystem>
-#include <functional>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "answers.h"
 #include "common.h"
 #include "faults.h"
+#include "life.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/trace.h"
-#include "platform/unique_fd.h"
 #include "shell.h"
-
-// The C library's header lacks extern "C".
-extern "C" {
-#include <sys/pidfd.h>
-}
 
 namespace {
 
 using device::Fail;
 using device::FailForErrno;
-using host::UniqueFd;
 
 // Exit statuses of `device status`.
 constexpr int kExitStopped = 3;
 constexpr int kExitUnknown = 4;
 
-constexpr int kFindLimitMs = 200;
-constexpr int kStartLimitMs = 10000;
-constexpr int kStopLimitMs = 5000;
-constexpr std::chrono::milliseconds kPollPause(5);
-
 int UsageError(const std::string& error) {
     return Fail(error + "; see " + device::Command("--help"), device::kUsageError);
 }
 
-// Prints a message to standard error. Returns 0, the exit status for success.
-int Say(const std::string& what) { return Fail(what, 0); }
-
-bool WaitUntil(int limitMs, const std::function<bool()>& isDone) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::milliseconds(limitMs);
-    while (!isDone()) {
-        if (std::chrono::steady_clock::now() >= deadline) {
-            return false;
-        }
-        std::this_thread::sleep_for(kPollPause);
-    }
-    return true;
-}
-
-std::filesystem::path ProgramOf(pid_t process, std::error_code& error) {
-    return std::filesystem::read_symlink("/proc/" + std::to_string(process) + "/exe", error);
-}
-
-// Returns the ID of the process that holds init's lock, or 0 if the lock is free. If the holder
-// cannot be identified, stores the reason and returns -1.
-pid_t LookForInit(std::string& reason) {
-    const UniqueFd lock = host::OpenFile(host::kInitLockFile, O_RDONLY);
-    if (!lock.ok() && errno == ENOENT) {
-        return 0;
-    }
-    struct flock holder = {};
-    holder.l_type = F_WRLCK;
-    std::error_code error;
-    if (!lock.ok() || fcntl(lock.get(), F_GETLK, &holder) != 0) {
-        reason = std::string(host::kInitLockFile) + ": " + strerror(errno);
-    } else if (holder.l_type == F_UNLCK) {
-        return 0;
-    } else if (holder.l_pid <= 0) {
-        reason = "init runs in another PID namespace";
-    } else if (const auto program = ProgramOf(holder.l_pid, error); error) {
-        reason = "process " + std::to_string(holder.l_pid) + ": " + error.message();
-    } else if (program.filename().string().rfind("init", 0) != 0) {
-        reason = std::string(host::kInitLockFile) + " is held by " + program.string() +
-                 ", which is not init";
-    } else {
-        return holder.l_pid;
-    }
-    return -1;
-}
-
-// Returns init's process ID, 0 if the device is stopped, or -1 after an error message. Retries
-// because an exiting init loses its /proc/PID/exe link before its lock.
-pid_t FindInit() {
-    pid_t init = -1;
-    std::string reason;
-    WaitUntil(kFindLimitMs, [&init, &reason] { return (init = LookForInit(reason)) >= 0; });
-    if (init < 0) {
-        Fail("cannot tell whether the device is running: " + reason);
-    }
-    return init;
-}
-
-// Returns true if the device is running. Otherwise prints an error.
-bool ExpectRunning() {
-    const pid_t init = FindInit();
-    if (init == 0) {
-        Fail("the device is stopped; " + device::Command("start") + " boots it");
-    }
-    return init > 0;
-}
-
-// Returns true if the process runs this build's init, or has just exited.
-bool IsCurrentBuild(pid_t init) {
-    std::error_code error;
-    const std::filesystem::path program = ProgramOf(init, error);
-    return error || program == device::PathBesideProgram("init");
-}
-
-// Sends SIGTERM, then SIGKILL after a time-out. The pidfd protects against a reused process ID.
-int Stop(int argc, char** argv) {
-    const pid_t init = FindInit();
-    if (init <= 0) {
-        return init < 0 ? 1 : Say("already stopped");
-    }
-    const std::string name = "process " + std::to_string(init);
-    const UniqueFd process(pidfd_open(init, 0));
-    if (!process.ok() && errno != ESRCH) {
-        return FailForErrno(name);
-    }
-    const bool isInit = process.ok() && FindInit() == init;
-    if (!isInit) {
-        return Stop(argc, argv);
-    }
-    pollfd exited = {process.get(), POLLIN, 0};
-    pidfd_send_signal(process.get(), SIGTERM, nullptr, 0);
-    if (poll(&exited, 1, kStopLimitMs) == 0) {
-        pidfd_send_signal(process.get(), SIGKILL, nullptr, 0);
-        poll(&exited, 1, kStopLimitMs);
-    }
-    if (exited.revents == 0) {
-        return Fail(name + " does not exit");
-    }
-    return Say("stopped");
-}
-
-int AwaitDaemon() {
-    pid_t init = 0;
-    WaitUntil(kStartLimitMs, [&init] {
-        const bool isUp =
-                device::IsDaemonAlive() && device::GetProperty(device::kBootCompletedKey) == "1";
-        init = FindInit();
-        return init <= 0 || isUp || !device::IsDaemonEnabled();
-    });
-    if (init <= 0) {
-        return init < 0 ? 1 : Fail("the device was stopped");
-    }
-    return device::IsDaemonAlive()
-                   ? 0
-                   : Fail("the daemon is not alive; see " + device::Command("shell logcat -d") +
-                          ", or start a stopped daemon with " + device::Command("shell tpd start"));
-}
-
-// Starts init and waits until it has booted the device. Init prints its own errors.
-int Boot(const char* selinuxMode) {
-    int report[2];
-    if (pipe2(report, O_CLOEXEC) != 0) {
-        return FailForErrno("cannot create a pipe");
-    }
-    const UniqueFd reader(report[0]);
-    UniqueFd writer(report[1]);
-    const std::string program = device::PathBesideProgram("init");
-    const pid_t init = fork();
-    if (init < 0) {
-        return FailForErrno("cannot fork");
-    }
-    if (init == 0) {
-        dup2(writer.get(), STDOUT_FILENO);
-        device::EnterDevice();
-        execl(program.c_str(), program.c_str(), selinuxMode, nullptr);
-        _exit(FailForErrno(program));
-    }
-    writer.reset();
-    char byte = 0;
-    if (read(reader.get(), &byte, 1) != 1) {
-        return Fail("init did not boot the device");
-    }
-    Say("started in " + host::DeviceRootPath() + ", SELinux is " + selinuxMode);
-    return AwaitDaemon();
-}
-
-// Boots the device unless this build's init is running. A lock on the device root prevents
-// concurrent starts.
-int BringUp(const char* selinuxMode) {
-    const UniqueFd root = host::OpenDirectory(".");
-    const auto isFree = [&root] {
-        return flock(root.get(), LOCK_EX | LOCK_NB) == 0 || errno != EWOULDBLOCK;
-    };
-    const bool isLocked = root.ok() && WaitUntil(2 * kStartLimitMs, isFree) &&
-                          flock(root.get(), LOCK_EX | LOCK_NB) == 0;
-    if (!isLocked) {
-        return FailForErrno("cannot lock the device root");
-    }
-    const pid_t init = FindInit();
-    if (init < 0) {
-        return 1;
-    }
-    if (init > 0 && IsCurrentBuild(init)) {
-        return 0;
-    }
-    if (init > 0) {
-        Say("the device runs another build; rebooting it");
-        if (Stop(0, nullptr) != 0) {
-            return 1;
-        }
-    }
-    return Boot(selinuxMode);
-}
+int Stop(int, char**) { return device::Stop(); }
 
 int Start(int argc, char** argv) {
     if (argc > 0 && strcmp(argv[0], "--permissive") != 0) {
         return UsageError(std::string("start: unexpected argument '") + argv[0] + "'");
     }
-    const pid_t init = FindInit();
-    const int status = BringUp(argc > 0 ? "Permissive" : "Enforcing");
-    if (init > 0 && status == 0 && FindInit() == init) {
-        Say("already running; SELinux is " + device::SelinuxMode());
+    const pid_t init = device::FindInit().process;
+    const int status =
+            device::BringUp(argc > 0 ? "Permissive" : "Enforcing", device::Until::kDaemonAlive);
+    if (status != 0) {
+        return status;
     }
-    return status != 0 ? status : AwaitDaemon();
+    if (argc > 0 && !host::ReplaceFile(host::kSelinuxFile, "Permissive")) {
+        return FailForErrno("cannot set the SELinux mode");
+    }
+    if (device::FindInit().process == init) {
+        device::Inform("already running; SELinux is " + device::SelinuxMode());
+    }
+    return 0;
 }
 
-int Reboot(int, char**) { return Stop(0, nullptr) == 0 ? Start(0, nullptr) : 1; }
+int Reboot(int, char**) {
+    const int status = device::Stop();
+    return status != 0 ? status : Start(0, nullptr);
+}
 
 constexpr struct {
     const char* label;
@@ -249,13 +68,17 @@ constexpr struct {
                     {"permissive flag", device::kPermissiveFlagKey, "unset"}};
 
 int Status(int, char**) {
-    const pid_t init = FindInit();
-    if (init <= 0) {
-        puts(init < 0 ? "unknown" : "stopped");
-        return init < 0 ? kExitUnknown : kExitStopped;
+    const device::Init init = device::FindInit();
+    if (init.state == device::State::kUnknown) {
+        puts("unknown");
+        return Fail(init.reason, kExitUnknown);
     }
-    printf("running in %s, process %d%s\n", host::DeviceRootPath().c_str(), init,
-           IsCurrentBuild(init) ? "" : ", another build");
+    if (init.state == device::State::kStopped) {
+        puts("stopped");
+        return kExitStopped;
+    }
+    printf("running in %s, process %d%s\n", host::DeviceRootPath().c_str(), init.process,
+           init.state == device::State::kOtherBuild ? ", another build" : "");
     for (const auto& line : kStatusLines) {
         const std::string value = device::GetProperty(line.key);
         printf("%s: %s\n", line.label, value.empty() ? line.unset : value.c_str());
@@ -270,7 +93,7 @@ int Root(int, char**) {
     return 0;
 }
 
-int Shell(int argc, char** argv) { return ExpectRunning() ? device::Shell(argc, argv) : 1; }
+int Shell(int argc, char** argv) { return device::ExpectRunning() ? device::Shell(argc, argv) : 1; }
 
 int ExecSibling(const char* name, std::vector<const char*> arguments) {
     arguments.insert(arguments.begin(), name);
@@ -278,13 +101,13 @@ int ExecSibling(const char* name, std::vector<const char*> arguments) {
 }
 
 int Run(int argc, char** argv) {
-    const int status = BringUp("Permissive");
+    const int status = device::BringUp("Permissive", device::Until::kBooted);
     return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
 }
 
 // The first arguments of trace.py are a file descriptor of the device root and this program's name.
 int Trace(int argc, char** argv) {
-    if (!ExpectRunning()) {
+    if (!device::ExpectRunning()) {
         return 1;
     }
     host::LookForTrace();  // removes the trace file if its owner was killed
@@ -295,7 +118,7 @@ int Trace(int argc, char** argv) {
 }
 
 int Fault(int argc, char** argv) {
-    const bool isPossible = argc == 0 || ExpectRunning();
+    const bool isPossible = argc == 0 || device::ExpectRunning();
     return isPossible ? device::SetOrListFaults(argc, argv) : 1;
 }
 

@@ -1,42 +1,39 @@
-// The device's init: boots the device and supervises the touch daemon. "odm.thp.service_enable"
-// starts and stops the daemon. Init restarts a daemon that exits, and counts the restarts.
+// The device's init: boots the device and runs its services. The property
+// "odm.thp.service_enable" starts and stops the touch daemon, as ctl.start, ctl.stop and
+// ctl.restart do with the name of any service.
 //
-// init MODE: boots the device with SELinux in MODE. Writes one byte to standard output when the
-// device has booted, and prints earlier failures to standard error. Exits on SIGTERM or SIGINT, or
-// when the properties directory is removed.
+// init MODE: boots the device with SELinux in MODE. Prints errors to standard error until the
+// device has booted. Exits on SIGTERM or SIGINT, or when the mark or the properties directory is
+// removed.
 #include <android/log.h>
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/inotify.h>
-#include <sys/prctl.h>
 #include <sys/signalfd.h>
 #include <sys/stat.h>
 #include <sys/system_properties.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <chrono>
 #include <csignal>
 #include <cstdio>
-#include <cstdlib>
 #include <string>
-#include <thread>
+#include <vector>
 
 #include "common.h"
+#include "life.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/trace.h"
 #include "platform/unique_fd.h"
+#include "service.h"
 
 namespace {
 
+using device::Service;
 using host::UniqueFd;
 
 constexpr char kDriverDirectory[] = "dev/vndbinder";
-// The pause doubles each time the daemon exits before it is alive.
-constexpr int kMinRestartPauseMs = 50;
-constexpr int kMaxRestartPauseMs = 5000;
 
 constexpr const char* kBootProperties[][2] = {{"ro.build.display.id", "VIRTUAL-11.0"},
                                               {"ro.build.version.release", "11"},
@@ -68,13 +65,20 @@ bool Empty(const char* path, const char* keptPrefix = nullptr) {
     return true;
 }
 
-// Makes this process the device's only init. Closing any descriptor of the file would release the
-// record lock, so this process must not open the file again.
-bool LockDevice() {
-    static const UniqueFd file = host::OpenFile(host::kInitLockFile, O_RDWR | O_CREAT);
-    struct flock whole = {};
-    whole.l_type = F_WRLCK;
-    return file.ok() && fcntl(file.get(), F_SETLK, &whole) == 0;
+// Returns a descriptor of the mark, which stays open: closing any descriptor of the file would
+// release the record locks.
+int Mark() {
+    static const int mark = host::OpenFile(host::kMarkFile, O_RDWR).release();
+    return mark;
+}
+
+// Locks or unlocks (F_WRLCK, F_UNLCK) a byte of the mark.
+bool SetLock(device::InitLock byte, short type) {
+    struct flock lock = {};
+    lock.l_type = type;
+    lock.l_start = static_cast<off_t>(byte);
+    lock.l_len = 1;
+    return fcntl(Mark(), F_SETLK, &lock) == 0;
 }
 
 // Writes the files directly: another process may have just set a "ro." property, which
@@ -105,111 +109,94 @@ const char* Boot(const char* selinuxMode) {
     return host::ReplaceFile(host::kSelinuxFile, selinuxMode) ? nullptr : host::kSelinuxFile;
 }
 
-// Returns true if a property that init watches has been written since the last call.
-bool DrainEvents(const UniqueFd& watch) {
+bool IsRequest(const std::string& property) {
+    return property == device::kServiceEnableKey || property == device::kUpdatingFirmwareKey ||
+           property.rfind(device::kControlPrefix, 0) == 0;
+}
+
+// Returns the properties that init acts on and that were written since the last call, in order.
+std::vector<std::string> ReadRequests(const UniqueFd& watch) {
     alignas(inotify_event) char events[16384];
     const ssize_t size = read(watch.get(), events, sizeof(events));
-    bool isWritten = false;
+    std::vector<std::string> requests;
     for (ssize_t at = 0; at < size;) {
         const auto* const event = reinterpret_cast<const inotify_event*>(events + at);
         at += static_cast<ssize_t>(sizeof(inotify_event) + event->len);
-        const std::string name = event->len > 0 ? event->name : "";
-        isWritten |= (event->mask & IN_Q_OVERFLOW) != 0 || name == device::kServiceEnableKey ||
-                     name == device::kUpdatingFirmwareKey;
+        const bool isLost = (event->mask & IN_Q_OVERFLOW) != 0;
+        const std::string name = isLost           ? device::kServiceEnableKey
+                                 : event->len > 0 ? event->name
+                                                  : "";
+        if (IsRequest(name)) {
+            requests.push_back(name);
+        }
     }
-    return isWritten;
+    return requests;
 }
 
-class DaemonSupervisor {
-  public:
-    // Acts on a write. Always stops the daemon: if "0" and "1" are written in quick succession,
-    // init reads only "1", but the daemon must still restart. Also acts on writes made during the
-    // stop.
-    void Restart(const UniqueFd& watch) {
-        Stop();
-        DrainEvents(watch);
-        mIsEnabled = device::IsDaemonEnabled();
-        mPauseMs = 0;
-    }
-
-    // Reaps a daemon that has exited, and starts one if enabled. Returns false if fork() fails.
-    bool ReapAndStart() {
-        ReapDaemon();
-        if (mDaemon < 0 && mIsEnabled) {
-            const pid_t init = getpid();
-            mDaemon = fork();
-            if (mDaemon == 0) {
-                RunDaemon(init);
-            }
-        }
-        return mDaemon > 0 || !mIsEnabled;
-    }
-
-    void Stop() {
-        if (mDaemon > 0) {
-            host::TraceEvent("daemon_stop").Add("daemon", mDaemon);
-            kill(mDaemon, SIGKILL);
-            waitpid(mDaemon, nullptr, 0);
-            DaemonGone();
-        }
-    }
-
-  private:
-    // The daemon dies with init, even if init dies before prctl().
-    [[noreturn]] void RunDaemon(pid_t init) const {
-        prctl(PR_SET_PDEATHSIG, SIGKILL);
-        sigset_t none;
-        sigemptyset(&none);
-        sigprocmask(SIG_SETMASK, &none, nullptr);
-        std::this_thread::sleep_for(std::chrono::milliseconds(mPauseMs));
-        if (getppid() == init) {
-            host::LookForTrace();
-            host::TraceEvent("daemon_start").Add("daemon", getpid());
-            // This path refers to the same directory even after the root is renamed.
-            const std::string root =
-                    "/proc/self/fd/" + std::to_string(dup(host::DeviceRoot())) + "/.";
-            setenv("TPD_DEVICE_ROOT", root.c_str(), 1);
-            const std::string program = device::PathBesideProgram("corvane_daemon");
-            execl(program.c_str(), program.c_str(), nullptr);
-        }
-        _exit(127);
-    }
-
-    void ReapDaemon() {
-        int status = 0;
-        if (mDaemon < 0 || waitpid(mDaemon, &status, WNOHANG) != mDaemon) {
-            return;
-        }
-        host::TraceEvent("daemon_exit")
-                .Add("daemon", mDaemon)
-                .Add(WIFSIGNALED(status) ? "signal" : "status",
-                     WIFSIGNALED(status) ? WTERMSIG(status) : WEXITSTATUS(status));
-        mPauseMs = device::IsDaemonAlive()
-                           ? kMinRestartPauseMs
-                           : std::clamp(mPauseMs * 2, kMinRestartPauseMs, kMaxRestartPauseMs);
-        DaemonGone();
+void OnDaemonExit(bool isCrash) {
+    Empty(kDriverDirectory);
+    __system_property_set(device::kDaemonAliveKey, "false");
+    __system_property_set(device::kDaemonBinderKey, "0");
+    __system_property_set(device::kIsUpdatingFirmwareKey, "false");
+    if (isCrash) {
         const int64_t restarts = device::GetPropertyNumber(device::kRestartCountKey);
         const int64_t next = std::clamp<int64_t>(restarts, 0, INT32_MAX - 1) + 1;
         __system_property_set(device::kRestartCountKey, std::to_string(next).c_str());
-        host::TraceEvent("restart_pause").Add("ms", mPauseMs);
-        if (mPauseMs == kMinRestartPauseMs * 2) {
-            __android_log_print(
-                    ANDROID_LOG_ERROR, nullptr,
-                    "corvane_daemon exits before it is alive; retrying with increasing pauses");
+    }
+}
+
+constexpr Service::Program kDaemon = {"corvane_daemon", "corvane_daemon", device::IsDaemonAlive,
+                                      OnDaemonExit};
+
+class Services {
+  public:
+    // Always stops the daemon first: if "0" and "1" are written in quick succession, init reads
+    // only "1", but the daemon must still restart.
+    void FollowServiceEnable() {
+        mDaemon.Stop();
+        if (device::IsDaemonEnabled()) {
+            mDaemon.Start();
         }
     }
 
-    void DaemonGone() {
-        mDaemon = -1;
-        Empty(kDriverDirectory);
-        __system_property_set(device::kDaemonAliveKey, "false");
-        __system_property_set(device::kDaemonBinderKey, "0");
-        __system_property_set(device::kIsUpdatingFirmwareKey, "false");
+    // Carries out the requests, including those that arrive in the meantime.
+    void Obey(const UniqueFd& watch) {
+        std::vector<std::string> requests = ReadRequests(watch);
+        for (; !requests.empty(); requests = ReadRequests(watch)) {
+            for (const std::string& request : requests) {
+                if (request.rfind(device::kControlPrefix, 0) == 0) {
+                    Control(request);
+                } else {
+                    FollowServiceEnable();
+                }
+            }
+        }
     }
 
-    pid_t mDaemon = -1;
-    bool mIsEnabled = false;
-    int mPauseMs = 0;  // before the next daemon starts; the child process waits
+    // Reaps and starts processes. Returns the time in milliseconds until the next start, or -1.
+    int Supervise() {
+        mDaemon.Reap();
+        return mDaemon.StartIfDue();
+    }
+
+    void Stop() { mDaemon.Stop(); }
+
+  private:
+    // Carries out a request, for example ctl.start$corvane_daemon, and removes it.
+    void Control(const std::string& request) {
+        const std::string verb = request.substr(0, request.find('$'));
+        if (request == verb + "$" + mDaemon.name()) {
+            if (verb != "ctl.start") {
+                mDaemon.Stop();
+            }
+            if (verb != "ctl.stop") {
+                mDaemon.Start();
+            }
+        }
+        unlinkat(host::PropertiesDirectory(), request.c_str(), 0);
+    }
+
+    Service mDaemon{kDaemon};
 };
 
 // Drops the caller's descriptors, signal handling, session and working directory.
@@ -251,40 +238,46 @@ bool ExitRequested(const UniqueFd& signals) {
     return isSignaled && signal.ssi_signo != SIGCHLD;
 }
 
-// Returns true if the properties directory is still the one that init watches.
-bool PropertiesExist() {
-    struct stat followed = {};
+// Returns true if the name in the device root still refers to the open file.
+bool IsInPlace(int file, const char* name) {
+    struct stat opened = {};
     struct stat found = {};
-    return fstat(host::PropertiesDirectory(), &followed) == 0 &&
-           fstatat(host::DeviceRoot(), host::kPropertiesDirectory, &found, AT_SYMLINK_NOFOLLOW) ==
-                   0 &&
-           followed.st_ino == found.st_ino;
+    return fstat(file, &opened) == 0 &&
+           fstatat(host::DeviceRoot(), name, &found, AT_SYMLINK_NOFOLLOW) == 0 &&
+           opened.st_ino == found.st_ino;
 }
 
-// Tells the waiting `device start` that the device has booted, and closes the standard streams.
-void ReportBoot(const UniqueFd& null) {
-    [[maybe_unused]] const ssize_t written = write(STDOUT_FILENO, "\n", 1);
+bool OwnsDevice() { return IsInPlace(Mark(), host::kMarkFile); }
+
+void ReleaseStreams() {
+    const UniqueFd null(open("/dev/null", O_RDWR | O_CLOEXEC));
     for (const int stream : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
         dup2(null.get(), stream);
     }
 }
 
-void FollowProperties(const UniqueFd& signals, const UniqueFd& watch) {
-    DaemonSupervisor supervisor;
-    supervisor.Restart(watch);
+// Runs the services until init is told to exit.
+void RunServices(const UniqueFd& signals, const UniqueFd& watch) {
+    Services services;
+    services.FollowServiceEnable();
+    SetLock(device::InitLock::kBooted, F_WRLCK);
     bool isBootCompleted = false;
-    pollfd waits[] = {{signals.get(), POLLIN, 0}, {watch.get(), POLLIN, 0}};
     do {
-        poll(waits, std::size(waits), supervisor.ReapAndStart() ? -1 : kMinRestartPauseMs);
         host::LookForTrace();
-        if (DrainEvents(watch)) {
-            supervisor.Restart(watch);
-        }
+        services.Obey(watch);
+        const int untilNextStartMs = services.Supervise();
         if (!isBootCompleted && device::IsDaemonAlive()) {
             isBootCompleted = __system_property_set(device::kBootCompletedKey, "1") == 0;
         }
-    } while (!ExitRequested(signals) && PropertiesExist());
-    supervisor.Stop();
+        pollfd waits[] = {{signals.get(), POLLIN, 0}, {watch.get(), POLLIN, 0}};
+        poll(waits, std::size(waits), untilNextStartMs);
+    } while (!ExitRequested(signals) && OwnsDevice() &&
+             IsInPlace(host::PropertiesDirectory(), host::kPropertiesDirectory));
+    SetLock(device::InitLock::kBooted, F_UNLCK);
+    if (OwnsDevice()) {
+        services.Stop();
+        Empty(host::kTemporaryDirectory);
+    }
 }
 
 }  // namespace
@@ -292,31 +285,28 @@ void FollowProperties(const UniqueFd& signals, const UniqueFd& watch) {
 int main(int argc, char** argv) {
     if (argc != 2) {
         fputs("usage: init MODE\n", stderr);
-        return 2;
+        return device::kUsageError;
     }
     if (!Daemonize()) {
         return device::FailForErrno("cannot change to /");
     }
     if (host::DeviceRoot() < 0) {
-        return 1;
+        return device::kFailure;
     }
-    if (!LockDevice()) {
-        return device::FailForErrno(std::string("cannot lock ") + host::kInitLockFile);
+    if (!SetLock(device::InitLock::kRunning, F_WRLCK)) {
+        const bool isRunning = errno == EAGAIN || errno == EACCES;
+        return isRunning ? device::kExitAlreadyRunning
+                         : device::FailForErrno(std::string("cannot lock ") + host::kMarkFile);
     }
-    const UniqueFd null(open("/dev/null", O_RDWR | O_CLOEXEC));
-    if (!null.ok()) {
-        return device::FailForErrno("/dev/null");
-    }
-    if (const char* const unprepared = Boot(argv[1]); unprepared != nullptr) {
-        return device::FailForErrno(unprepared);
+    if (const char* const path = Boot(argv[1]); path != nullptr) {
+        return device::FailForErrno(path);
     }
     const UniqueFd signals = OpenSignals();
     const UniqueFd watch = OpenWatch();
     if (!signals.ok() || !watch.ok()) {
         return device::FailForErrno("cannot watch the properties");
     }
-    ReportBoot(null);
-    FollowProperties(signals, watch);
-    Empty(host::kTemporaryDirectory);
+    ReleaseStreams();
+    RunServices(signals, watch);
     return 0;
 }

@@ -12,6 +12,11 @@ constexpr char kPermissiveFlagKey[] = "odm.thp.debug.selinux.permissive";
 constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 
+// Requests to init, whose values are names of services: ctl.start, ctl.stop and ctl.restart.
+constexpr char kControlPrefix[] = "ctl.";
+// The state of a service is init.svc.NAME.
+constexpr char kServiceStatePrefix[] = "init.svc.";
+
 // Control the simulated daemon: its startup delay in milliseconds, a firmware update ("true" while
 // in progress) and its fault (see faults.h).
 constexpr char kBootDelayKey[] = "sim.boot_delay_ms";

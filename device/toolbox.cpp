@@ -61,6 +61,24 @@ int Setprop(int /* argc */, char** argv) {
     return 1;
 }
 
+// `start NAME` and `stop NAME`. Without a name, they control a phone's user interface, which this
+// device lacks.
+int ControlService(int argc, char** argv) {
+    if (argc == 1) {
+        return 0;
+    }
+    const std::string verb = program_invocation_short_name;
+    const std::string service = argv[1];
+    const std::string state = device::GetProperty((device::kServiceStatePrefix + service).c_str());
+    if (state.empty()) {
+        return device::Fail("unknown service '" + service + "'");
+    }
+    const std::string request = device::kControlPrefix + verb;
+    return __system_property_set(request.c_str(), service.c_str()) == 0
+                   ? 0
+                   : FailForErrno("cannot ask init");
+}
+
 int Getenforce(int /* argc */, char** /* argv */) {
     puts(device::SelinuxMode().c_str());
     return 0;
@@ -182,6 +200,8 @@ constexpr struct {
         {"setenforce", 2, 2, Setenforce, "enforcing|permissive|1|0"},
         {"setprop", 3, 3, Setprop, "NAME VALUE"},
         {"settings", 3, 5, Settings, "put|get|delete|list system|secure|global [KEY [VALUE]]"},
+        {"start", 1, 2, ControlService, "[SERVICE]"},
+        {"stop", 1, 2, ControlService, "[SERVICE]"},
 };
 
 }  // namespace

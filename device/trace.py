@@ -39,17 +39,17 @@ DESCRIPTIONS = {
     "fault": "applies the fault {name}",
     "recorded_answer": "uses the recorded answer to {command}",
     "answer": "answers: status {status}, {bytes} bytes",
-    "daemon_start": "starts the daemon, process {daemon}",
-    "daemon_stop": "stops the daemon, process {daemon}",
-    "daemon_exit": "reaps the daemon, process {daemon}: {end}",
-    "restart_pause": "waits {ms} ms before it starts the daemon",
+    "service_start": "starts {service}, process {process}",
+    "service_stop": "stops {service}, process {process}",
+    "service_exit": "reaps {service}, process {process}: {end}",
+    "restart_pause": "waits {ms} ms before it starts {service}",
 }
 ARROWS = {
     "call": "tool->>daemon",
     "reply": "daemon-->>tool",
-    "daemon_start": "init->>daemon",
-    "daemon_stop": "init-xdaemon",
-    "daemon_exit": "daemon--xinit",
+    "service_start": "init->>daemon",
+    "service_stop": "init-xdaemon",
+    "service_exit": "daemon--xinit",
 }
 
 
@@ -120,9 +120,9 @@ def is_idle(events):
     """Returns true if no event is recent and no daemon is starting"""
     is_starting = False
     for event in events:
-        if event["what"] in ("restart_pause", "daemon_start"):
+        if event["what"] in ("restart_pause", "service_start"):
             is_starting = True
-        elif event["what"] in ("publish", "daemon_stop"):
+        elif event["what"] in ("publish", "service_stop"):
             is_starting = False
     is_quiet = not events or time.monotonic() - events[-1]["time"] > QUIET_S
     return is_quiet and not is_starting

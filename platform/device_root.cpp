@@ -11,14 +11,12 @@
 #include <cstring>
 #include <filesystem>
 
+#include "platform/files.h"
 #include "platform/unique_fd.h"
 
 namespace host {
 
 namespace {
-
-// This file marks a directory as a device root.
-constexpr char kMark[] = ".tpd-device";
 
 bool IsSet(const char* value) { return value != nullptr && *value != '\0'; }
 
@@ -39,7 +37,7 @@ void FillStandardDescriptors() {
 
 bool IsMarked(int root) {
     struct stat status = {};
-    return fstatat(root, kMark, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
+    return fstatat(root, kMarkFile, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
 }
 
 // Marks an empty directory as a device root. Returns null, or the reason for the failure. Does not
@@ -57,7 +55,7 @@ const char* Mark(int root) {
     closedir(directory);
     const bool isEmpty = entries == 2;  // "." and ".."
     if (isEmpty) {
-        const UniqueFd mark(openat(root, kMark, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
+        const UniqueFd mark(openat(root, kMarkFile, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
         return mark.ok() || errno == EEXIST ? nullptr : strerror(errno);
     }
     // Another process may have marked it in the meantime.

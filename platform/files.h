@@ -12,8 +12,8 @@ namespace host {
 
 // Paths in the device root.
 constexpr char kCommandLineFile[] = "proc/cmdline";
-constexpr char kInitLockFile[] = "init.lock";  // locked by init while it runs
 constexpr char kLogFile[] = "log";
+constexpr char kMarkFile[] = ".tpd-device";  // marks a directory as a device root
 constexpr char kPropertiesDirectory[] = "properties";
 constexpr char kSelinuxFile[] = "selinux";
 constexpr char kTemporaryDirectory[] = "tmp";  // files are written here, then renamed

@@ -28,7 +28,7 @@ def test_fault_has_its_documented_result(device, fault, text, dies):
     device.fault(fault)
     assert device.tpd("captest") == text
     assert device.events("fault")[0]["name"] == fault
-    wait_until(lambda: bool(device.events("daemon_exit")) == dies)
+    wait_until(lambda: bool(device.events("service_exit")) == dies)
 
 
 def test_captest_restart_does_not_apply_to_other_commands(device):

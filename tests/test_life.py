@@ -1,8 +1,9 @@
 """The life cycle of the virtual device: start, supervision, reboot and stop"""
 import concurrent.futures
-import fcntl
 import os
 import shutil
+import subprocess
+import time
 
 import pytest
 
@@ -90,7 +91,7 @@ def test_device_keeps_running_when_its_root_is_renamed(device, build, tmp_path):
     letter = device.root / "dev/vndbinder/letter"
     letter.parent.mkdir(parents=True)
     letter.write_text("Dear")
-    device.kill("corvane_daemon")
+    moved.kill("corvane_daemon")
     wait_until(lambda: moved.restarts() == 1 and moved.is_up())
     moved.setprop(PERMISSIVE, "true")
     assert moved.tpd("captest") == PASS
@@ -99,21 +100,44 @@ def test_device_keeps_running_when_its_root_is_renamed(device, build, tmp_path):
     shutil.rmtree(device.root)
 
 
-def test_reports_a_lock_that_init_does_not_hold(device):
-    device.output("device", "root")
-    with open(device.root / "init.lock", "w") as lock:
-        fcntl.lockf(lock, fcntl.LOCK_EX)
-        asked = in_parallel(device, ["status", "start", "stop", "run x", "fault none"])
-    assert [done.returncode for done in asked] == [4, 1, 1, 1, 1]
-    assert all("which is not init" in done.stderr for done in asked)
+@pytest.mark.parametrize("repeats", [3, pytest.param(100, marks=pytest.mark.soak)])
+@pytest.mark.parametrize("verb", ["start", "stop"])
+def test_starts_beside_a_killed_command(device, chance, repeats, verb):
+    for _ in range(repeats):
+        with subprocess.Popen(["device", verb], env=device.env, stderr=subprocess.DEVNULL) as other:
+            time.sleep(chance.uniform(0, 0.01))
+            other.kill()
+        device.start()
+        assert device.run("device", "status").returncode == 0
 
 
-def test_second_init_fails(device, build):
+@pytest.mark.parametrize("removed", [".tpd-device", "properties"])
+def test_init_exits_when_its_device_is_removed(device, removed):
     device.start()
-    second = device.run(build / "device/init", "Permissive")
-    assert second.returncode == 1
-    assert "init.lock" in second.stderr
-    assert len(device.processes("/init")) == 1
+    (device.root / removed).rename(device.root / "away")
+    wait_until(lambda: not device.processes())
+    (device.root / "away").rename(device.root / removed)
+
+
+def test_start_applies_the_permissive_mode_to_a_running_device(device):
+    device.start()
+    device.output("device", "start", "--permissive")
+    assert device.output("getenforce") == "Permissive\n"
+
+
+def test_services_are_controlled_by_name(device):
+    device.start()
+    device.shell("stop corvane_daemon")
+    wait_until(lambda: device.getprop("init.svc.corvane_daemon") == "stopped")
+    assert device.processes("corvane_daemon") == []
+    device.shell("start corvane_daemon")
+    wait_until(device.is_up)
+    (daemon,) = device.processes("corvane_daemon")
+    device.shell("start corvane_daemon")
+    assert device.processes("corvane_daemon") == [daemon]
+    device.setprop("ctl.restart", "corvane_daemon")
+    wait_until(lambda: device.is_up() and device.processes("corvane_daemon") != [daemon])
+    assert device.restarts() == 0
 
 
 def test_reports_a_stopped_device(device):

@@ -1,4 +1,5 @@
-// Properties are files: properties/KEY in the device root contains the value of KEY.
+// Properties are files: properties/KEY in the device root contains the value of KEY. A request to
+// init is the file properties/KEY$VALUE, so that quick requests with the same key are not lost.
 #include <sys/system_properties.h>
 
 #include <fcntl.h>
@@ -15,7 +16,9 @@
 
 namespace {
 
-bool IsReadOnlyKey(const std::string& name) { return name.compare(0, 3, "ro.") == 0; }
+bool IsReadOnlyKey(const std::string& name) { return name.rfind("ro.", 0) == 0; }
+
+bool IsRequestKey(const std::string& name) { return name.rfind("ctl.", 0) == 0; }
 
 bool IsLegalName(const std::string& name) {
     constexpr char kLegal[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789_.@:-";
@@ -68,9 +71,12 @@ int Get(const std::string& name, char* value) {
 }
 
 bool Set(const std::string& name, const std::string& value) {
+    if (host::BrokenPropertyRule(name, value) != nullptr || IsWriteProtected(name)) {
+        return false;
+    }
     const unsigned flags = IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0;
-    return host::BrokenPropertyRule(name, value) == nullptr && !IsWriteProtected(name) &&
-           host::ReplaceFileAt(host::PropertiesDirectory(), name, value, flags);
+    const std::string file = IsRequestKey(name) ? name + "$" + value : name;
+    return host::ReplaceFileAt(host::PropertiesDirectory(), file, value, flags);
 }
 
 }  // namespace
