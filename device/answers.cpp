@@ -7,8 +7,8 @@
 #include <cstring>
 
 #include "common.h"
+#include "platform/events.h"
 #include "platform/files.h"
-#include "platform/trace.h"
 
 namespace device {
 
@@ -47,7 +47,7 @@ std::string CommandOf(const std::string& file) {
 std::optional<std::string> ReadAnswer(const std::string& command) {
     std::optional<std::string> answer = ReadFile(AnswerPath(command));
     if (answer.has_value()) {
-        host::TraceEvent("recorded_answer").Add("command", command);
+        host::Event("recorded_answer").Add("command", command);
     }
     return answer;
 }

@@ -22,8 +22,8 @@
 #include "answers.h"
 #include "common.h"
 #include "faults.h"
+#include "platform/events.h"
 #include "platform/libbinder/vndbinder.h"
-#include "platform/trace.h"
 
 namespace {
 
@@ -90,10 +90,10 @@ class DaemonService : public android::BBinder {
         if (command == nullptr || params == nullptr) {
             return android::BAD_VALUE;
         }
-        host::LookForTrace();
-        host::TraceEvent("command").Add("command", command).Add("params", params);
+        host::UpdateTracing();
+        host::Event("command").Add("command", command).Add("params", params);
         const android::status_t status = Execute(command, params, reply);
-        host::TraceEvent("answer")
+        host::Event("answer")
                 .Add("status", status)
                 .Add("bytes", static_cast<int64_t>(reply->dataSize()));
         return status;
@@ -147,7 +147,7 @@ int main() {
         __android_log_print(ANDROID_LOG_ERROR, nullptr, "cannot publish %s", kServiceName);
         return 1;
     }
-    host::TraceEvent("publish").Add("service", kServiceName);
+    host::Event("publish").Add("service", kServiceName);
     __system_property_set(device::kDaemonAliveKey, "true");
     __system_property_set(device::kDaemonBinderKey, "1");
     android::IPCThreadState::self()->joinThreadPool();

@@ -13,8 +13,8 @@
 #include "faults.h"
 #include "life.h"
 #include "platform/device_root.h"
+#include "platform/events.h"
 #include "platform/files.h"
-#include "platform/trace.h"
 #include "shell.h"
 
 namespace {
@@ -110,7 +110,7 @@ int Trace(int argc, char** argv) {
     if (!device::ExpectRunning()) {
         return 1;
     }
-    host::LookForTrace();  // removes the trace file if its owner was killed
+    host::UpdateTracing();  // removes the trace file if its owner was killed
     const std::string root = std::to_string(dup(host::DeviceRoot()));
     std::vector<const char*> arguments = {root.c_str(), program_invocation_short_name};
     arguments.insert(arguments.end(), argv, argv + argc);

@@ -10,8 +10,8 @@
 #include <sstream>
 
 #include "common.h"
+#include "platform/events.h"
 #include "platform/files.h"
-#include "platform/trace.h"
 #include "platform/unique_fd.h"
 
 namespace device {
@@ -130,7 +130,7 @@ Fault TakeFault(const std::string& command) {
         const std::string rest = text.substr(0, text.rfind(' ') + 1) + left;
         __system_property_set(kFaultKey, fault.count > 1 ? rest.c_str() : "none");
     }
-    host::TraceEvent("fault").Add("name", text);
+    host::Event("fault").Add("name", text);
     return fault;
 }
 

@@ -23,8 +23,8 @@
 #include "common.h"
 #include "life.h"
 #include "platform/device_root.h"
+#include "platform/events.h"
 #include "platform/files.h"
-#include "platform/trace.h"
 #include "platform/unique_fd.h"
 #include "service.h"
 
@@ -93,7 +93,7 @@ bool SetBootProperties() {
 // Resets the device's files to their state at power-on. Returns null, or the path that could not be
 // reset.
 const char* Boot(const char* selinuxMode) {
-    const host::TraceEvent event("boot");
+    const host::Event event("boot");
     if (!Empty(host::kTemporaryDirectory)) {
         return host::kTemporaryDirectory;
     }
@@ -263,7 +263,7 @@ void RunServices(const UniqueFd& signals, const UniqueFd& watch) {
     SetLock(device::InitLock::kBooted, F_WRLCK);
     bool isBootCompleted = false;
     do {
-        host::LookForTrace();
+        host::UpdateTracing();
         services.Obey(watch);
         const int untilNextStartMs = services.Supervise();
         if (!isBootCompleted && device::IsDaemonAlive()) {

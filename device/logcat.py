@@ -1,19 +1,20 @@
 #!/usr/bin/python3
 """logcat.py ROOT [OPTION...]: the device's logcat; ROOT is a file descriptor of the device root"""
 import argparse
+import collections
+import functools
 import os
 import re
 import select
 import signal
 import stat
-import struct
 import sys
 import time
 
-HEADER = struct.Struct("IiiII")  # LogEntryHeader in platform/log_file.h
+from events import LETTERS, EventReader
+
 BUFFERS = {"all", "crash", "default", "events", "kernel", "main", "radio", "system"}
-PRIORITIES = dict(enumerate("VDIWEF", 2))
-LEVELS = {letter: priority for priority, letter in PRIORITIES.items()} | {"S": 99}
+LEVELS = {letter: priority for priority, letter in LETTERS.items()} | {"S": 99}
 FORMATS = {
     "brief": "{letter}/{tag:8}({pid:5}): ",
     "epoch": "{seconds:19}.{ms:03} {pid:5} {tid:5} {letter} {tag:8}: ",
@@ -32,14 +33,14 @@ def buffers(names):
 
 
 def positive(text):
-    if int(text) < 1:
+    if not 1 <= int(text) <= sys.maxsize:
         raise ValueError
     return int(text)
 
 
 def pattern(text):
     try:
-        return re.compile(os.fsencode(text).decode("latin-1"))
+        return re.compile(text)
     except re.error as error:
         raise ValueError from error
 
@@ -70,76 +71,71 @@ def parse(arguments):
         metavar="TAG[:PRIORITY]",
         help="lowest priority to show: V, D, I, W, E, F or S (none); * stands for all other tags",
     )
-    return parser.parse_intermixed_args(arguments)
+    options = parser.parse_intermixed_args(arguments)
+    options.levels = {"*": LEVELS["S" if options.silent else "V"]} | dict(options.filters)
+    return options
 
 
-class Log:
-    def __init__(self, root, flags):
-        self.file = os.open("log", flags | os.O_NOFOLLOW | os.O_NONBLOCK, dir_fd=root)
-        if not stat.S_ISREG(os.fstat(self.file).st_mode):
-            sys.exit("logcat: the log is not a regular file")
-        self.first, self.position = b"", 0
-
-    def read_new(self):
-        """Yields the complete entries written since the last call; all if the log was cleared"""
-        first = os.pread(self.file, HEADER.size, 0)
-        if first != self.first:
-            self.first, self.position = first, 0
-        unread = max(os.fstat(self.file).st_size - self.position, 0)
-        left = memoryview(os.pread(self.file, unread, self.position))
-        while len(left) >= HEADER.size:
-            size, pid, tid, seconds, nanoseconds = HEADER.unpack_from(left)
-            end = HEADER.size + size
-            if size < 3 or end > len(left):
-                break
-            body = str(left[HEADER.size : end], "latin-1")
-            tag, _, text = body[1:-1].partition("\0")
-            yield {
-                "letter": PRIORITIES.get(ord(body[0]), "?"),
-                "ms": nanoseconds // 1000000,
-                "pid": pid,
-                "priority": ord(body[0]),
-                "seconds": seconds,
-                "tag": tag,
-                "text": text,
-                "tid": tid,
-                "when": time.strftime("%m-%d %H:%M:%S", time.localtime(seconds)),
-            }
-            self.position += end
-            left = left[end:]
+def open_log(root, flags):
+    log = os.open("log", flags | os.O_NOFOLLOW | os.O_NONBLOCK, dir_fd=root)
+    if not stat.S_ISREG(os.fstat(log).st_mode):
+        sys.exit("logcat: the log is not a regular file")
+    return log
 
 
 def is_shown(entry, options):
-    levels = {"*": LEVELS["S" if options.silent else "V"]} | dict(options.filters)
     return (
-        entry["priority"] >= levels.get(entry["tag"], levels["*"])
+        entry["priority"] >= options.levels.get(entry["tag"], options.levels["*"])
         and options.pid in (None, entry["pid"])
         and (options.regex is None or options.regex.search(entry["text"]))
     )
 
 
+@functools.lru_cache(maxsize=1)
+def local_time(seconds):
+    return time.strftime("%m-%d %H:%M:%S", time.localtime(seconds))
+
+
+def formatted(entry, options):
+    """Returns what to print, in which each character stands for a byte"""
+    priority, tag, text = entry["priority"], entry["tag"], entry["text"]
+    seconds, us = divmod(round(entry["time"] * 1000000), 1000000)
+    header = FORMATS[options.format].format(
+        letter=LETTERS.get(priority, "?"),
+        ms=us // 1000,
+        pid=entry["pid"],
+        seconds=seconds,
+        tag=tag,
+        tid=entry["tid"],
+        when=local_time(seconds),
+    )
+    text = text.removesuffix("\n")
+    return "".join(f"{header}{line}\n" for line in text.split("\n"))
+
+
 def main():
     for number in signal.SIGINT, signal.SIGPIPE:
         signal.signal(number, signal.SIG_DFL)
-    options = parse(sys.argv[2:])
-    log = Log(int(sys.argv[1]), os.O_RDWR if options.clear else os.O_RDONLY)
+    # The log contains bytes, which Latin-1 maps to characters.
+    options = parse([os.fsencode(argument).decode("latin-1") for argument in sys.argv[2:]])
+    log = open_log(int(sys.argv[1]), os.O_RDWR if options.clear else os.O_RDONLY)
     if options.clear:
-        os.truncate(log.file, 0)
+        os.truncate(log, 0)
         return
     if options.file:
-        sys.stdout = open(options.file, "a")
+        sys.stdout = open(options.file.encode("latin-1"), "a")
     sys.stdout.reconfigure(encoding="latin-1")
     closed = select.poll()  # ready when the reader closes the pipe
     closed.register(sys.stdout, 0)
-    is_following = not options.dump and options.count is None
+    reader = EventReader(log)
     while True:
-        entries = [entry for entry in log.read_new() if is_shown(entry, options)]
-        for entry in entries[-(options.count or 0) :]:
-            header = FORMATS[options.format].format_map(entry)
-            for line in entry["text"].removesuffix("\n").split("\n"):
-                print(header + line)
+        entries = (entry for entry in reader.read_new() if is_shown(entry, options))
+        if options.count:
+            entries = collections.deque(entries, maxlen=options.count)
+        for entry in entries:
+            sys.stdout.write(formatted(entry, options))
         sys.stdout.flush()
-        if not is_following or closed.poll(FOLLOW_PAUSE_MS):
+        if options.dump or options.count or closed.poll(FOLLOW_PAUSE_MS):
             return
 
 

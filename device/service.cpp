@@ -12,7 +12,7 @@
 
 #include "common.h"
 #include "platform/device_root.h"
-#include "platform/trace.h"
+#include "platform/events.h"
 
 namespace device {
 
@@ -35,7 +35,7 @@ void Service::Start() {
 
 void Service::Stop() {
     if (mProcess > 0) {
-        host::TraceEvent("service_stop").Add("service", name()).Add("process", mProcess);
+        host::Event("service_stop").Add("service", name()).Add("process", mProcess);
         kill(mProcess, SIGKILL);
         waitpid(mProcess, nullptr, 0);
         mProcess = -1;
@@ -52,7 +52,7 @@ void Service::Reap() {
     if (mProcess < 0 || waitpid(mProcess, &status, WNOHANG) != mProcess) {
         return;
     }
-    host::TraceEvent("service_exit")
+    host::Event("service_exit")
             .Add("service", name())
             .Add("process", mProcess)
             .Add(WIFSIGNALED(status) ? "signal" : "status",
@@ -62,7 +62,7 @@ void Service::Reap() {
     mProcess = -1;
     mProgram.onExit(true);
     SetState("restarting");
-    host::TraceEvent("restart_pause").Add("service", name()).Add("ms", mPauseMs);
+    host::Event("restart_pause").Add("service", name()).Add("ms", mPauseMs);
     if (mPauseMs == kMinPauseMs * 2) {
         __android_log_print(ANDROID_LOG_ERROR, nullptr,
                             "%s exits before it is alive; retrying with increasing pauses", name());
@@ -85,7 +85,7 @@ int Service::StartIfDue() {
     if (mProcess < 0) {
         return kMinPauseMs;
     }
-    host::TraceEvent("service_start").Add("service", name()).Add("process", mProcess);
+    host::Event("service_start").Add("service", name()).Add("process", mProcess);
     SetState("running");
     return -1;
 }

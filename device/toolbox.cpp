@@ -6,6 +6,7 @@
 #include <sys/system_properties.h>
 #include <unistd.h>
 
+#include <cctype>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
@@ -15,9 +16,9 @@
 
 #include "common.h"
 #include "platform/device_root.h"
+#include "platform/events.h"
 #include "platform/files.h"
 #include "platform/libc/properties.h"
-#include "platform/log_file.h"
 
 namespace {
 
@@ -134,14 +135,10 @@ int Settings(int argc, char** argv) {
 }
 
 // Returns the log priority for the letter, or -1 if it is unknown.
-int PriorityOf(const char* letter) {
-    for (int priority = ANDROID_LOG_VERBOSE; priority <= ANDROID_LOG_SILENT; ++priority) {
-        const char known[] = {host::LogPriorityLetter(priority), '\0'};
-        if (strcasecmp(letter, known) == 0) {
-            return priority;
-        }
-    }
-    return -1;
+int PriorityOf(const std::string& letter) {
+    const size_t found = std::string("VDIWEFS").find(static_cast<char>(toupper(letter[0])));
+    const bool valid = letter.length() == 1 && found != std::string::npos;
+    return valid ? static_cast<int>(found) + ANDROID_LOG_VERBOSE : -1;
 }
 
 int Log(int argc, char** argv) {
@@ -165,8 +162,8 @@ int Log(int argc, char** argv) {
         return kUsageError;
     }
     const std::string text = device::Join(argc - optind, argv + optind);
-    return __android_log_print(priority, tag, "%s", text.c_str()) >= 0 ? 0
-                                                                       : FailForErrno("cannot log");
+    const int result = host::WriteLog(priority, tag, text);
+    return result >= 0 ? 0 : device::Fail(std::string("cannot log: ") + strerror(-result));
 }
 
 // The first argument of logcat.py is a file descriptor of the device root.

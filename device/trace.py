@@ -12,6 +12,8 @@ import subprocess
 import sys
 import time
 
+from events import LETTERS, EventReader
+
 # The command that runs this script passes a file descriptor of the device root, and its own name.
 ROOT, PROGRAM = int(sys.argv[1]), sys.argv[2]
 TRACE = "trace"
@@ -21,7 +23,7 @@ IDLE_TIMEOUT_S = 5
 NAMES = {"tpd": "tool", "corvane_daemon": "daemon"}
 
 
-# describe() computes `end`, `found`, `size` and `way`; the other fields are recorded.
+# describe() computes `end`, `found`, `priority`, `size` and `way`; the other fields are recorded.
 DESCRIPTIONS = {
     "property_read": 'reads {name}: "{value}"',
     "property_write": 'writes {name}: "{old}" -> "{new}", status {status}',
@@ -72,6 +74,7 @@ def describe(event):
     signaled, status = event.get("signal"), event.get("status", 0)
     if event["what"] == "shell":  # a wait status
         signaled, status = status & 0x7F, status >> 8
+    fields["priority"] = LETTERS.get(event.get("priority"), "?")
     fields["end"] = f"signal {signaled}" if signaled else f"status {status}"
     fields["found"] = "found" if event.get("found") else "not found"
     fields["size"] = len(event.get("request", "")) // 2
@@ -108,12 +111,7 @@ def recording(root):
 
 
 def read_trace(trace):
-    events = []
-    for line in os.pread(trace, os.fstat(trace).st_size, 0).decode("ascii").splitlines():
-        # Skip incomplete lines: the last one, or those that a full disk truncated.
-        with contextlib.suppress(json.JSONDecodeError):
-            events.append(json.loads(line))
-    return sorted(events, key=lambda event: event["time"])
+    return sorted(EventReader(trace).read_new(), key=lambda event: event["time"])
 
 
 def is_idle(events):
@@ -124,7 +122,7 @@ def is_idle(events):
             is_starting = True
         elif event["what"] in ("publish", "service_stop"):
             is_starting = False
-    is_quiet = not events or time.monotonic() - events[-1]["time"] > QUIET_S
+    is_quiet = not events or time.time() - events[-1]["time"] > QUIET_S
     return is_quiet and not is_starting
 
 
@@ -170,7 +168,7 @@ def main():
     for number in signal.SIGTERM, signal.SIGHUP:
         signal.signal(number, signal.default_int_handler)
     with recording(ROOT) as trace:
-        start = time.monotonic()
+        start = time.time()
         events, result = record(trace, options.arguments)
         if not os.fstat(trace).st_mode & stat.S_IWUSR:
             print(f"{PROGRAM}: events were lost; is the file system full?", file=sys.stderr)

@@ -4,7 +4,7 @@ from subprocess import PIPE, Popen
 
 import pytest
 
-from virtual_device import PASS, PERMISSIVE, SOURCE, wait_until
+from virtual_device import LIMIT_S, PASS, PERMISSIVE, SOURCE, wait_until
 
 
 def test_getprop_prints_long_values_and_defaults(device):
@@ -42,13 +42,21 @@ def test_logcat_selects_entries(device, options):
 
 def test_logcat_follows_a_cleared_log(device):
     device.shell("log -t life first")
-    command = ["logcat", "-v", "raw", "-s", "life"]
+    command = ["timeout", str(LIMIT_S), "logcat", "-v", "raw", "-s", "life"]
     with Popen(command, env=device.env, stdout=PIPE) as logcat:
         assert logcat.stdout.readline() == b"first\n"
         device.shell("logcat -c")
-        device.shell("log -t life a text longer than first")
+        device.shell("log -t life a text longer than both; log -t life next")
         assert b"longer" in logcat.stdout.readline()
-        logcat.kill()
+        assert logcat.stdout.readline() == b"next\n"
+        logcat.terminate()
+
+
+def test_log_continues_after_the_disk_was_full(device):
+    too_large = f"logcat -c; trap '' XFSZ; ulimit -f 1; log {'x' * 1000}"
+    assert "cannot log: No space left on device" in device.run("bash", "-c", too_large).stderr
+    device.shell("log '{\"time\":1'; log second")
+    assert device.shell("logcat -d -v raw") == '{"time":1\nsecond\n'
 
 
 def test_daemon_returns_recorded_answers(device):

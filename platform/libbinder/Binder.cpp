@@ -8,8 +8,8 @@
 #include <thread>
 
 #include "platform/device_root.h"
+#include "platform/events.h"
 #include "platform/libbinder/vndbinder.h"
-#include "platform/trace.h"
 
 namespace android {
 
@@ -37,7 +37,7 @@ std::string ServiceName(const String16& name) {
 class DriverServiceManager : public IServiceManager {
   public:
     sp<IBinder> getService(const String16& name) const override {
-        host::TraceEvent event("lookup");
+        host::Event event("lookup");
         const std::string driver = ProcessState::self()->getDriverName();
         const std::string service = ServiceName(name);
         const int64_t start = host::MonotonicUs();

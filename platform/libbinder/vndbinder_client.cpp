@@ -5,9 +5,9 @@
 #include <utility>
 #include <vector>
 
+#include "platform/events.h"
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
-#include "platform/trace.h"
 
 using android::IBinder;
 using android::Parcel;
@@ -30,7 +30,7 @@ class RemoteBinder : public IBinder {
 
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
         flags |= kAcceptFds;
-        TraceEvent("call")
+        Event("call")
                 .Add("code", code)
                 .Add("flags", flags)
                 .AddHex("request", data.data(), data.dataSize());
@@ -38,7 +38,7 @@ class RemoteBinder : public IBinder {
         Parcel discarded;
         Parcel& received = reply != nullptr ? *reply : discarded;
         const status_t status = Deliver(code, data, received, flags);
-        TraceEvent("reply")
+        Event("reply")
                 .Add("status", status)
                 .Add("bytes", static_cast<int64_t>(received.dataSize()))
                 .Add("us", MonotonicUs() - start);
@@ -51,7 +51,7 @@ class RemoteBinder : public IBinder {
         if (status == android::OK) {
             mRecipients.emplace_back(recipient);
         }
-        TraceEvent("link_to_death").Add("status", status);
+        Event("link_to_death").Add("status", status);
         return status;
     }
 
@@ -66,7 +66,7 @@ class RemoteBinder : public IBinder {
         } else {
             mRecipients.erase(found);
         }
-        TraceEvent("unlink_to_death").Add("status", status);
+        Event("unlink_to_death").Add("status", status);
         return status;
     }
 
@@ -93,7 +93,7 @@ class RemoteBinder : public IBinder {
 
     // Notifies each recipient once, on this thread.
     status_t OwnerDied() {
-        const TraceEvent event("binder_died");
+        const Event event("binder_died");
         mConnection.reset();
         const sp<IBinder> keep(this);  // a recipient may drop the last other reference
         for (const wp<DeathRecipient>& linked : std::exchange(mRecipients, {})) {

@@ -10,9 +10,9 @@
 #include <cstring>
 #include <string>
 
+#include "platform/events.h"
 #include "platform/files.h"
 #include "platform/libc/properties.h"
-#include "platform/trace.h"
 
 namespace {
 
@@ -92,14 +92,14 @@ const char* host::BrokenPropertyRule(const std::string& name, const std::string&
 }
 
 int __system_property_get(const char* name, char* value) {
-    host::TraceEvent event("property_read");
+    host::Event event("property_read");
     const int length = Get(name, value);
     event.Add("name", name).Add("value", value);
     return length;
 }
 
 int __system_property_set(const char* name, const char* value) {
-    host::TraceEvent event("property_write");
+    host::Event event("property_write");
     char old[PROP_VALUE_MAX] = "";
     if (host::IsTraced()) {
         Get(name, old);

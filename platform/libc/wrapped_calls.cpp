@@ -9,8 +9,8 @@
 #include <optional>
 
 #include "platform/device_root.h"
+#include "platform/events.h"
 #include "platform/files.h"
-#include "platform/trace.h"
 
 extern "C" {
 
@@ -31,19 +31,19 @@ FILE* __wrap_fopen(const char* path, const char* mode) {
 }
 
 int __wrap_usleep(useconds_t us) {
-    host::TraceEvent("pause").Add("us", us);
+    host::Event("pause").Add("us", us);
     return __real_usleep(us);
 }
 
 int __wrap_system(const char* command) {
-    host::TraceEvent event("shell");
+    host::Event event("shell");
     const int status = __real_system(command);
     event.Add("command", command).Add("status", status);
     return status;
 }
 
 // The event of the open pipe. The tool is single-threaded and opens one pipe at a time.
-static std::optional<host::TraceEvent> gPipe;
+static std::optional<host::Event> gPipe;
 
 FILE* __wrap_popen(const char* command, const char* mode) {
     gPipe.emplace("shell").Add("command", command);

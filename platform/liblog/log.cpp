@@ -4,7 +4,7 @@
 #include <cstdarg>
 #include <cstdio>
 
-#include "platform/log_file.h"
+#include "platform/events.h"
 
 int __android_log_print(int priority, const char* tag, const char* format, ...) {
     char text[host::kMaxLogText + 1] = "";
@@ -19,6 +19,5 @@ int __android_log_print(int priority, const char* tag, const char* format, ...) 
     vfprintf(stream, format, args);
     va_end(args);
     fclose(stream);
-    return host::AppendLogEntry(priority, tag != nullptr ? tag : program_invocation_short_name,
-                                text);
+    return host::WriteLog(priority, tag != nullptr ? tag : program_invocation_short_name, text);
 }

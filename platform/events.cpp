@@ -1,8 +1,9 @@
-#include "platform/trace.h"
+#include "platform/events.h"
 
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -41,43 +42,64 @@ bool IsRecorded() {
 
 bool IsTraced() {
     if (gTraced < 0) {
-        LookForTrace();
+        UpdateTracing();
     }
     return gTraced == 1;
 }
 
-void LookForTrace() { gTraced = IsRecorded() ? 1 : 0; }
+void UpdateTracing() {
+    const int error = errno;
+    gTraced = IsRecorded() ? 1 : 0;
+    errno = error;
+}
 
 int64_t MonotonicUs() {
     return std::chrono::steady_clock::now().time_since_epoch() / std::chrono::microseconds(1);
 }
 
-TraceEvent::TraceEvent(const char* what) {
-    const int error = errno;
-    if (IsTraced()) {
-        mLine = "{\"time\":" + std::to_string(static_cast<double>(MonotonicUs()) / 1e6);
-        Add("pid", getpid()).Add("who", program_invocation_short_name).Add("what", what);
-    }
-    errno = error;
+int WriteLog(int priority, std::string_view tag, std::string_view text) {
+    static const int log = OpenForAppending(kLogFile, O_CREAT);
+    Event event("log", true);
+    event.Add("priority", static_cast<uint8_t>(priority))
+            .Add("tag", tag.substr(0, kMaxLogText))
+            .Add("text", text.substr(0, kMaxLogText));
+    return event.AppendTo(log);
 }
 
-TraceEvent::~TraceEvent() {
-    if (mLine.empty()) {
+Event::Event(const char* what, bool isLogged) {
+    if (IsTraced() || isLogged) {
+        const auto now = std::chrono::system_clock::now().time_since_epoch();
+        mLine = "{\"time\":" + std::to_string(std::chrono::duration<double>(now).count());
+        Add("pid", getpid()).Add("tid", syscall(SYS_gettid));
+        Add("who", program_invocation_short_name).Add("what", what);
+    }
+}
+
+Event::~Event() {
+    if (mLine.empty() || !IsTraced()) {
         return;
     }
     const int error = errno;
-    mLine += "}\n";
     // Reopened for every event, because the file may have been removed.
-    const UniqueFd file(OpenForAppending(kTraceFile, 0));
-    const ssize_t written = write(file.get(), mLine.data(), mLine.size());
-    if (written != static_cast<ssize_t>(mLine.size())) {
-        fchmod(file.get(), S_IRUSR);
+    const UniqueFd trace(OpenForAppending(kTraceFile, 0));
+    if (AppendTo(trace.get()) < 0) {
+        fchmod(trace.get(), S_IRUSR);
         gTraced = 0;
     }
     errno = error;
 }
 
-TraceEvent& TraceEvent::Add(const char* name, std::string_view value) {
+// Returns the number of bytes written or a negative errno value.
+int Event::AppendTo(int file) const {
+    const std::string line = mLine + "}\n";
+    const ssize_t written = write(file, line.data(), line.size());
+    if (written < 0) {
+        return -errno;
+    }
+    return written == static_cast<ssize_t>(line.size()) ? static_cast<int>(written) : -ENOSPC;
+}
+
+Event& Event::Add(const char* name, std::string_view value) {
     if (mLine.empty()) {
         return *this;
     }
@@ -96,14 +118,14 @@ TraceEvent& TraceEvent::Add(const char* name, std::string_view value) {
     return *this;
 }
 
-TraceEvent& TraceEvent::Add(const char* name, int64_t value) {
+Event& Event::Add(const char* name, int64_t value) {
     if (!mLine.empty()) {
         mLine.append(",\"").append(name).append("\":").append(std::to_string(value));
     }
     return *this;
 }
 
-TraceEvent& TraceEvent::AddHex(const char* name, const uint8_t* bytes, size_t size) {
+Event& Event::AddHex(const char* name, const uint8_t* bytes, size_t size) {
     std::string digits;
     for (size_t i = 0; i < size && !mLine.empty(); ++i) {
         digits.append({kHexDigits[bytes[i] >> 4], kHexDigits[bytes[i] & 0xF]});
