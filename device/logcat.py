@@ -2,12 +2,14 @@
 """logcat.py ROOT [OPTION...]: the device's logcat; ROOT is a file descriptor of the device root"""
 import argparse
 import collections
+import datetime
 import functools
 import os
 import re
 import select
 import signal
 import stat
+import struct
 import sys
 import time
 
@@ -15,9 +17,12 @@ from events import LETTERS, EventReader
 
 BUFFERS = {"all", "crash", "default", "events", "kernel", "main", "radio", "system"}
 LEVELS = {letter: priority for priority, letter in LETTERS.items()} | {"S": 99}
+# With -B: the size of what follows, the header's size, process, thread, time, buffer and user.
+BINARY_HEADER = struct.Struct("<HHiIIIII")
 FORMATS = {
     "brief": "{letter}/{tag:8}({pid:5}): ",
     "epoch": "{seconds:19}.{ms:03} {pid:5} {tid:5} {letter} {tag:8}: ",
+    "long": "[ {when}.{ms:03} {pid:5}:{tid:5} {letter}/{tag:8} ]",
     "raw": "",
     "tag": "{letter}/{tag:8}: ",
     "threadtime": "{when}.{ms:03} {pid:5} {tid:5} {letter} {tag:8}: ",
@@ -38,6 +43,16 @@ def positive(text):
     return int(text)
 
 
+def start(text):
+    """Returns a count as an integer, or a time in seconds as a float"""
+    if text.isdecimal():
+        return positive(text)
+    if re.fullmatch(r"\d+\.\d+", text):
+        return float(text)
+    date = text if text.count("-") == 2 else f"{time.localtime().tm_year}-{text}"
+    return datetime.datetime.strptime(date, "%Y-%m-%d %H:%M:%S.%f").timestamp()
+
+
 def pattern(text):
     try:
         return re.compile(text)
@@ -55,6 +70,7 @@ def tag_filter(text):
 
 def parse(arguments):
     parser = argparse.ArgumentParser(prog="logcat", description="Prints the device's log.")
+    parser.add_argument("-B", dest="binary", action="store_true", help="print binary entries")
     parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="ignored: there is one log")
     parser.add_argument("-c", dest="clear", action="store_true", help="clear the log")
     parser.add_argument("-d", dest="dump", action="store_true", help="print the log and exit")
@@ -62,7 +78,16 @@ def parse(arguments):
     parser.add_argument("-f", dest="file", help="append the output to a file")
     parser.add_argument("--pid", type=positive, help="show only entries of this process")
     parser.add_argument("-s", dest="silent", action="store_true", help="same as the filter *:S")
-    parser.add_argument("-t", dest="count", type=positive, help="show only the last entries")
+    parser.add_argument(
+        "-T",
+        dest="start",
+        type=start,
+        metavar="COUNT|TIME",
+        help="start with the last entries, or at [YYYY-]MM-DD hh:mm:ss.mmm or sssss.mmm",
+    )
+    parser.add_argument(
+        "-t", dest="dump_start", type=start, metavar="COUNT|TIME", help="same as -d -T"
+    )
     parser.add_argument("-v", dest="format", choices=FORMATS, default="threadtime")
     parser.add_argument(
         "filters",
@@ -72,6 +97,9 @@ def parse(arguments):
         help="lowest priority to show: V, D, I, W, E, F or S (none); * stands for all other tags",
     )
     options = parser.parse_intermixed_args(arguments)
+    options.dump |= options.dump_start is not None
+    first = options.dump_start or options.start or 0.0
+    options.count, options.since = (first, 0.0) if isinstance(first, int) else (None, first)
     options.levels = {"*": LEVELS["S" if options.silent else "V"]} | dict(options.filters)
     return options
 
@@ -86,6 +114,7 @@ def open_log(root, flags):
 def is_shown(entry, options):
     return (
         entry["priority"] >= options.levels.get(entry["tag"], options.levels["*"])
+        and entry["time"] >= options.since
         and options.pid in (None, entry["pid"])
         and (options.regex is None or options.regex.search(entry["text"]))
     )
@@ -100,6 +129,11 @@ def formatted(entry, options):
     """Returns what to print, in which each character stands for a byte"""
     priority, tag, text = entry["priority"], entry["tag"], entry["text"]
     seconds, us = divmod(round(entry["time"] * 1000000), 1000000)
+    if options.binary:
+        payload = f"{chr(priority)}{tag}\0{text}\0"
+        sizes = len(payload), BINARY_HEADER.size
+        owner = entry["pid"], entry["tid"], seconds, us * 1000, 0, os.getuid()
+        return str(BINARY_HEADER.pack(*sizes, *owner), "latin-1") + payload
     header = FORMATS[options.format].format(
         letter=LETTERS.get(priority, "?"),
         ms=us // 1000,
@@ -110,6 +144,8 @@ def formatted(entry, options):
         when=local_time(seconds),
     )
     text = text.removesuffix("\n")
+    if options.format == "long":
+        return f"{header}\n{text}\n\n"
     return "".join(f"{header}{line}\n" for line in text.split("\n"))
 
 
@@ -127,15 +163,15 @@ def main():
     sys.stdout.reconfigure(encoding="latin-1")
     closed = select.poll()  # ready when the reader closes the pipe
     closed.register(sys.stdout, 0)
-    reader = EventReader(log)
+    reader, count = EventReader(log), options.count
     while True:
         entries = (entry for entry in reader.read_new() if is_shown(entry, options))
-        if options.count:
-            entries = collections.deque(entries, maxlen=options.count)
+        if count:
+            entries, count = collections.deque(entries, maxlen=count), None
         for entry in entries:
             sys.stdout.write(formatted(entry, options))
         sys.stdout.flush()
-        if options.dump or options.count or closed.poll(FOLLOW_PAUSE_MS):
+        if options.dump or closed.poll(FOLLOW_PAUSE_MS):
             return
 
 

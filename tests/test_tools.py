@@ -1,5 +1,7 @@
 """The device's shell commands, recorded answers and adb"""
 import os
+import struct
+import time
 from subprocess import PIPE, Popen
 
 import pytest
@@ -41,15 +43,34 @@ def test_logcat_selects_entries(device, options):
 
 
 def test_logcat_follows_a_cleared_log(device):
-    device.shell("log -t life first")
-    command = ["timeout", str(LIMIT_S), "logcat", "-v", "raw", "-s", "life"]
+    device.shell("log -t life first; log -t life last")
+    command = ["timeout", str(LIMIT_S), "logcat", "-v", "raw", "-T", "1", "-s", "life"]
     with Popen(command, env=device.env, stdout=PIPE) as logcat:
-        assert logcat.stdout.readline() == b"first\n"
+        assert logcat.stdout.readline() == b"last\n"
         device.shell("logcat -c")
         device.shell("log -t life a text longer than both; log -t life next")
         assert b"longer" in logcat.stdout.readline()
         assert logcat.stdout.readline() == b"next\n"
         logcat.terminate()
+
+
+def test_logcat_starts_at_a_time(device):
+    device.shell("log -t one first; sleep 0.01; log -t two second")
+    seconds = device.shell("logcat -d -v epoch -s two").split()[0]
+    date = device.shell("logcat -d -s two")[: len("MM-DD hh:mm:ss.mmm")]
+    for since in seconds, date, f"{time.localtime().tm_year}-{date}":
+        shown = device.output("logcat", "-v", "raw", "-t", since, "-s", "one", "two")
+        assert shown == "second\n", since
+
+
+def test_logcat_prints_binary_and_long_entries(device):
+    device.shell("log -p e -t one first")
+    binary = device.shell("logcat -d -B -s one").encode("latin-1")
+    size, header, process, thread, seconds, ns, *_ = struct.unpack_from("<HHiIIIII", binary)
+    assert (header, size, binary[28:]) == (28, 11, b"\6one\0first\0")
+    when = time.strftime("%m-%d %H:%M:%S", time.localtime(seconds))
+    expected = f"[ {when}.{ns // 1000000:03} {process:5}:{thread:5} E/one      ]\nfirst\n\n"
+    assert device.shell("logcat -d -v long -s one") == expected
 
 
 def test_log_continues_after_the_disk_was_full(device):
