@@ -1,4 +1,4 @@
-#!/usr/bin/python3
+#!/usr/bin/python3 -BEs
 """logcat.py ROOT [OPTION...]: the device's logcat; ROOT is a file descriptor of the device root"""
 import argparse
 import collections

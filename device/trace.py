@@ -1,4 +1,4 @@
-#!/usr/bin/python3
+#!/usr/bin/python3 -BEs
 """Runs the tool on the device and shows what the tool, the daemon and init did."""
 import argparse
 import contextlib
@@ -126,17 +126,20 @@ def is_idle(events):
     return is_quiet and not is_starting
 
 
-def record(trace, arguments):
-    """Runs the tool, waits until the device is idle, and returns the events and the output"""
+def run_tool(arguments):
+    """Returns the output of the tool"""
     try:
         tool = subprocess.run(["tpd", *arguments], stdout=subprocess.PIPE, check=False)
-        result = tool.stdout.decode(errors="backslashreplace")
+        return tool.stdout.decode(errors="backslashreplace")
     except KeyboardInterrupt:
-        result = "(interrupted)\n"
+        return "(interrupted)\n"
+
+
+def wait_until_idle(trace):
     limit = time.monotonic() + IDLE_TIMEOUT_S
-    while not is_idle(events := read_trace(trace)) and time.monotonic() < limit:
-        time.sleep(0.02)
-    return events, result
+    with contextlib.suppress(KeyboardInterrupt):
+        while not is_idle(read_trace(trace)) and time.monotonic() < limit:
+            time.sleep(0.02)
 
 
 def print_timeline(events, start, with_bytes):
@@ -169,10 +172,13 @@ def main():
         signal.signal(number, signal.default_int_handler)
     with recording(ROOT) as trace:
         start = time.time()
-        events, result = record(trace, options.arguments)
-        if not os.fstat(trace).st_mode & stat.S_IWUSR:
-            print(f"{PROGRAM}: events were lost; is the file system full?", file=sys.stderr)
-    signal.signal(signal.SIGPIPE, signal.SIG_DFL)
+        result = run_tool(options.arguments)
+        wait_until_idle(trace)
+    for number in signal.SIGINT, signal.SIGTERM, signal.SIGHUP, signal.SIGPIPE:
+        signal.signal(number, signal.SIG_DFL)
+    events = read_trace(trace)
+    if not os.fstat(trace).st_mode & stat.S_IWUSR:
+        print(f"{PROGRAM}: events were lost; is the file system full?", file=sys.stderr)
     if options.json:
         print(*map(json.dumps, events), sep="\n")
     elif options.mermaid:

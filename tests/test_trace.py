@@ -62,6 +62,24 @@ def test_recorder_exits_when_its_terminal_closes(trace, stopped_device):
     assert not (stopped_device.root / "trace").exists()
 
 
+def test_prints_the_events_when_interrupted(trace, stopped_device):
+    stopped_device.setprop("sim.boot_delay_ms", "60000")
+    command = ["device", "trace", "reboot"]
+    with subprocess.Popen(command, env=stopped_device.env, stdout=subprocess.PIPE) as recorder:
+        wait_until((stopped_device.root / "trace").exists)
+        wait_until(lambda: stopped_device.events("daemon_start"))
+        wait_until(lambda: not stopped_device.processes("/tpd"))
+        recorder.send_signal(signal.SIGINT)
+        assert_in_order(recorder.stdout.read().decode(), "init starts the daemon", "result:")
+
+
+def test_scripts_ignore_the_callers_python(trace, stopped_device, tmp_path):
+    (tmp_path / "json.py").write_text("not Python")
+    stopped_device.env |= {"PYTHONHOME": "/nonexistent", "PYTHONPATH": str(tmp_path)}
+    assert_in_order(trace("captest"), PASS)
+    assert "captest" in stopped_device.output("logcat", "-d", cwd=tmp_path)
+
+
 def test_removes_the_file_of_a_killed_recorder(trace, stopped_device):
     (stopped_device.root / "trace").write_text("{}\n")
     assert_in_order(trace("captest"), "tool calls", PASS)
