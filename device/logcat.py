@@ -3,7 +3,6 @@
 import argparse
 import collections
 import datetime
-import functools
 import os
 import re
 import select
@@ -44,13 +43,13 @@ def positive(text):
 
 
 def start(text):
-    """Returns a count as an integer, or a time in seconds as a float"""
+    """Returns the number of entries or None, and the time of the first one in seconds or 0"""
     if text.isdecimal():
-        return positive(text)
+        return positive(text), 0
     if re.fullmatch(r"\d+\.\d+", text):
-        return float(text)
+        return None, float(text)
     date = text if text.count("-") == 2 else f"{time.localtime().tm_year}-{text}"
-    return datetime.datetime.strptime(date, "%Y-%m-%d %H:%M:%S.%f").timestamp()
+    return None, datetime.datetime.strptime(date, "%Y-%m-%d %H:%M:%S.%f").timestamp()
 
 
 def pattern(text):
@@ -69,7 +68,8 @@ def tag_filter(text):
 
 
 def parse(arguments):
-    parser = argparse.ArgumentParser(prog="logcat", description="Prints the device's log.")
+    description = "Prints the log. TIME is [YYYY-]MM-DD hh:mm:ss.mmm or sssss.mmm (in seconds)."
+    parser = argparse.ArgumentParser(prog="logcat", description=description)
     parser.add_argument("-B", dest="binary", action="store_true", help="print binary entries")
     parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="ignored: there is one log")
     parser.add_argument("-c", dest="clear", action="store_true", help="clear the log")
@@ -78,16 +78,8 @@ def parse(arguments):
     parser.add_argument("-f", dest="file", help="append the output to a file")
     parser.add_argument("--pid", type=positive, help="show only entries of this process")
     parser.add_argument("-s", dest="silent", action="store_true", help="same as the filter *:S")
-    parser.add_argument(
-        "-T",
-        dest="start",
-        type=start,
-        metavar="COUNT|TIME",
-        help="start with the last entries, or at [YYYY-]MM-DD hh:mm:ss.mmm or sssss.mmm",
-    )
-    parser.add_argument(
-        "-t", dest="dump_start", type=start, metavar="COUNT|TIME", help="same as -d -T"
-    )
+    parser.add_argument("-T", type=start, metavar="COUNT|TIME", help="same as -t, then follow")
+    parser.add_argument("-t", type=start, metavar="COUNT|TIME", help="show only the last entries")
     parser.add_argument("-v", dest="format", choices=FORMATS, default="threadtime")
     parser.add_argument(
         "filters",
@@ -97,9 +89,8 @@ def parse(arguments):
         help="lowest priority to show: V, D, I, W, E, F or S (none); * stands for all other tags",
     )
     options = parser.parse_intermixed_args(arguments)
-    options.dump |= options.dump_start is not None
-    first = options.dump_start or options.start or 0.0
-    options.count, options.since = (first, 0.0) if isinstance(first, int) else (None, first)
+    options.dump |= options.t is not None
+    options.count, options.since = options.t or options.T or (None, 0)
     options.levels = {"*": LEVELS["S" if options.silent else "V"]} | dict(options.filters)
     return options
 
@@ -120,11 +111,6 @@ def is_shown(entry, options):
     )
 
 
-@functools.lru_cache(maxsize=1)
-def local_time(seconds):
-    return time.strftime("%m-%d %H:%M:%S", time.localtime(seconds))
-
-
 def formatted(entry, options):
     """Returns what to print, in which each character stands for a byte"""
     priority, tag, text = entry["priority"], entry["tag"], entry["text"]
@@ -134,15 +120,9 @@ def formatted(entry, options):
         sizes = len(payload), BINARY_HEADER.size
         owner = entry["pid"], entry["tid"], seconds, us * 1000, 0, os.getuid()
         return str(BINARY_HEADER.pack(*sizes, *owner), "latin-1") + payload
-    header = FORMATS[options.format].format(
-        letter=LETTERS.get(priority, "?"),
-        ms=us // 1000,
-        pid=entry["pid"],
-        seconds=seconds,
-        tag=tag,
-        tid=entry["tid"],
-        when=local_time(seconds),
-    )
+    when = time.strftime("%m-%d %H:%M:%S", time.localtime(seconds))
+    fields = {"letter": LETTERS.get(priority, "?"), "ms": us // 1000, "seconds": seconds}
+    header = FORMATS[options.format].format_map(entry | fields | {"when": when})
     text = text.removesuffix("\n")
     if options.format == "long":
         return f"{header}\n{text}\n\n"

@@ -144,21 +144,19 @@ int PriorityOf(const std::string& letter) {
 int Log(int argc, char** argv) {
     int priority = ANDROID_LOG_INFO;
     const char* tag = "log";
-    bool valid = true;
     for (int name = 0; (name = getopt(argc, argv, "+p:t:")) != -1;) {
         switch (name) {
             case 'p':
                 priority = PriorityOf(optarg);
-                valid = valid && priority >= 0;
                 break;
             case 't':
                 tag = optarg;
                 break;
             default:
-                valid = false;
+                return kUsageError;
         }
     }
-    if (!valid || optind == argc) {
+    if (priority < 0 || optind == argc) {
         return kUsageError;
     }
     const std::string text = device::Join(argc - optind, argv + optind);

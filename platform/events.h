@@ -53,7 +53,7 @@ class Event {
     Event(const char* what, bool isLogged);
     int AppendTo(int file) const;
 
-    std::string mLine;  // without its end; empty if the event is neither traced nor logged
+    std::string mLine;  // without "}\n"; empty if the event is neither traced nor logged
 };
 
 }  // namespace host
