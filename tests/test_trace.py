@@ -67,10 +67,10 @@ def test_prints_the_events_when_interrupted(trace, stopped_device):
     command = ["device", "trace", "reboot"]
     with subprocess.Popen(command, env=stopped_device.env, stdout=subprocess.PIPE) as recorder:
         wait_until((stopped_device.root / "trace").exists)
-        wait_until(lambda: stopped_device.events("daemon_start"))
+        wait_until(lambda: stopped_device.events("service_start"))
         wait_until(lambda: not stopped_device.processes("/tpd"))
         recorder.send_signal(signal.SIGINT)
-        assert_in_order(recorder.stdout.read().decode(), "init starts the daemon", "result:")
+        assert_in_order(recorder.stdout.read().decode(), "init starts corvane_daemon", "result:")
 
 
 def test_scripts_ignore_the_callers_python(trace, stopped_device, tmp_path):
