@@ -102,7 +102,7 @@ class DaemonService : public android::BBinder {
   private:
     static android::status_t Execute(const std::string& command, const std::string& params,
                                      android::Parcel* reply) {
-        const device::Fault fault = device::TakeFault(command);
+        const device::Fault fault = device::TakeFault();
         if (fault.kind == FaultKind::kDieBefore) {
             Die();
         }
@@ -114,7 +114,6 @@ class DaemonService : public android::BBinder {
             case FaultKind::kDieDuring:
                 Die();
             case FaultKind::kDieAfter:
-            case FaultKind::kCaptestRestart:
                 host::AfterReply(Die);
                 break;
             case FaultKind::kHang:

@@ -38,8 +38,6 @@ constexpr struct FaultRow {
         {FaultKind::kDieDuring, "die_during", "processes the command, then dies before it replies",
          kNoArgument},
         {FaultKind::kDieAfter, "die_after", "replies, then dies", kNoArgument},
-        {FaultKind::kCaptestRestart, "captest_restart", "replies, then dies, for captest only",
-         kNoArgument},
         {FaultKind::kHang, "hang", "replies late", {"MILLISECONDS", 0, 1'000'000'000}},
         {FaultKind::kStatus, "status", "replies with a status", {"STATUS", INT32_MIN, INT32_MAX}},
         {FaultKind::kNoText, "no_text", "replies without a text", kNoArgument},
@@ -116,13 +114,12 @@ int ListFaults() {
 
 }  // namespace
 
-Fault TakeFault(const std::string& command) {
+Fault TakeFault() {
     const host::UniqueFd lock = LockFault();
     const std::string text = GetProperty(kFaultKey);
     Fault fault;
     const bool isValid = lock.ok() && ParseFault(text, fault).empty();
-    const bool isForCaptest = fault.kind == FaultKind::kCaptestRestart;
-    if (!isValid || fault.kind == FaultKind::kNone || (isForCaptest && command != "captest")) {
+    if (!isValid || fault.kind == FaultKind::kNone) {
         return {};
     }
     if (fault.count > 0) {

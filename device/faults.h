@@ -12,7 +12,6 @@ enum class FaultKind {
     kDieBefore,
     kDieDuring,
     kDieAfter,
-    kCaptestRestart,
     kHang,
     kStatus,
     kNoText,
@@ -25,8 +24,8 @@ struct Fault {
     int64_t count = 0;     // number of calls that the fault affects, 0 for all
 };
 
-// Returns the fault that affects this call of the command, and decrements the fault's count.
-Fault TakeFault(const std::string& command);
+// Returns the fault that affects this call, and decrements the fault's count.
+Fault TakeFault();
 
 // `device fault`: sets the fault given by the arguments or, without arguments, lists all faults.
 // Returns the exit status, 2 for a usage error.

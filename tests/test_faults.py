@@ -15,7 +15,6 @@ RESULTS = [
     ("die_before", TIMEOUT, True),
     ("die_during 1", PASS, True),
     ("die_after", PASS, True),
-    ("captest_restart", PASS, True),
     ("status -22", TIMEOUT, False),
     ("status 7", "\n", False),
     ("no_text", "\n", False),
@@ -29,12 +28,6 @@ def test_fault_has_its_documented_result(device, fault, text, dies):
     assert device.tpd("captest") == text
     assert device.events("fault")[0]["name"] == fault
     wait_until(lambda: bool(device.events("service_exit")) == dies)
-
-
-def test_captest_restart_does_not_apply_to_other_commands(device):
-    device.fault("captest_restart")
-    device.tpd("help")
-    assert device.events("fault") == []
 
 
 def test_oversized_reply_fails_the_call_but_keeps_the_connection(device):
