@@ -1,5 +1,5 @@
-// Recorded answers, which replace the simulated daemon's own. An answer is recorded for a command
-// name, or for a command name and parameters separated by a space.
+// The store of recorded answers, which replace the simulated daemon's own. An answer is recorded
+// for a command name, or for a command name and parameters separated by a space.
 #pragma once
 
 #include <optional>
@@ -15,7 +15,9 @@ std::set<std::string> RecordedCommands();
 // or nullopt if there is neither.
 std::optional<std::string> FindAnswer(const std::string& command, const std::string& params);
 
-// `device answer`: lists, records or removes answers. Returns the exit status, 2 for a usage error.
-int ListOrRecordAnswers(int argc, char** argv);
+// Replace or remove the answer recorded for the command with its parameters, if any. Return false
+// and set errno on failure.
+bool RecordAnswer(const std::string& command, const std::string& answer);
+bool RemoveAnswer(const std::string& command);
 
 }  // namespace device

@@ -10,7 +10,7 @@
 
 #include "answers.h"
 #include "common.h"
-#include "faults.h"
+#include "daemon_verbs.h"
 #include "life.h"
 #include "platform/device_root.h"
 #include "platform/events.h"
@@ -119,7 +119,7 @@ int Trace(int argc, char** argv) {
 
 int Fault(int argc, char** argv) {
     const bool isPossible = argc == 0 || device::ExpectRunning();
-    return isPossible ? device::SetOrListFaults(argc, argv) : 1;
+    return isPossible ? device::ManageFaults(argc, argv) : 1;
 }
 
 constexpr struct Verb {
@@ -147,7 +147,7 @@ constexpr struct Verb {
          "sets the daemon's fault; without arguments, lists the faults", 3, Fault},
         {"answer", " [COMMAND TEXT | COMMAND - | --remove COMMAND]",
          "records an answer (-: from standard input) or removes it; without arguments, lists all",
-         INT_MAX, device::ListOrRecordAnswers}};
+         INT_MAX, device::ManageAnswers}};
 
 void PrintUsage(FILE* stream, const Verb& verb) {
     fprintf(stream, "    %s %s%s\n        %s\n", program_invocation_short_name, verb.name,

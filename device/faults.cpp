@@ -4,7 +4,6 @@
 #include <sys/system_properties.h>
 
 #include <algorithm>
-#include <cstdio>
 #include <cstdlib>
 #include <iterator>
 #include <sstream>
@@ -18,31 +17,7 @@ namespace device {
 
 namespace {
 
-struct Range {
-    const char* name;  // null if the fault has no argument
-    int64_t min;
-    int64_t max;
-};
-
-constexpr Range kNoArgument = {nullptr, 0, 0};
 constexpr Range kCount = {"COUNT", 1, INT32_MAX};
-
-constexpr struct FaultRow {
-    FaultKind kind;
-    const char* name;
-    const char* effect;
-    Range argument;
-} kFaults[] = {
-        {FaultKind::kNone, "none", "works normally", kNoArgument},
-        {FaultKind::kDieBefore, "die_before", "dies before it processes the command", kNoArgument},
-        {FaultKind::kDieDuring, "die_during", "processes the command, then dies before it replies",
-         kNoArgument},
-        {FaultKind::kDieAfter, "die_after", "replies, then dies", kNoArgument},
-        {FaultKind::kHang, "hang", "replies late", {"MILLISECONDS", 0, 1'000'000'000}},
-        {FaultKind::kStatus, "status", "replies with a status", {"STATUS", INT32_MIN, INT32_MAX}},
-        {FaultKind::kNoText, "no_text", "replies without a text", kNoArgument},
-        {FaultKind::kHuge, "huge", "replies with a long text", {"BYTES", 0, 64 << 20}},
-};
 
 // Stores the value of `word` in `number`. Returns an empty string, or an error message if the word
 // is invalid.
@@ -57,39 +32,6 @@ std::string ParseNumber(const std::string& word, const Range& range, int64_t& nu
            std::to_string(range.min) + " to " + std::to_string(range.max);
 }
 
-// Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error message that names the
-// invalid word.
-std::string ParseFault(const std::string& text, Fault& fault) {
-    std::istringstream words(text);
-    const auto nextWord = [&words] {
-        std::string word;
-        words >> word;
-        return word;
-    };
-    const std::string name = nextWord();
-    const auto* const row =
-            std::find_if(std::begin(kFaults), std::end(kFaults),
-                         [&](const FaultRow& candidate) { return name == candidate.name; });
-    if (row == std::end(kFaults)) {
-        return "unknown fault '" + name + "'; " + Command("fault") + " lists them";
-    }
-    fault.kind = row->kind;
-    std::string error;
-    std::string word = nextWord();
-    if (row->argument.name != nullptr) {
-        error = ParseNumber(word, row->argument, fault.argument);
-        word = nextWord();
-    }
-    if (error.empty() && !word.empty() && row->kind != FaultKind::kNone) {
-        error = ParseNumber(word, kCount, fault.count);
-        word = nextWord();
-    }
-    if (error.empty() && !word.empty()) {
-        error = "unexpected argument '" + word + "'";
-    }
-    return error.empty() ? "" : "fault " + name + ": " + error;
-}
-
 // Locks the properties directory, so that only one process or thread at a time changes the fault.
 // Closing the descriptor releases the lock.
 host::UniqueFd LockFault() {
@@ -100,19 +42,43 @@ host::UniqueFd LockFault() {
     return lock;
 }
 
-int ListFaults() {
-    for (const FaultRow& fault : kFaults) {
-        printf("%-16s the daemon %s", fault.name, fault.effect);
-        if (fault.argument.name != nullptr) {
-            printf("; %s: %jd to %jd", fault.argument.name, intmax_t{fault.argument.min},
-                   intmax_t{fault.argument.max});
-        }
-        puts("");
+}  // namespace
+
+std::string ParseFault(const std::string& text, Fault& fault) {
+    std::istringstream words(text);
+    const auto nextWord = [&words] {
+        std::string word;
+        words >> word;
+        return word;
+    };
+    const std::string name = nextWord();
+    const auto* const type =
+            std::find_if(std::begin(kFaultTypes), std::end(kFaultTypes),
+                         [&name](const FaultType& known) { return name == known.name; });
+    if (type == std::end(kFaultTypes)) {
+        return "unknown fault '" + name + "'";
     }
-    return 0;
+    fault.kind = type->kind;
+    std::string error;
+    std::string word = nextWord();
+    if (type->argument.name != nullptr) {
+        error = ParseNumber(word, type->argument, fault.argument);
+        word = nextWord();
+    }
+    if (error.empty() && !word.empty() && type->kind != FaultKind::kNone) {
+        error = ParseNumber(word, kCount, fault.count);
+        word = nextWord();
+    }
+    if (error.empty() && !word.empty()) {
+        error = "unexpected argument '" + word + "'";
+    }
+    return error.empty() ? "" : "fault " + name + ": " + error;
 }
 
-}  // namespace
+bool SetFault(const std::string& text) {
+    const host::UniqueFd lock = LockFault();
+    return lock.ok() && __system_property_set(kFaultKey, text.c_str()) == 0;
+}
 
 Fault TakeFault() {
     const host::UniqueFd lock = LockFault();
@@ -129,22 +95,6 @@ Fault TakeFault() {
     }
     host::Event("fault").Add("name", text);
     return fault;
-}
-
-int SetOrListFaults(int argc, char** argv) {
-    if (argc == 0) {
-        return ListFaults();
-    }
-    const std::string text = Join(argc, argv);
-    Fault fault;
-    if (const std::string error = ParseFault(text, fault); !error.empty()) {
-        return Fail(error, kUsageError);
-    }
-    const host::UniqueFd lock = LockFault();
-    if (!lock.ok() || __system_property_set(kFaultKey, text.c_str()) != 0) {
-        return FailForErrno("cannot set the fault");
-    }
-    return 0;
 }
 
 }  // namespace device

@@ -105,7 +105,7 @@ USAGE_ERRORS = {
     "adb -d shell true": "no devices found",
     "adb -s other shell true": "device 'other' not found",
     "device fault hang 1O0": "hang: invalid MILLISECONDS '1O0'; use 0 to 1000000000",
-    "device fault hangg": "unknown fault 'hangg'; 'device fault' lists them",
+    "device fault hangg": "unknown fault 'hangg'; see 'device fault'",
     "device fault no_text 0": "no_text: invalid COUNT '0'; use 1 to 2147483647",
     "log -p q text": "usage: log",
     "logcat -d -b none": "'none'",
