@@ -41,7 +41,10 @@ int RecordInput(const std::string& command) {
     if (ferror(stdin) != 0) {
         return FailForErrno("cannot read standard input");
     }
-    if (!text.empty() && text.back() == '\n') {
+    if (text.empty()) {
+        return Fail("answer: nothing was recorded, because standard input is empty");
+    }
+    if (text.back() == '\n') {
         text.pop_back();
     }
     return Record(command, text);

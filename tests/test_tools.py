@@ -95,7 +95,7 @@ def test_daemon_returns_recorded_answers(device):
 def test_rejects_answers_that_the_daemon_cannot_send(device):
     largest = "%s%n\xff".ljust(1040383, "r")
     device.answer("captest", "-", input=largest)
-    for invalid in (largest + "r", "a\0b"):
+    for invalid in (largest + "r", "a\0b", ""):
         done = device.run("device", "answer", "captest", "-", input=invalid)
         assert done.returncode == 1
     assert device.tpd("captest") == largest + "\n"
