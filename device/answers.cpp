@@ -59,6 +59,9 @@ std::set<std::string> RecordedCommands() {
 }
 
 std::optional<std::string> FindAnswer(const std::string& command, const std::string& params) {
+    if (command.find(' ') != std::string::npos) {
+        return std::nullopt;  // the space would be read as the end of the command name
+    }
     const std::optional<std::string> answer =
             params.empty() ? std::nullopt : ReadAnswer(command + " " + params);
     return answer.has_value() ? answer : ReadAnswer(command);

@@ -1,5 +1,6 @@
 // The store of recorded answers, which replace the simulated daemon's own. An answer is recorded
-// for a command name, or for a command name and parameters separated by a space.
+// for a command name, or for a command name and parameters separated by a space. A command name
+// contains no space.
 #pragma once
 
 #include <optional>

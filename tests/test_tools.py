@@ -87,6 +87,7 @@ def test_daemon_returns_recorded_answers(device):
     device.setprop(PERMISSIVE, "true")
     assert device.tpd("THP_GetVersion", "x") == "v%d\n"
     assert device.tpd("THP_SetFoldState", "1") == "\xff\n\n"
+    assert "unknown command" in device.tpd("THP_SetFoldState 1")
     device.answer("--remove", "THP_SetFoldState 1")
     assert device.tpd("THP_SetFoldState", "1") == "THP_SetFoldState: done (1)\n"
     assert device.answer() == "THP_GetVersion\n"
