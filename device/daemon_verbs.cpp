@@ -31,7 +31,11 @@ int Record(const std::string& command, const std::string& answer) {
     if (answer.find('\0') != std::string::npos) {
         return Fail("answer: the text contains a NUL byte");
     }
-    return RecordAnswer(command, answer) ? 0 : FailForErrno("answer '" + command + "'");
+    if (RecordAnswer(command, answer)) {
+        return 0;
+    }
+    return errno == ENAMETOOLONG ? Fail("answer: the command is too long; see tpd-device(1)")
+                                 : FailForErrno("answer '" + command + "'");
 }
 
 // Records standard input without its final newline, because the tool appends one to an answer.

@@ -105,6 +105,7 @@ def test_rejects_answers_that_the_daemon_cannot_send(device):
 USAGE_ERRORS = {
     "adb -d shell true": "no devices found",
     "adb -s other shell true": "device 'other' not found",
+    f"device answer {'x' * 256} text": "answer: the command is too long",
     "device fault hang 1O0": "hang: invalid MILLISECONDS '1O0'; use 0 to 1000000000",
     "device fault hangg": "unknown fault 'hangg'; see 'device fault'",
     "device fault no_text 0": "no_text: invalid COUNT '0'; use 1 to 2147483647",
