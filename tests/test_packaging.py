@@ -11,8 +11,8 @@ from virtual_device import SOURCE, wait_until
 COMPLETIONS = {
     "bash": """
 . usr/share/bash-completion/completions/tpd-device
-COMP_WORDS=("$@") COMP_CWORD=$(($# - 1))
-_${1//-/_} $1
+COMP_WORDS=("$@") COMP_CWORD=$(($# - 1)) COMP_LINE=$* COMP_POINT=${#COMP_LINE}
+_${1//-/_} "$1" "${!#}"
 printf '%s\\n' "${COMPREPLY[@]}"
 """,
     "zsh": """
@@ -85,12 +85,42 @@ def test_completes_parameters(complete):
     assert complete("tpd", "stop", "") == []
 
 
-def test_completes_tpd_device(complete, installed_device):
-    installed_device.output("tpd-device", "answer", "captest", "done")
+def test_completes_tpd_device(complete):
     assert {"start", "trace", "answer"}.issubset(complete("tpd-device", ""))
     assert complete("tpd-device", "start", "") == ["--permissive"]
     assert "die_during" in complete("tpd-device", "fault", "")
-    assert complete("tpd-device", "answer", "--remove", "") == ["captest"]
+
+
+INTERACTIVE = {
+    "bash --norc": """
+. usr/share/bash-completion/completions/tpd-device
+""",
+    "zsh -f": """
+fpath=(usr/share/zsh/vendor-completions $fpath); autoload -U compinit; compinit -D
+""",
+}
+# Commands with a recorded answer, and how the user begins to type them
+BEGUN = {
+    "$(touch X)": "\\$",
+    "a $(touch X) 'b'": "'a $(",
+    'c "$d" !e!': '"c ',
+    "f\\ g": "f\\\\",
+    "h's  i": '"h\'"s\\ ',
+    "j:k\tl:m": "j:k",
+    "~[n]*?#{o,p};&|<>": "\\~",
+}
+
+
+@pytest.mark.parametrize("shell", INTERACTIVE)
+def test_completes_recorded_commands_as_the_user_quotes_them(installed, installed_device, shell):
+    for command in BEGUN:
+        installed_device.answer(command, "text")
+    lines = [f"tpd-device answer --remove {begun}\t\n" for begun in BEGUN.values()]
+    session = "".join([INTERACTIVE[shell], *lines, "exit\n"])
+    terminal = "script", "-qc", shell, "/dev/null"
+    shown = installed_device.output(*terminal, cwd=installed, input=session)
+    assert installed_device.answer() == "", shown
+    assert not (installed / "X").exists()
 
 
 def described(page, section):
