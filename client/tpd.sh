@@ -1,5 +1,5 @@
 # shellcheck shell=sh disable=SC2016,SC2034
-# Functions for POSIX shell scripts that drive tpd on a device through adb:
+# Functions for POSIX shell scripts, and for zsh, that drive tpd on a device through adb:
 #
 #   . ./tpd.sh
 #   tpd_wait 30 || exit 1
@@ -12,6 +12,7 @@
 # tpd_adb ARGUMENT...: runs adb with an empty standard input, because `adb shell` would read that of
 # the caller.
 tpd_adb() {
+    [ -z "${ZSH_VERSION-}" ] || setopt local_options sh_word_split
     # shellcheck disable=SC2086
     ${ADB:-adb} "$@" </dev/null
 }

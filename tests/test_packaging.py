@@ -203,8 +203,10 @@ def test_runs_the_ci_example(installed, installed_device):
     assert done.returncode == 0, done.stderr
 
 
-def test_client_passes_any_argument_unchanged(device):
+@pytest.mark.parametrize("shell", ["dash", "bash", "mksh", "zsh"])
+def test_client_passes_any_argument_unchanged(device, shell):
     argument = "it's  $HOME\n`x`"
     script = '. client/tpd.sh; tpd_send captest "$1"; printf %s "$TPD_RESULT"'
-    answer = device.output("sh", "-c", script, "sh", argument, cwd=SOURCE)
+    device.env["ADB"] = "adb -s virtual"
+    answer = device.output(shell, "-c", script, "sh", argument, cwd=SOURCE)
     assert answer == f"captest {argument}: PASS"
