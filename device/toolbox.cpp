@@ -56,8 +56,8 @@ int Setprop(int /* argc */, char** argv) {
         return 0;
     }
     fprintf(stderr, "Failed to set property '%s' to '%s'.\n", name, value.c_str());
-    if (const char* const rule = host::BrokenPropertyRule(name, value); rule != nullptr) {
-        fprintf(stderr, "%s\n", rule);
+    if (const char* const error = host::PropertyError(name, value); error != nullptr) {
+        fprintf(stderr, "%s\n", error);
     }
     return 1;
 }

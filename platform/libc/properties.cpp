@@ -3,10 +3,13 @@
 #include <sys/system_properties.h>
 
 #include <fcntl.h>
+#include <locale.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <string>
 
@@ -27,30 +30,20 @@ bool IsLegalName(const std::string& name) {
            name.find_first_not_of(kLegal) == std::string::npos;
 }
 
-// Returns true if the value is valid UTF-8, without overlong forms or surrogates.
+// Returns true if the value is valid UTF-8. The C library reads files to load the locale, so ASCII,
+// the usual case, is checked without it.
 bool IsUtf8(const std::string& value) {
-    int following = 0;  // continuation bytes that the character still needs
-    int least = 0;      // the range of the next one
-    int greatest = 0;
-    for (const char c : value) {
-        const auto byte = static_cast<unsigned char>(c);
-        if (following > 0) {
-            if (byte < least || byte > greatest) {
-                return false;
-            }
-            --following;
-            least = 0x80;
-            greatest = 0xBF;
-        } else if (byte >= 0x80) {
-            if (byte < 0xC2 || byte > 0xF4) {
-                return false;
-            }
-            following = byte < 0xE0 ? 1 : byte < 0xF0 ? 2 : 3;
-            least = byte == 0xE0 ? 0xA0 : byte == 0xF0 ? 0x90 : 0x80;
-            greatest = byte == 0xED ? 0x9F : byte == 0xF4 ? 0x8F : 0xBF;
-        }
+    if (std::all_of(value.begin(), value.end(), [](char c) { return (c & 0x80) == 0; })) {
+        return true;
     }
-    return following == 0;
+    static const locale_t utf8 = newlocale(LC_CTYPE_MASK, "C.UTF-8", nullptr);
+    const locale_t previous = uselocale(utf8);
+    std::wstring text(value.length(), L'\0');
+    const size_t length = mbstowcs(text.data(), value.c_str(), text.length());
+    uselocale(previous);
+    // The C library also decodes characters above U+10FFFF.
+    return length != static_cast<size_t>(-1) &&
+           *std::max_element(text.begin(), text.end()) <= 0x10FFFF;
 }
 
 // Returns true if the owner has no write permission. Then even root cannot write the property.
@@ -71,7 +64,7 @@ int Get(const std::string& name, char* value) {
 }
 
 bool Set(const std::string& name, const std::string& value) {
-    if (host::BrokenPropertyRule(name, value) != nullptr || IsWriteProtected(name)) {
+    if (host::PropertyError(name, value) != nullptr || IsWriteProtected(name)) {
         return false;
     }
     const unsigned flags = IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0;
@@ -81,7 +74,7 @@ bool Set(const std::string& name, const std::string& value) {
 
 }  // namespace
 
-const char* host::BrokenPropertyRule(const std::string& name, const std::string& value) {
+const char* host::PropertyError(const std::string& name, const std::string& value) {
     if (!IsLegalName(name)) {
         return "The name is illegal.";
     }

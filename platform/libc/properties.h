@@ -6,6 +6,6 @@
 namespace host {
 
 // Returns a sentence that says why the name or the value is invalid, or nullptr if both are valid.
-const char* BrokenPropertyRule(const std::string& name, const std::string& value);
+const char* PropertyError(const std::string& name, const std::string& value);
 
 }  // namespace host
