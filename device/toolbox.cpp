@@ -174,6 +174,29 @@ int Logcat(int argc, char** argv) {
     return FailForErrno(script);
 }
 
+// The device's user is root, whoever runs the device.
+int Id(int argc, char** argv) {
+    bool isOneId = false;
+    bool isName = false;
+    for (int name = 0; (name = getopt(argc, argv, "Ggnru")) != -1;) {
+        if (name == '?') {
+            return kUsageError;
+        }
+        isOneId |= strchr("Ggu", name) != nullptr;
+        isName |= name == 'n';
+    }
+    if (optind < argc) {
+        return kUsageError;
+    }
+    puts(!isOneId ? "uid=0(root) gid=0(root) groups=0(root)" : isName ? "root" : "0");
+    return 0;
+}
+
+int Whoami(int /* argc */, char** /* argv */) {
+    puts("root");
+    return 0;
+}
+
 int Reboot(int /* argc */, char** /* argv */) {
     const std::string device = device::PathBesideProgram("device");
     execl(device.c_str(), "device", "reboot", nullptr);
@@ -189,6 +212,7 @@ constexpr struct {
 } kCommands[] = {
         {"getenforce", 1, 1, Getenforce, ""},
         {"getprop", 1, 3, Getprop, "[NAME [DEFAULT]]"},
+        {"id", 1, INT_MAX, Id, "[-Ggnru]"},
         {"log", 2, INT_MAX, Log, "[-p V|D|I|W|E|F|S] [-t TAG] TEXT..."},
         {"logcat", 1, INT_MAX, Logcat, ""},
         {"reboot", 1, 1, Reboot, ""},
@@ -197,6 +221,7 @@ constexpr struct {
         {"settings", 3, 5, Settings, "put|get|delete|list system|secure|global [KEY [VALUE]]"},
         {"start", 1, 2, ControlService, "[SERVICE]"},
         {"stop", 1, 2, ControlService, "[SERVICE]"},
+        {"whoami", 1, 1, Whoami, ""},
 };
 
 }  // namespace

@@ -160,5 +160,13 @@ def test_shell_sees_only_processes_of_its_device(device):
     (daemon,) = device.processes("corvane_daemon")
     assert device.shell("pgrep '^(corvane|python)'") == f"{daemon}\n"
     assert "python" not in device.shell("ps -ef")
+    columns = "USER PID PPID VSZ RSS WCHAN ADDR S NAME"
+    assert device.shell("ps --help && ps").splitlines()[1].split() == columns.split()
     device.shell("pkill -9 corvane_daemon")
     wait_until(lambda: device.restarts() == 1)
+
+
+def test_shell_answers_what_clients_of_a_phone_ask(device):
+    assert device.shell("id -u; whoami; id -gn") == "0\nroot\nroot\n"
+    assert device.shell("id") == "uid=0(root) gid=0(root) groups=0(root)\n"
+    assert device.shell("getprop ro.product.model") == "virtual\n"
