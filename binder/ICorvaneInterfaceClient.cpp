@@ -5,8 +5,6 @@
 
 #include <algorithm>
 
-#include "binder/corvane_sys_binder_client.h"
-
 using android::IBinder;
 using android::Parcel;
 using android::sp;
@@ -58,9 +56,6 @@ const std::vector<std::string> g_asyncThpCmds = {
         "THP_SetXCoreArea",
         "THP_UpdateViewsLocation",
 };
-
-sp<IBinder> g_thpBinder;
-sp<MyDeathRecipient> g_deathRecipient;
 
 namespace {
 

@@ -11,6 +11,9 @@
 #include <utils/RefBase.h>
 #include <utils/String16.h>
 
+// Marks a command as two-way. The marker is removed before the command is sent.
+constexpr char kTwoWayMarker[] = "[TPD]";
+
 class ICorvaneInterfaceClient : public android::IInterface {
   public:
     static const android::String16 descriptor;
@@ -65,9 +68,3 @@ bool IsAsync(const std::vector<std::string>& list, std::string text);
 // second to its parameters.
 extern const std::vector<std::string> g_asyncCmds;
 extern const std::vector<std::string> g_asyncThpCmds;
-
-// The service's binder. Null before the first successful lookup and after a failed call.
-extern android::sp<android::IBinder> g_thpBinder;
-
-// The death recipient, linked to every binder that a lookup returns. Null before the first one.
-extern android::sp<MyDeathRecipient> g_deathRecipient;

@@ -6,12 +6,15 @@
 #include <sys/system_properties.h>
 #include <unistd.h>
 
-#include "binder/ICorvaneInterfaceClient.h"
+#include <vector>
 
 using android::IBinder;
 using android::sp;
 using android::status_t;
 using android::String16;
+
+sp<IBinder> g_thpBinder;
+sp<MyDeathRecipient> g_deathRecipient;
 
 namespace {
 
@@ -109,7 +112,10 @@ void ResetDaemon() {
 
 void StoreScreenState(std::string params) {
     static const std::vector<std::string> kMarkers = {"version:3+whole", "version:3+main"};
-    if (IsAsync(kMarkers, params)) {
-        SetProperty(kScreenStatusKey, params);
+    for (const std::string& marker : kMarkers) {
+        if (params.find(marker) != std::string::npos) {
+            SetProperty(kScreenStatusKey, params);
+            return;
+        }
     }
 }

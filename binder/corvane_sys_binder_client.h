@@ -3,8 +3,10 @@
 
 #include <string>
 
-// Marks a command as two-way. The marker is removed before the command is sent.
-constexpr char kTwoWayMarker[] = "[TPD]";
+#include <binder/IBinder.h>
+#include <utils/StrongPointer.h>
+
+#include "binder/ICorvaneInterfaceClient.h"
 
 // The prefix of a result if the service is not found.
 constexpr char kNoServicePrefix[] = "0F_1F; ";
@@ -20,3 +22,9 @@ void ResetDaemon();
 
 // Stores `params` in the screen-state property if they contain a screen-state marker.
 void StoreScreenState(std::string params);
+
+// The service's binder. Null before the first successful lookup and after a failed call.
+extern android::sp<android::IBinder> g_thpBinder;
+
+// The death recipient, linked to every binder that a lookup returns. Null before the first one.
+extern android::sp<MyDeathRecipient> g_deathRecipient;

@@ -7,7 +7,7 @@
 #include <cstdlib>
 #include <new>
 
-#include "binder/corvane_sys_binder_client.h"
+#include "binder/ICorvaneInterfaceClient.h"
 #include "daemon/TpdCmd.h"
 #include "property/Property.h"
 

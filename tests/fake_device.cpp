@@ -11,6 +11,7 @@
 #include <new>
 
 #include "binder/ICorvaneInterfaceClient.h"
+#include "binder/corvane_sys_binder_client.h"
 #include "daemon/TpdCmd.h"
 #include "main/TpdMain.h"
 #include "platform/device_root.h"
