@@ -1,7 +1,7 @@
 // The baseline makes the tool's system calls, in the same order and with the same data, and does
 // nothing else.
 //   baseline THP_ResetBaseline   forwards the command, or refuses it while SELinux is enforcing
-//   baseline stop                stops the daemon
+//   baseline debugRawEnable      sets a property
 #define _GNU_SOURCE
 #include <fcntl.h>
 #include <signal.h>
@@ -18,7 +18,7 @@
 
 #define COMMAND "THP_ResetBaseline"
 #define DESCRIPTOR u"android.CorvaneInterfaceServer.ICorvaneInterfaceService"
-#define SERVICE_ENABLE "odm.thp.service_enable"
+#define DEBUG_RAW "thp.debug.raw"
 #define REBOOT_TIMES "odm.thp.dae_reboot_times"
 #define REFUSAL "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
 
@@ -32,7 +32,7 @@ static int logFile;
 static char value[kMaxValue + 1];
 static struct stat status;
 
-static void Fail(const char* what) {
+__attribute__((noreturn)) static void Fail(const char* what) {
     perror(what);
     _exit(1);
 }
@@ -43,6 +43,7 @@ static void WriteAll(int file, const char* text, size_t size) {
     }
 }
 
+// Appends an entry to the log. The bytes are those of platform/log_file.cpp.
 static void Log(uint8_t priority, const char* tag, const char* text) {
     struct timespec now;
     clock_gettime(CLOCK_REALTIME, &now);
@@ -208,21 +209,21 @@ static void Forward(void) {
     Print(connection, text);
 }
 
-static void Stop(void) {
-    Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[145] Get cmd. stop\n");
-    ReadProperty(SERVICE_ENABLE);
-    WriteProperty(SERVICE_ENABLE, "0");
-    Log(kError, "corvane_daemon", "retry:1, i = 0, odm.thp.service_enable, [new]0, [old]1");
+static void DebugRawEnable(void) {
+    Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[145] Get cmd. debugRawEnable\n");
+    ReadProperty(DEBUG_RAW);
+    WriteProperty(DEBUG_RAW, "true");
+    Log(kError, "corvane_daemon", "retry:1, i = 0, " DEBUG_RAW ", [new]true, [old]false");
     usleep(100);
-    ReadProperty(SERVICE_ENABLE);
+    ReadProperty(DEBUG_RAW);
     BeginOutput();
     WriteAll(STDOUT_FILENO, "\n", 1);
 }
 
 int main(int argc, char** argv) {
     Start();
-    if (argc == 2 && strcmp(argv[1], "stop") == 0) {
-        Stop();
+    if (argc == 2 && strcmp(argv[1], "debugRawEnable") == 0) {
+        DebugRawEnable();
     } else {
         Forward();
     }
