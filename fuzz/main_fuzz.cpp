@@ -2,16 +2,24 @@
 // bits that set the device's state; the arguments follow as zero-terminated strings. The last
 // argument is also the kernel command line, the output of getenforce and the daemon's answer.
 #include <bitset>
+#include <cstdint>
 #include <cstdio>
+#include <cstdlib>
 #include <sstream>
 
 #include "daemon/TpdClient.h"
-#include "fuzz.h"
 #include "tests/fake_device.h"
 
 int tpd_main(int argc, char** argv);
 
-int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+// Aborts if the condition is false; libFuzzer then saves the input.
+static void Check(bool condition) {
+    if (!condition) {
+        abort();
+    }
+}
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     static const bool silent = freopen("/dev/null", "w", stdout) != nullptr;
     if (size < 2) {
         return 0;

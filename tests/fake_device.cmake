@@ -1,4 +1,4 @@
-# The tool on the fake device, for unit tests and fuzz targets. They call its main() as tpd_main().
+# The tool on the fake device, for the unit tests and the fuzz target. They call its main() as tpd_main().
 # The linker redirects C library calls to the fake device.
 include_guard(GLOBAL)
 
