@@ -1,5 +1,5 @@
-# The tool on the fake device, for the unit tests and the fuzz target. They call its main() as tpd_main().
-# The linker redirects C library calls to the fake device.
+# The tool on the fake device, for the unit tests and the fuzz target. They call its main() as
+# tpd_main(). The linker redirects C library calls to the fake device.
 include_guard(GLOBAL)
 
 add_library(tpd_front_end STATIC ${PROJECT_SOURCE_DIR}/main/TpdMain.cpp)
