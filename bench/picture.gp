@@ -10,5 +10,7 @@ set yrange [0:*]
 set grid ytics
 set key top left reverse Left
 set style data yerrorlines
-plot $replies using ($1/1024):3:2:4 lc rgb "#4878a8" pt 7 ps 0.6 title "baseline (median, quartiles)", \
-    "" using ($1/1024):6:5:7 lc rgb "#e08030" pt 7 ps 0.6 title "tpd (median, quartiles)"
+set linetype 1 lc rgb "#4878a8" pt 7 ps 0.6
+set linetype 2 lc rgb "#e08030" pt 7 ps 0.6
+plot $replies using ($1/1024):3:2:4 title "baseline (median, quartiles)", \
+    "" using ($1/1024):6:5:7 title "tpd (median, quartiles)"

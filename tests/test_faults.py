@@ -1,4 +1,5 @@
 """Faults of the daemon, of the tool's output and of clients"""
+import re
 import signal
 import socket
 import struct
@@ -15,6 +16,7 @@ RESULTS = [
     ("die_before", TIMEOUT, True),
     ("die_during 1", PASS, True),
     ("die_after", PASS, True),
+    ("hang 1", PASS, False),
     ("status -22", TIMEOUT, False),
     ("status 7", "\n", False),
     ("no_text", "\n", False),
@@ -28,6 +30,11 @@ def test_fault_has_its_documented_result(device, fault, text, dies):
     assert device.tpd("captest") == text
     assert device.events("fault")[0]["name"] == fault
     wait_until(lambda: bool(device.events("service_exit")) == dies)
+
+
+def test_every_fault_has_a_row(stopped_device):
+    listed = re.findall(r"^\w+", stopped_device.output("device", "fault"), re.M)
+    assert {"none", *(row[0].split()[0] for row in RESULTS)} == set(listed)
 
 
 def test_oversized_reply_fails_the_call_but_keeps_the_connection(device):

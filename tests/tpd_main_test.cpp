@@ -7,10 +7,39 @@ int tpd_main(int argc, char** argv);
 
 namespace test {
 
-constexpr char kHelpText[] =
-        "\n\n//aaa special gTpdCmds\n"
-        "debugDifEnable\ndebugRawEnable\nlog_afe_disable\nlog_afe_enable\nlog_disable\n"
-        "log_enable\nreboot\nshowtouch\nshowtouch_close\nstart\nstop\n";
+const Call kDebugOff = Write("persist.sys.zelmor.debug.on", "false");
+const Call kStoreVersion = Write("persist.odm.thp.ver_dae", "true");
+const Call kSetVersion = Write("odm.thp.ver_dae", "true");
+const Call kLogOff = Write(kThplogKey, "false");
+const Call kLogOn = Write(kThplogKey, "true");
+const Call kAfeLogOff = Write("odm.thp.debug.afelog", "false");
+const Call kAfeLogOn = Write("odm.thp.debug.afelog", "true");
+
+Call PutSetting(const std::string& arguments) { return Shell("settings put system " + arguments); }
+
+// All local commands, with the calls that change the device.
+const std::map<std::string, std::vector<Call>> kLocalCommands = {
+        {"debugDifEnable", {Write("thp.debug.raw", "false")}},
+        {"debugRawEnable", {Write("thp.debug.raw", "true")}},
+        {"log_afe_disable", {kAfeLogOff, kStop, kSetBootFlag, kStart}},
+        {"log_afe_enable", {kAfeLogOn, kStop, kSetBootFlag, kStart}},
+        {"log_disable",
+         {kDebugOff, kStoreVersion, kSetVersion, kLogOff, kStop, kSetBootFlag, kStart}},
+        {"log_enable", {kLogOn, kStop, kSetBootFlag, kStart}},
+        {"reboot", {kStop, kSetBootFlag, kStart}},
+        {"showtouch", {PutSetting("show_touches 1"), PutSetting("pointer_location 1")}},
+        {"showtouch_close", {PutSetting("show_touches 0"), PutSetting("pointer_location 0")}},
+        {"start", {kSetBootFlag, kStart}},
+        {"stop", {kStop}},
+};
+
+std::string HelpText() {
+    std::string text = "\n\n//aaa special gTpdCmds\n";
+    for (const auto& row : kLocalCommands) {
+        text += row.first + "\n";
+    }
+    return text;
+}
 
 // Runs the tool with these arguments and returns its output.
 std::string RunTool(std::vector<std::string> arguments) {
@@ -27,10 +56,10 @@ TEST(TpdMainTest, MarksForwardedCommandsAsTwoWay) {
     const struct {
         std::vector<std::string> arguments;
         Call call;
-        const char* help;
+        std::string help;
     } kRows[] = {
-            {{"tpd"}, Transact("help"), kHelpText},
-            {{"tpd", "help"}, Transact("help"), kHelpText},
+            {{"tpd"}, Transact("help"), HelpText()},
+            {{"tpd", "help"}, Transact("help"), HelpText()},
             {{"tpd", "help", ""}, Transact("help"), ""},
             {{"tpd", "Start"}, Transact("Start"), ""},
             {{"tpd", "aftouch"}, Transact("aftouch"), ""},
@@ -41,7 +70,7 @@ TEST(TpdMainTest, MarksForwardedCommandsAsTwoWay) {
         SCOPED_TRACE(testing::PrintToString(row.arguments));
         FakeDevice device;
         device.getenforce = "Permissive\n";
-        EXPECT_EQ(RunTool(row.arguments), std::string("answer") + row.help + "\n");
+        EXPECT_EQ(RunTool(row.arguments), "answer" + row.help + "\n");
         EXPECT_THAT(device.calls({kTransact}), ElementsAre(row.call));
     }
 }
@@ -62,36 +91,12 @@ TEST(TpdMainTest, IgnoresInvalidArguments) {
 }
 
 TEST(TpdMainTest, ExecutesLocalCommands) {
-    const std::string show = "settings put system show_touches ";
-    const std::string point = "settings put system pointer_location ";
-    const std::string afeKey = "odm.thp.debug.afelog";
-    const Call debugOff = Write("persist.sys.zelmor.debug.on", "false");
-    const Call storeVersion = Write("persist.odm.thp.ver_dae", "true");
-    const Call setVersion = Write("odm.thp.ver_dae", "true");
-    const Call logOff = Write(kThplogKey, "false");
-    const struct {
-        const char* command;
-        std::vector<Call> calls;
-    } kRows[] = {
-            {"start", {kSetBootFlag, kStart}},
-            {"stop", {kStop}},
-            {"reboot", {kStop, kSetBootFlag, kStart}},
-            {"log_enable", {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart}},
-            {"log_disable",
-             {debugOff, storeVersion, setVersion, logOff, kStop, kSetBootFlag, kStart}},
-            {"debugRawEnable", {Write("thp.debug.raw", "true")}},
-            {"debugDifEnable", {Write("thp.debug.raw", "false")}},
-            {"log_afe_enable", {Write(afeKey, "true"), kStop, kSetBootFlag, kStart}},
-            {"log_afe_disable", {Write(afeKey, "false"), kStop, kSetBootFlag, kStart}},
-            {"showtouch", {Shell(show + "1"), Shell(point + "1")}},
-            {"showtouch_close", {Shell(show + "0"), Shell(point + "0")}},
-    };
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.command);
+    for (const auto& [command, calls] : kLocalCommands) {
+        SCOPED_TRACE(command);
         FakeDevice device;
-        device.properties[kThplogKey] = row.command == std::string("log_disable") ? "true" : "";
-        EXPECT_EQ(RunTool({"tpd", row.command}), "\n");
-        EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(row.calls));
+        device.properties[kThplogKey] = command == "log_disable" ? "true" : "";
+        EXPECT_EQ(RunTool({"tpd", command}), "\n");
+        EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(calls));
     }
 }
 
@@ -117,8 +122,8 @@ TEST(TpdMainTest, LogsAForwardedCommand) {
 TEST(TpdMainTest, SendsNothingWhileSelinuxIsEnforcing) {
     FakeDevice device;
     EXPECT_EQ(RunTool({"tpd"}),
-              std::string("please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n") +
-                      kHelpText + "\n");
+              "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n" + HelpText() +
+                      "\n");
     EXPECT_THAT(device.calls({kGetService}), IsEmpty());
     EXPECT_EQ(g_tpdCmd, nullptr);
     EXPECT_THAT(gTpdCmds, IsEmpty());
