@@ -53,7 +53,8 @@ def test_daemon_refuses_requests_to_another_interface(device):
 
 def test_tool_can_be_interrupted_while_the_daemon_hangs(device):
     device.fault("hang 60000 1")
-    tool = subprocess.Popen([*device.tool, "captest"], env=device.env)
+    command = "env", "--default-signal=INT", *device.tool, "captest"
+    tool = subprocess.Popen(command, env=device.env)
     wait_until(lambda: device.events("fault"))
     tool.send_signal(signal.SIGINT)
     assert tool.wait(LIMIT_S) == -signal.SIGINT
