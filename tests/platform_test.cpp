@@ -12,6 +12,7 @@
 #include <filesystem>
 #include <fstream>
 #include <thread>
+#include <vector>
 
 #include "platform/device_root.h"
 #include "platform/files.h"
@@ -126,23 +127,26 @@ TEST(ParcelTest, RejectsAnotherInterfaceNameOfTheSameLength) {
     EXPECT_TRUE(request.enforceInterface(android::String16("interface.a")));
 }
 
-// Checks the order of calls from two clients. A call's code is twice its sequence number, plus 1
-// for the second client.
+// Records the number in each call. The code of a call is its client, 0 or 1.
 class OneWayService : public android::BBinder {
   public:
-    std::atomic<uint32_t> calls[2] = {};
-    std::atomic<int> running = 0;
-    std::atomic<int> misplaced = 0;
+    std::vector<int32_t> numbers[2];
+    std::atomic<size_t> finished = 0;
+    std::atomic<bool> overlapped = false;
 
   private:
-    android::status_t onTransact(uint32_t code, const Parcel&, Parcel*, uint32_t) override {
-        const bool isNext = ++running == 1 && code / 2 == calls[code % 2];
-        misplaced += isNext ? 0 : 1;
+    android::status_t onTransact(uint32_t client, const Parcel& data, Parcel*, uint32_t) override {
+        if (mRunning.exchange(true)) {
+            overlapped = true;
+        }
         std::this_thread::sleep_for(std::chrono::microseconds(100));
-        --running;
-        ++calls[code % 2];
+        numbers[client].push_back(data.readInt32());
+        mRunning = false;
+        ++finished;
         return android::OK;
     }
+
+    std::atomic<bool> mRunning = false;
 };
 
 TEST(ServiceTest, IsNotFoundThroughASymbolicLink) {
@@ -155,16 +159,22 @@ TEST(ServiceTest, IsNotFoundThroughASymbolicLink) {
 TEST(ServiceTest, ExecutesOneWayCallsInSequence) {
     const sp<OneWayService> service = new OneWayService;
     EXPECT_EQ(host::PublishService(kDriver, "queue", service), android::OK);
-    const sp<IBinder> first = host::ConnectService(kDriver, "queue");
-    const sp<IBinder> second = host::ConnectService(kDriver, "queue");
-    for (uint32_t i = 0; i < 50; ++i) {
-        first->transact(2 * i, Parcel(), nullptr, IBinder::FLAG_ONEWAY);
-        second->transact(2 * i + 1, Parcel(), nullptr, IBinder::FLAG_ONEWAY);
+    const sp<IBinder> clients[] = {host::ConnectService(kDriver, "queue"),
+                                   host::ConnectService(kDriver, "queue")};
+    std::vector<int32_t> sent;
+    for (int32_t number = 0; number < 50; ++number) {
+        Parcel data;
+        data.writeInt32(number);
+        clients[0]->transact(0, data, nullptr, IBinder::FLAG_ONEWAY);
+        clients[1]->transact(1, data, nullptr, IBinder::FLAG_ONEWAY);
+        sent.push_back(number);
     }
-    while (service->calls[0] + service->calls[1] < 100) {
+    while (service->finished < 2 * sent.size()) {
         std::this_thread::yield();
     }
-    EXPECT_EQ(service->misplaced, 0);
+    EXPECT_FALSE(service->overlapped);
+    EXPECT_EQ(service->numbers[0], sent);
+    EXPECT_EQ(service->numbers[1], sent);
 }
 
 // A proxy and the service's end of its connection.

@@ -10,13 +10,6 @@ constexpr char kRebootTimesKey[] = "odm.thp.dae_reboot_times";
 
 class TpdClientTest : public DeviceTest {
   protected:
-    size_t ChecksWhileDaemonIsDown() {
-        device.properties[kAliveKey] = "false";
-        const size_t before = device.calls({kLog}).size();
-        client.ThpExecuteCmdParams("[TPD]c", "");
-        return device.calls({kLog}).size() - before;
-    }
-
     TpdClient client;
 };
 
@@ -60,14 +53,18 @@ TEST_F(TpdClientTest, DoesNotWaitDuringAFirmwareUpdate) {
 }
 
 TEST_F(TpdClientTest, ChecksOnlyOnceAfterTwoFailedWaits) {
-    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
-    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
-    EXPECT_EQ(ChecksWhileDaemonIsDown(), 1U);
-    device.properties[kAliveKey] = "true";
-    device.answers = {{android::OK, "an ERROR"}};
-    EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", ""), "an ERROR");
-    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
-    EXPECT_EQ(ChecksWhileDaemonIsDown(), 11U);
+    device.properties[kAliveKey] = "false";
+    for (const char* lastCheck : {"10", "10", "0", "0"}) {
+        EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", ""),
+                  std::string("0P_1P; check_time: ") + lastCheck +
+                          ".thp.dae_alive : 0. thp.binder: 1 reboot_times: 0");
+    }
+}
+
+TEST_F(TpdClientTest, ForgetsFailedWaitsWhenTheDaemonIsAlive) {
+    failedWaitCount = 2;
+    EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", ""), "answer");
+    EXPECT_EQ(failedWaitCount, 0);
 }
 
 TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerReportsAFailure) {
