@@ -5,13 +5,13 @@
 #define _GNU_SOURCE
 #include <fcntl.h>
 #include <signal.h>
+#include <stdbool.h>
 #include <stdint.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/uio.h>
 #include <sys/un.h>
 #include <time.h>
 #include <unistd.h>
@@ -22,7 +22,7 @@
 #define REBOOT_TIMES "odm.thp.dae_reboot_times"
 #define REFUSAL "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
 
-enum { kMaxValue = 91, kMaxLogText = 1023, kBlock = 4096, kInfo = 4, kError = 6 };
+enum { kMaxValue = 91, kMaxLogText = 1023, kMaxLine = 8192, kBlock = 4096, kInfo = 4, kError = 6 };
 enum { kFile = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC };
 enum { kDirectory = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC };
 
@@ -43,22 +43,23 @@ static void WriteAll(int file, const char* text, size_t size) {
     }
 }
 
-// Appends an entry to the log. The bytes are those of platform/log_file.cpp.
-static void Log(uint8_t priority, const char* tag, const char* text) {
+// Appends an event to the log. The bytes are those of platform/events.cpp.
+static void Log(int priority, const char* tag, const char* text) {
     struct timespec now;
+    char line[kMaxLine];
     clock_gettime(CLOCK_REALTIME, &now);
-    const size_t tagSize = strlen(tag) + 1;
-    const size_t textSize = strlen(text) + 1;
-    const uint32_t size = (uint32_t)(1 + tagSize + textSize);
-    const uint32_t header[] = {size, (uint32_t)getpid(), (uint32_t)gettid(), (uint32_t)now.tv_sec,
-                               (uint32_t)now.tv_nsec};
-    const struct iovec parts[] = {{(void*)header, sizeof(header)},
-                                  {&priority, 1},
-                                  {(void*)tag, tagSize},
-                                  {(void*)text, textSize}};
-    if (writev(logFile, parts, 4) < 0) {
-        Fail("log");
+    char* end = line + sprintf(line,
+                               "{\"time\":%jd.%06ld,\"pid\":%d,\"tid\":%d,\"who\":\"tpd\","
+                               "\"what\":\"log\",\"priority\":%d,\"tag\":\"%s\",\"text\":\"",
+                               (intmax_t)now.tv_sec, now.tv_nsec / 1000, getpid(), gettid(),
+                               priority, tag);
+    for (; *text != '\0'; ++text) {
+        const bool isPlain = *text >= ' ' && *text <= '~' && *text != '"' && *text != '\\';
+        const bool isQuoted = *text == '"' || *text == '\\';
+        end += sprintf(end, isPlain ? "%c" : isQuoted ? "\\%c" : "\\u%04x", (unsigned char)*text);
     }
+    end += sprintf(end, "\"}\n");
+    WriteAll(logFile, line, (size_t)(end - line));
 }
 
 // Opens the properties directory on first use.
