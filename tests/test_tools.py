@@ -65,7 +65,7 @@ def test_logcat_starts_at_a_time(device):
 
 def test_logcat_prints_binary_and_long_entries(device):
     device.shell("log -p e -t one first")
-    binary = device.shell("logcat -d -B -s one").encode("latin-1")
+    binary = device.output("logcat", "-d", "-B", "-s", "one", encoding=None)
     size, header, process, thread, seconds, ns, *_ = struct.unpack_from("<HHiIIIII", binary)
     assert (header, size, binary[28:]) == (28, 11, b"\6one\0first\0")
     when = time.strftime("%m-%d %H:%M:%S", time.localtime(seconds))
