@@ -477,6 +477,7 @@ def listen():
 async def main():
     os.chdir("/")
     listener = listen()
+    listener.setsockopt(socket.IPPROTO_TCP, socket.TCP_NODELAY, 1)
     port = listener.getsockname()[1]
     server = await asyncio.start_server(serve, sock=listener, limit=MAX_DATA)
     output("setprop", "service.adb.tcp.port", str(port))
