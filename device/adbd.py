@@ -2,12 +2,11 @@
 """adbd.py ROOT: the device's adb daemon; ROOT is a file descriptor of the device root
 
 Speaks the adb protocol at a TCP port of this machine, and stores the port in a property. Serves
-its own user and root. If the property persist.sys.adb.server is 1, also runs an adb server, which
-lists only this device, at the socket adb.sock in the device root.
+its own user and root. Registers with the adb servers that the property persist.sim.adb_servers
+lists; runs the device's own, at the socket adb.sock in the device root.
 """
 import asyncio
 import contextlib
-import errno
 import itertools
 import os
 import re
@@ -22,8 +21,8 @@ from subprocess import DEVNULL, PIPE, STDOUT, Popen, run
 ROOT = int(sys.argv[1])
 DIRECTORY = os.path.dirname(os.path.abspath(__file__))  # in a build, that of the link
 PORTS = range(5555, 5587, 2)  # where adb servers look for emulators
-SERVER_SOCKET = f"/proc/self/fd/{ROOT}/adb.sock"
-SERVER_PAUSE_S = 0.5
+OWN_SOCKET = f"/proc/self/fd/{ROOT}/adb.sock"
+SERVER_PAUSE_S = 0.2
 ESTABLISHED = "01"  # in /proc/net/tcp
 
 # A message: command, two arguments, length of its data, unused, inverted command.
@@ -44,7 +43,7 @@ SYNC = struct.Struct("<4sI")
 MAX_PATH = 1024
 MAX_CHUNK = 1 << 16  # of a file
 
-tasks = set()  # Without a reference, a running task could be collected.
+tasks = set()  # keeps running tasks from being garbage-collected
 
 
 def spawn(coroutine):
@@ -253,7 +252,7 @@ class Shell:
         process = self.start_on_terminal() if self.has_terminal else self.start_on_pipes()
         os.set_blocking(self.input.fileno(), False)
         exited = spawn(reap(process))
-        feeder = spawn(self.feed())  # Goes on after the stream's end to deliver all data.
+        feeder = spawn(self.feed())  # delivers what has been received even after the stream's end
         try:
             async with asyncio.TaskGroup() as group:
                 for kind, file in self.outputs:
@@ -263,7 +262,7 @@ class Shell:
                 await stream.write(PACKET.pack(EXIT, 1) + bytes([status]))
         finally:
             if self.has_terminal:
-                feeder.cancel()  # closes the terminal, which hangs up
+                feeder.cancel()  # closes the terminal; its processes get SIGHUP
 
     def start_on_pipes(self):
         stderr = PIPE if self.has_packets else STDOUT
@@ -367,7 +366,7 @@ class Sync:
         await self.stream.write(b"DONE" + bytes(16))
 
     async def recv(self, path):
-        # A FIFO or a terminal must not make this process wait.
+        # Opening a FIFO must not block the daemon.
         with open(os.open(path, os.O_RDONLY | os.O_NONBLOCK | os.O_NOCTTY), "rb", 0) as file:
             while data := file.read(self.stream.room(SYNC)):
                 await self.stream.write(SYNC.pack(b"DATA", len(data)) + data)
@@ -379,7 +378,7 @@ class Sync:
         try:
             await self.store(path, int(mode), content)
         except (OSError, ValueError):
-            async for _ in content:  # the peer expects the reply after the content
+            async for _ in content:  # skip the rest, because the reply comes after it
                 pass
             raise
         await self.stream.write(SYNC.pack(b"OKAY", 0))
@@ -398,12 +397,15 @@ class Sync:
     async def store(self, path, mode, content):
         """Creates or replaces a file or a symbolic link when all of its content has arrived."""
         if os.path.exists(path) and not os.path.isfile(path):
-            raise FileExistsError(errno.EEXIST, "not a regular file")
+            raise ValueError("not a regular file")
         os.makedirs(os.path.dirname(path), exist_ok=True)
         with tempfile.TemporaryDirectory(dir=os.path.dirname(path)) as directory:
             new = f"{directory}/new"
             if stat.S_ISLNK(mode):
-                os.symlink(b"".join([data async for data in content]).rstrip(b"\0"), new)
+                target = b""
+                async for data in content:
+                    target = (target + data)[:MAX_CHUNK]  # more than a link can hold
+                os.symlink(target.rstrip(b"\0"), new)
             else:
                 with open(new, "wb", 0) as file:
                     async for data in content:
@@ -437,33 +439,51 @@ async def serve(reader, writer):
         await Connection(reader, writer).serve()
 
 
-def start_server():
-    """Starts an adb server that looks for no other device and ends with this process."""
-    server = ["adb", "-L", f"localfilesystem:{SERVER_SOCKET}", "server", "nodaemon"]
+def start_own_server():
+    """Starts an adb server that looks for no other device and ends with this process.
+
+    Returns a task that ends with the server.
+    """
+    server = ["adb", "-L", f"localfilesystem:{OWN_SOCKET}", "server", "nodaemon"]
     process = Popen(
         ["/usr/bin/setpriv", "--pdeathsig", "KILL", *server],
-        env=os.environ | {"ADB_LOCAL_TRANSPORT_MAX_PORT": "5553"},
+        env=os.environ | dict.fromkeys(["ADB_EMU", "ADB_MDNS", "ADB_USB"], "0"),
         pass_fds=[ROOT],
         **dict.fromkeys(["stdin", "stdout", "stderr"], DEVNULL),
     )
-    spawn(reap(process))
+    return spawn(reap(process))
 
 
-async def ask_server(request):
-    reader, writer = await asyncio.open_unix_connection(SERVER_SOCKET)
+async def ask(server, request):
+    if server == "own":
+        connection = asyncio.open_unix_connection(OWN_SOCKET)
+    else:
+        connection = asyncio.open_connection("127.0.0.1", int(server))
+    reader, writer = await connection
     with contextlib.closing(writer):
         writer.write(f"{len(request):04x}{request}".encode())
         return await reader.read()
 
 
-async def run_server(port):
-    """Keeps an adb server running, possibly one that adb started, and the device in its list."""
+async def register(servers, port):
+    """Keeps the device in the lists of the adb servers, which may end or start at any time."""
+    registered = own_server = None
     while True:
-        try:
-            if b"emulator-%d\t" % (port - 1) not in await ask_server("host:devices"):
-                await ask_server(f"host:emulator:{port}")
-        except OSError:
-            start_server()
+        listing = []
+        for server in servers:
+            try:
+                if b"emulator-%d\tdevice" % (port - 1) in await ask(server, "host:devices"):
+                    listing.append(server)
+                else:
+                    await ask(server, f"host:emulator:{port}")
+            except (ConnectionRefusedError, FileNotFoundError):
+                if server == "own" and (own_server is None or own_server.done()):
+                    own_server = start_own_server()
+            except OSError:
+                pass
+        if listing != registered:
+            output("setprop", "sim.adb_registered", " ".join(listing))
+            registered = listing
         await asyncio.sleep(SERVER_PAUSE_S)
 
 
@@ -481,8 +501,7 @@ async def main():
     port = listener.getsockname()[1]
     server = await asyncio.start_server(serve, sock=listener, limit=MAX_DATA)
     output("setprop", "service.adb.tcp.port", str(port))
-    if output("getprop", "persist.sys.adb.server") == b"1":
-        spawn(run_server(port))
+    spawn(register(output("getprop", "persist.sim.adb_servers").decode().split(), port))
     await server.serve_forever()
 
 

@@ -83,6 +83,9 @@ int Status(int, char**) {
         const std::string value = device::GetProperty(line.key);
         printf("%s: %s\n", line.label, value.empty() ? line.unset : value.c_str());
     }
+    const int64_t port = device::GetPropertyNumber(device::kAdbPortKey);
+    printf("adb serial: %s\n",
+           port > 0 ? ("emulator-" + std::to_string(port - 1)).c_str() : "none");
     printf("SELinux: %s\nrecorded answers: %zu\n", device::SelinuxMode().c_str(),
            device::RecordedCommands().size());
     return 0;
@@ -103,6 +106,15 @@ int ExecSibling(const char* name, std::vector<const char*> arguments) {
 int Run(int argc, char** argv) {
     const int status = device::BringUp("Permissive", device::Until::kBooted);
     return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
+}
+
+int Adb(int argc, char** argv) {
+    if (!device::ExpectRunning()) {
+        return 1;
+    }
+    std::vector<const char*> arguments = {program_invocation_short_name};
+    arguments.insert(arguments.end(), argv, argv + argc);
+    return ExecSibling("connect_adb", arguments);
 }
 
 // The first arguments of trace.py are a file descriptor of the device root and this program's name.
@@ -143,6 +155,10 @@ constexpr struct Verb {
          INT_MAX, Run},
         {"trace", " [--bytes] [--json | --mermaid] [ARGUMENT...]",
          "runs the tool and shows what the tool, the daemon and init did", INT_MAX, Trace},
+        {"adb", " [--shared]",
+         "prints the shell command that makes adb use the device; --shared: uses adb's usual "
+         "server",
+         1, Adb},
         {"fault", " [FAULT [ARGUMENT] [COUNT]]",
          "sets the daemon's fault; without arguments, lists the faults", 3, Fault},
         {"answer", " [COMMAND TEXT | COMMAND - | --remove COMMAND]",

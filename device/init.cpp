@@ -10,6 +10,7 @@
 #include <poll.h>
 #include <sys/inotify.h>
 #include <sys/signalfd.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
@@ -25,6 +26,7 @@
 #include "platform/device_root.h"
 #include "platform/events.h"
 #include "platform/files.h"
+#include "platform/libbinder/vndbinder.h"
 #include "platform/unique_fd.h"
 #include "service.h"
 
@@ -152,14 +154,33 @@ void OnDaemonExit(bool isCrash) {
 constexpr Service::Program kDaemon = {"corvane_daemon", "corvane_daemon", device::IsDaemonAlive,
                                       OnDaemonExit};
 
+bool IsAdbdUp() { return !device::GetProperty(device::kAdbPortKey).empty(); }
+
+// Ends the adb server in the device root: adbd's own, or one that adb started in its absence.
+void StopAdbServer() {
+    const UniqueFd root = host::OpenDirectory(".");
+    const sockaddr_un address = host::Address(root, "adb.sock");
+    const UniqueFd server = host::NewSocket();
+    if (connect(server.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0) {
+        host::Send(server, "0009host:kill");
+    }
+}
+
+void OnAdbdExit(bool /* isCrash */) {
+    StopAdbServer();
+    __system_property_set(device::kAdbPortKey, "");
+    __system_property_set(device::kAdbRegisteredKey, "");
+}
+
+constexpr Service::Program kAdbd = {"adbd", "adbd.py", IsAdbdUp, OnAdbdExit};
+
 class Services {
   public:
-    // Always stops the daemon first: if "0" and "1" are written in quick succession, init reads
-    // only "1", but the daemon must still restart.
-    void FollowServiceEnable() {
-        mDaemon.Stop();
-        if (device::IsDaemonEnabled()) {
-            mDaemon.Start();
+    // Starts the services of a device that has just booted.
+    void Start() {
+        FollowServiceEnable();
+        if (!device::GetProperty(device::kAdbServersKey).empty()) {
+            mAdbd.Start();
         }
     }
 
@@ -179,28 +200,50 @@ class Services {
 
     // Reaps and starts processes. Returns the time in milliseconds until the next start, or -1.
     int Supervise() {
-        mDaemon.Reap();
-        return mDaemon.StartIfDue();
+        int untilNextStartMs = -1;
+        for (Service* const service : {&mDaemon, &mAdbd}) {
+            service->Reap();
+            const int ms = service->StartIfDue();
+            const bool isSooner = untilNextStartMs < 0 || ms < untilNextStartMs;
+            untilNextStartMs = ms >= 0 && isSooner ? ms : untilNextStartMs;
+        }
+        return untilNextStartMs;
     }
 
-    void Stop() { mDaemon.Stop(); }
+    void Stop() {
+        mDaemon.Stop();
+        mAdbd.Stop();
+    }
 
   private:
+    // Always stops the daemon first: if "0" and "1" are written in quick succession, init reads
+    // only "1", but the daemon must still restart.
+    void FollowServiceEnable() {
+        mDaemon.Stop();
+        if (device::IsDaemonEnabled()) {
+            mDaemon.Start();
+        }
+    }
+
     // Carries out a request, for example ctl.start$corvane_daemon, and removes it.
     void Control(const std::string& request) {
         const std::string verb = request.substr(0, request.find('$'));
-        if (request == verb + "$" + mDaemon.name()) {
+        for (Service* const service : {&mDaemon, &mAdbd}) {
+            if (request != verb + "$" + service->name()) {
+                continue;
+            }
             if (verb != "ctl.start") {
-                mDaemon.Stop();
+                service->Stop();
             }
             if (verb != "ctl.stop") {
-                mDaemon.Start();
+                service->Start();
             }
         }
         unlinkat(host::PropertiesDirectory(), request.c_str(), 0);
     }
 
     Service mDaemon{kDaemon};
+    Service mAdbd{kAdbd};
 };
 
 // Drops the caller's descriptors, signal handling, session and working directory.
@@ -263,7 +306,7 @@ void ReleaseStreams() {
 // Runs the services until init is told to exit.
 void RunServices(const UniqueFd& signals, const UniqueFd& watch) {
     Services services;
-    services.FollowServiceEnable();
+    services.Start();
     SetLock(device::InitLock::kBooted, F_WRLCK);
     bool isBootCompleted = false;
     do {

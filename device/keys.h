@@ -4,6 +4,7 @@
 namespace device {
 
 // The same as on a phone.
+constexpr char kAdbPortKey[] = "service.adb.tcp.port";  // of the running adbd, else empty
 constexpr char kBootCompletedKey[] = "sys.boot_completed";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
@@ -16,6 +17,11 @@ constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 constexpr char kControlPrefix[] = "ctl.";
 // The state of a service is init.svc.NAME.
 constexpr char kServiceStatePrefix[] = "init.svc.";
+
+// The adb servers that adbd registers with, and those that show the device; see `adb`. If the first
+// is not empty, adbd starts at boot.
+constexpr char kAdbServersKey[] = "persist.sim.adb_servers";
+constexpr char kAdbRegisteredKey[] = "sim.adb_registered";
 
 // Control the simulated daemon: its startup delay in milliseconds, a firmware update ("true" while
 // in progress) and its fault (see faults.h).

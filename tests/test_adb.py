@@ -1,8 +1,10 @@
 """The device's adb daemon, driven by the program adb and by malformed messages"""
 import concurrent.futures
+import contextlib
 import functools
 import os
 import pty
+import re
 import signal
 import socket
 import struct
@@ -12,31 +14,18 @@ import termios
 
 import pytest
 
-from virtual_device import LIMIT_S, wait_until
+from virtual_device import LIMIT_S, Device, free_port, wait_until
 
 DATA = os.urandom(3000000)
 
 
-class Adbd:
-    """The adb daemon of a running device, with its own adb server"""
+class Adb:
+    """The program adb with the environment that `device adb` asks for"""
 
-    def __init__(self, device, build, home):
+    def __init__(self, device):
         self.device = device
-        self.socket = f"{device.root}/adb.sock"
-        device.setprop("persist.sys.adb.server", "1")
-        self.env = device.env | {"ADB_SERVER_SOCKET": f"localfilesystem:{self.socket}"}
-        self.env |= {"HOME": str(home), "PATH": os.environ["PATH"]}
-        root = os.open(device.root, os.O_PATH)
-        command = [f"{build}/device/adbd.py", str(root)]
-        self.process = subprocess.Popen(command, env=self.env, pass_fds=[root])
-        os.close(root)
-        wait_until(self.has_server)
-        self.run("wait-for-device")
-        self.port = int(device.getprop("service.adb.tcp.port"))
-
-    def has_server(self):
-        with socket.socket(socket.AF_UNIX) as client:
-            return client.connect_ex(self.socket) == 0
+        server = re.search("ADB_SERVER_SOCKET=[^ ]*", device.output("device", "adb"))[0]
+        self.env = device.env | dict([server.split("=", 1)])
 
     def start(self, *arguments, **options):
         command = ["adb", *arguments]
@@ -48,73 +37,73 @@ class Adbd:
     def shell(self, command):
         return self.run("shell", command).stdout
 
+    def port(self):
+        return int(self.device.getprop("service.adb.tcp.port"))
+
     def descriptors(self):
-        return len(os.listdir(f"/proc/{self.process.pid}/fd"))
+        (adbd,) = self.device.processes("python3.11")
+        return len(os.listdir(f"/proc/{adbd}/fd"))
 
 
 @pytest.fixture
-def adbd(device, build, tmp_path):
-    daemon = Adbd(device, build, tmp_path)
-    yield daemon
-    daemon.process.kill()
-    daemon.process.wait()
-    wait_until(lambda: not daemon.has_server())
+def adb(device):
+    return Adb(device)
 
 
-def test_shell_keeps_streams_and_status_apart(adbd):
-    done = adbd.run("shell", "cat; echo error >&2; exit 3", input="input")
+def test_shell_keeps_streams_and_status_apart(adb):
+    done = adb.run("shell", "cat; echo error >&2; exit 3", input="input")
     assert (done.returncode, done.stdout, done.stderr) == (3, "input", "error\n")
-    done = adbd.run("exec-out", "echo error >&2")
+    done = adb.run("exec-out", "echo error >&2")
     assert (done.stdout, done.stderr) == ("error\n", "")
 
 
-def test_terminal_has_the_size_of_the_client(adbd):
+def test_terminal_has_the_size_of_the_client(adb):
     master, slave = pty.openpty()
     termios.tcsetwinsize(slave, (33, 77))
     wait = 'until [[ $(stty size) = "33 77" ]]; do sleep 0.1; done'
-    done = adbd.run("shell", "-t", f"{wait}; test -t 0 && test -t 1 && exit 5", stdin=slave)
+    done = adb.run("shell", "-t", f"{wait}; test -t 0 && test -t 1 && exit 5", stdin=slave)
     assert done.returncode == 5
     os.close(master)
     os.close(slave)
 
 
 @pytest.mark.parametrize("command", ["shell", "exec-in"])
-def test_passes_on_large_data(adbd, tmp_path, command):
-    adbd.run(command, f"cat >{tmp_path}/data", input=DATA, encoding=None)
+def test_passes_on_large_data(adb, tmp_path, command):
+    adb.run(command, f"cat >{tmp_path}/data", input=DATA, encoding=None)
     wait_until(lambda: (tmp_path / "data").read_bytes() == DATA)
-    assert adbd.run("exec-out", f"cat {tmp_path}/data", encoding=None).stdout == DATA
+    assert adb.run("exec-out", f"cat {tmp_path}/data", encoding=None).stdout == DATA
 
 
-def test_pushes_and_pulls_a_directory(adbd, tmp_path):
+def test_pushes_and_pulls_a_directory(adb, tmp_path):
     (tmp_path / "from/inner").mkdir(parents=True)
     sent = tmp_path / "from/inner/file"
     sent.write_bytes(DATA)
     sent.chmod(0o640)
     os.utime(sent, (1, 1))
-    assert adbd.run("push", tmp_path / "from", tmp_path / "pushed").returncode == 0
+    assert adb.run("push", tmp_path / "from", tmp_path / "pushed").returncode == 0
     status = (tmp_path / "pushed/inner/file").stat()
     assert (status.st_mode, status.st_mtime) == (0o100640, 1)
-    assert adbd.run("pull", tmp_path / "pushed", tmp_path / "pulled").returncode == 0
+    assert adb.run("pull", tmp_path / "pushed", tmp_path / "pulled").returncode == 0
     assert (tmp_path / "pulled/inner/file").read_bytes() == DATA
 
 
-def test_refuses_to_replace_a_special_file(adbd, tmp_path):
+def test_refuses_to_replace_a_special_file(adb, tmp_path):
     os.mkfifo(tmp_path / "fifo")
-    done = adbd.run("push", __file__, tmp_path / "fifo")
+    done = adb.run("push", __file__, tmp_path / "fifo")
     assert done.returncode == 1
     assert "not a regular file" in done.stdout
 
 
-def test_serves_twenty_clients_at_once(adbd):
+def test_serves_twenty_clients_at_once(adb):
     commands = [f"sleep 0.2; echo {number}" for number in range(20)]
     with concurrent.futures.ThreadPoolExecutor(len(commands)) as pool:
-        assert list(pool.map(adbd.shell, commands)) == [f"{number}\n" for number in range(20)]
+        assert list(pool.map(adb.shell, commands)) == [f"{number}\n" for number in range(20)]
 
 
 @pytest.mark.parametrize("number", [signal.SIGTERM, signal.SIGKILL, signal.SIGINT])
-def test_terminal_hangs_up_when_its_client_is_killed(adbd, number):
-    is_sleeping = functools.partial(adbd.device.processes, "toybox")
-    client = adbd.start("shell", "-tt", "sleep 600", stdin=subprocess.PIPE)
+def test_terminal_hangs_up_when_its_client_is_killed(adb, number):
+    is_sleeping = functools.partial(adb.device.processes, "toybox")
+    client = adb.start("shell", "-tt", "sleep 600", stdin=subprocess.PIPE)
     wait_until(is_sleeping)
     client.send_signal(number)
     client.communicate(timeout=LIMIT_S)  # nobody else holds the pipe
@@ -128,33 +117,33 @@ def message(command, arg0=1, arg1=1, data=b"", length=None, magic=0xFFFFFFFF):
 
 
 CONNECT = message(b"CNXN", 0x01000001, 1 << 20, b"host::\0")
+CAT = message(b"OPEN", data=b"exec:cat\0")
 MALFORMED = [
-    message(b"OPEN", data=b"shell:\0", magic=0),
-    message(b"OPEN", data=b"shell:"),
-    message(b"OPEN", arg0=0, data=b"shell:\0"),
+    message(b"OPEN", data=b"exec:cat\0", magic=0),
+    message(b"OPEN", data=b"exec:cat"),
+    message(b"OPEN", arg0=0, data=b"exec:cat\0"),
     message(b"JUNK"),
     message(b"WRTE", length=(1 << 20) + 1),
     message(b"CNXN", 0x01000001, 0),
-    message(b"OPEN", data=b"shell:cat\0") + message(b"OKAY"),
-    message(b"OPEN", data=b"shell:sleep 600\0") + 9 * message(b"WRTE", data=DATA[: 1 << 20]),
+    message(b"OKAY"),
+    9 * message(b"WRTE", data=DATA[: 1 << 20]),
 ]
 
 
-def test_malformed_message_ends_only_its_connection(adbd):
-    before = adbd.descriptors()
+def test_malformed_message_ends_only_its_connection(adb):
+    before = adb.descriptors()
     for malformed in MALFORMED:
-        with socket.create_connection(("127.0.0.1", adbd.port), LIMIT_S) as peer:
-            peer.sendall(CONNECT)
-            assert peer.recv(4) == b"CNXN"
-            try:
+        with socket.create_connection(("127.0.0.1", adb.port()), LIMIT_S) as peer:
+            peer.sendall(CONNECT + CAT)
+            received = b""
+            while b"OKAY" not in received:
+                received += peer.recv(4096)
+            with contextlib.suppress(ConnectionError):
                 peer.sendall(malformed)
                 while peer.recv(65536):
                     pass
-            except ConnectionResetError:
-                pass
-    assert adbd.shell("echo still here") == "still here\n"
-    adbd.device.kill("toybox")
-    wait_until(lambda: adbd.descriptors() == before)
+    assert adb.shell("echo still here") == "still here\n"
+    wait_until(lambda: adb.descriptors() <= before)
 
 
 KNOCK = """
@@ -170,6 +159,29 @@ except ConnectionError:
 
 @pytest.mark.skipif(os.getuid() != 0, reason="only root can act as another user")
 @pytest.mark.parametrize("user, is_allowed", [(0, True), (65534, False)])
-def test_refuses_other_users(adbd, user, is_allowed):
-    command = [sys.executable, "-c", KNOCK, str(adbd.port), CONNECT.hex()]
-    assert adbd.device.run(*command, user=user).returncode == is_allowed
+def test_refuses_other_users(adb, user, is_allowed):
+    command = [sys.executable, "-c", KNOCK, str(adb.port()), CONNECT.hex()]
+    assert adb.device.run(*command, user=user).returncode == is_allowed
+
+
+def test_device_is_listed_until_it_is_stopped(adb):
+    adb.run("reboot")
+    adb.run("wait-for-device")
+    wait_until(lambda: adb.shell("getprop sys.boot_completed") == "1\n")
+    adb.device.output("device", "stop")
+    with socket.socket(socket.AF_UNIX) as client:
+        wait_until(lambda: client.connect_ex(f"{adb.device.root}/adb.sock") != 0)
+
+
+def test_shared_server_lists_two_devices(device, build, tmp_path):
+    second = Device(tmp_path, build, device.tool)
+    second.start()
+    settings = {"ANDROID_ADB_SERVER_PORT": str(free_port())}
+    shared = [
+        each.output("device", "adb", "--shared", env=each.env | settings)
+        for each in (device, second)
+    ]
+    listed = device.output("adb", "devices", env=device.env | settings).splitlines()[1:-1]
+    assert {f"{serial.strip()}\tdevice" for serial in shared} <= set(listed)
+    second.output("device", "stop")
+    device.output("adb", "kill-server", env=device.env | settings)

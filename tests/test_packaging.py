@@ -6,7 +6,7 @@ import subprocess
 
 import pytest
 
-from virtual_device import SOURCE, wait_until
+from virtual_device import SOURCE, free_port, wait_until
 
 COMPLETIONS = {
     "bash": """
@@ -48,8 +48,7 @@ def installed(build, tmp_path_factory):
 def installed_device(installed, stopped_device):
     """A device that uses the unpacked packages"""
     env = stopped_device.env
-    usr = f"{installed}/usr"
-    env["PATH"] = f"{usr}/lib/tpd-device/host:{usr}/bin:{env['PATH']}"
+    env["PATH"] = f"{installed}/usr/bin:{env['PATH']}"
     return stopped_device
 
 
@@ -164,24 +163,31 @@ def steps(session):
         yield "\n".join(command), "\n".join(lines[count:])
 
 
-def replay(device, session, directory):
-    """Runs the commands of a session in one shell and compares their output."""
+def replay(device, sessions, directory):
+    """Runs the commands of all sessions in one shell and compares their output."""
+    serials = {}  # the page's by the actual ones, which depend on the ports in use
+
+    def serial(match):
+        return serials.setdefault(match[0], f"emulator-{5554 + 2 * len(serials)}")
+
     pipes = {"stdin": subprocess.PIPE, "stdout": subprocess.PIPE, "text": True}
     with subprocess.Popen(["bash"], env=device.env, cwd=directory, **pipes) as bash:
-        for command, expected in steps(session):
+        for command, expected in itertools.chain.from_iterable(map(steps, sessions)):
             bash.stdin.write("{ %s\n} </dev/null\necho; echo END\n" % command)
             bash.stdin.flush()
             lines = itertools.takewhile(lambda line: line != "END\n", bash.stdout)
-            assert "".join(lines).rstrip("\n") == expected.rstrip("\n"), command
+            shown = re.sub(r"emulator-\d+", serial, "".join(lines))
+            assert shown.rstrip("\n") == expected.rstrip("\n"), command
             wait_until(lambda: is_idle(device))
 
 
 @pytest.mark.parametrize("page", ["README.md", "docs/automation.md"])
 def test_replays_the_sessions_of_a_page(installed, installed_device, tmp_path, page):
     text = source(page).replace("/usr/share/", f"{installed}/usr/share/")
+    text = text.replace("PORT=5038", f"PORT={free_port()}")
     directory = SOURCE if page == "README.md" else tmp_path
-    for session in re.findall(r"^```\n(\$ .*?)^```", text, re.S | re.M):
-        replay(installed_device, session, directory)
+    sessions = re.findall(r"^```\n(\$ .*?)^```", text, re.S | re.M)
+    replay(installed_device, sessions, directory)
 
 
 @pytest.mark.parametrize("page", ["tpd.1", "tpd-device.1"])
@@ -193,7 +199,7 @@ def test_runs_the_examples_of_a_manual(installed, installed_device, build, page)
     assert len(examples) > 3
     for example in examples:
         installed_device.output("tpd-device", "reboot")
-        installed_device.output("bash", "-ec", example)
+        installed_device.output("bash", "-ec", f'eval "$(tpd-device adb)"\n{example}')
 
 
 def test_runs_the_ci_example(installed, installed_device):
@@ -207,6 +213,6 @@ def test_runs_the_ci_example(installed, installed_device):
 def test_client_passes_any_argument_unchanged(device, shell):
     argument = "it's  $HOME\n`x`"
     script = '. client/tpd.sh; tpd_send captest "$1"; printf %s "$TPD_RESULT"'
-    device.env["ADB"] = "adb -s virtual"
+    device.env["ADB"] = "env device"
     answer = device.output(shell, "-c", script, "sh", argument, cwd=SOURCE)
     assert answer == f"captest {argument}: PASS"

@@ -103,8 +103,6 @@ def test_rejects_answers_that_the_daemon_cannot_send(device):
 
 
 USAGE_ERRORS = {
-    "adb -d shell true": "no devices found",
-    "adb -s other shell true": "device 'other' not found",
     f"device answer {'x' * 256} text": "answer: the command is too long",
     "device fault hang 1O0": "hang: invalid MILLISECONDS '1O0'; use 0 to 1000000000",
     "device fault hangg": "unknown fault 'hangg'; see 'device fault'",
@@ -123,17 +121,10 @@ def test_reports_usage_errors(device, command):
     assert USAGE_ERRORS[command] in done.stderr
 
 
-def test_adb_shell_runs_the_phones_shell(device):
-    done = device.run("adb", "shell", "tpd", "captest;", "exit", "3")
+def test_shell_is_that_of_a_phone(device):
+    done = device.run("device", "shell", "tpd", "captest;", "exit", "3")
     assert (done.returncode, done.stdout) == (3, PASS)
     assert device.shell("a=(1 2); [[ ${#a[@]} = 2 ]] && echo ${a[1]}") == "2\n"
-
-
-@pytest.mark.parametrize("option, count", [("", 1), ("-n", 3)])
-def test_adb_shell_reads_standard_input_without_n(device, option, count):
-    loop = f"while read -r x; do echo $x; adb shell {option} true; done"
-    shown = device.output("bash", "-c", loop, input="a\nb\nc\n")
-    assert len(shown.split()) == count
 
 
 def test_keeps_settings_in_their_directory(device):
@@ -149,7 +140,7 @@ def test_refuses_a_fifo_as_the_log(device):
 
 
 def test_shell_lacks_the_commands_of_the_machine(device):
-    assert "not found" in device.run("adb", "shell", "mount").stderr
+    assert "not found" in device.run("device", "shell", "mount").stderr
 
 
 def test_toybox_provides_the_commands_linked_to_it(device):

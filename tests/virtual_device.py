@@ -4,6 +4,7 @@ import fcntl
 import json
 import os
 import pathlib
+import socket
 import subprocess
 import time
 
@@ -28,14 +29,20 @@ def wait_until(condition):
         time.sleep(0.02)
 
 
+def free_port():
+    with socket.create_server(("127.0.0.1", 0)) as server:
+        return server.getsockname()[1]
+
+
 class Device:
     """A virtual device in `directory`, and the programs of a build."""
 
     def __init__(self, directory, build, tool):
         self.root = directory / "device"
         self.tool = tool
-        programs = f"{build}/device/bin", f"{build}/device", f"{SOURCE}/device/host"
+        programs = f"{build}/device/bin", f"{build}/device"
         self.env = os.environ | {
+            "HOME": str(directory),  # where adb writes its keys
             "PATH": ":".join([*programs, os.environ["PATH"]]),
             "TPD_BUILD_DIR": str(build),
             "TPD_DEVICE_ROOT": str(self.root),
@@ -58,7 +65,7 @@ class Device:
         return self.output(*self.tool, *arguments, **options)
 
     def shell(self, command):
-        return self.output("adb", "shell", command)
+        return self.output("device", "shell", command)
 
     def fault(self, text):
         self.output("device", "fault", *text.split())
