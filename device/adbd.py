@@ -1,9 +1,10 @@
 #!/usr/bin/python3 -I
 """adbd.py ROOT: the device's adb daemon; ROOT is a file descriptor of the device root
 
-Speaks the adb protocol at a TCP port of this machine, and stores the port in a property. Serves
-its own user and root. Registers with the adb servers that the property persist.sim.adb_servers
-lists; runs the device's own, at the socket adb.sock in the device root.
+Speaks the adb protocol on a TCP port of this machine, and lets in its own user and root. Runs an
+adb server, which lists only this device, at the socket adb.sock in the device root, and registers
+with the shared servers at the ports in persist.sim.adb_ports. When the device is listed, stores its
+port in service.adb.tcp.port.
 """
 import asyncio
 import contextlib
@@ -21,7 +22,7 @@ from subprocess import DEVNULL, PIPE, STDOUT, Popen, run
 ROOT = int(sys.argv[1])
 DIRECTORY = os.path.dirname(os.path.abspath(__file__))  # in a build, that of the link
 PORTS = range(5555, 5587, 2)  # where adb servers look for emulators
-OWN_SOCKET = f"/proc/self/fd/{ROOT}/adb.sock"
+SERVER_SOCKET = f"/proc/self/fd/{ROOT}/adb.sock"
 SERVER_PAUSE_S = 0.2
 ESTABLISHED = "01"  # in /proc/net/tcp
 
@@ -227,7 +228,7 @@ def find_service(name):
     if kind == b"exec":
         return Shell([b"raw"], text).serve
     if name == b"reboot:":
-        return Shell([b"raw"], b"reboot").serve
+        return Shell([b"raw"], b"reboot >/dev/null 2>&1").serve
     if name == b"sync:":
         return Sync().serve
     if name == b"root:":
@@ -439,12 +440,12 @@ async def serve(reader, writer):
         await Connection(reader, writer).serve()
 
 
-def start_own_server():
+def start_server():
     """Starts an adb server that looks for no other device and ends with this process.
 
     Returns a task that ends with the server.
     """
-    server = ["adb", "-L", f"localfilesystem:{OWN_SOCKET}", "server", "nodaemon"]
+    server = ["adb", "-L", f"localfilesystem:{SERVER_SOCKET}", "server", "nodaemon"]
     process = Popen(
         ["/usr/bin/setpriv", "--pdeathsig", "KILL", *server],
         env=os.environ | dict.fromkeys(["ADB_EMU", "ADB_MDNS", "ADB_USB"], "0"),
@@ -455,35 +456,41 @@ def start_own_server():
 
 
 async def ask(server, request):
-    if server == "own":
-        connection = asyncio.open_unix_connection(OWN_SOCKET)
+    """Returns the reply of the adb server at a port or, if it is None, of the device's own"""
+    if server is None:
+        connection = asyncio.open_unix_connection(SERVER_SOCKET)
     else:
-        connection = asyncio.open_connection("127.0.0.1", int(server))
+        connection = asyncio.open_connection("127.0.0.1", server)
     reader, writer = await connection
     with contextlib.closing(writer):
         writer.write(f"{len(request):04x}{request}".encode())
         return await reader.read()
 
 
-async def register(servers, port):
-    """Keeps the device in the lists of the adb servers, which may end or start at any time."""
-    registered = own_server = None
+async def is_listed(server, port):
+    """Returns whether the server lists the device. If not, asks it to connect to the device."""
+    if b"emulator-%d\tdevice" % (port - 1) in await ask(server, "host:devices"):
+        return True
+    await ask(server, f"host:emulator:{port}")
+    return False
+
+
+async def keep_listed(port):
+    """Keeps the device's own server running, and the device in the lists of all servers"""
+    own_server = None
+    is_ready = False
+    shared = output("getprop", "persist.sim.adb_ports").split()
     while True:
-        listing = []
-        for server in servers:
-            try:
-                if b"emulator-%d\tdevice" % (port - 1) in await ask(server, "host:devices"):
-                    listing.append(server)
-                else:
-                    await ask(server, f"host:emulator:{port}")
-            except (ConnectionRefusedError, FileNotFoundError):
-                if server == "own" and (own_server is None or own_server.done()):
-                    own_server = start_own_server()
-            except OSError:
-                pass
-        if listing != registered:
-            output("setprop", "sim.adb_registered", " ".join(listing))
-            registered = listing
+        try:
+            if await is_listed(None, port) and not is_ready:
+                output("setprop", "service.adb.tcp.port", str(port))
+                is_ready = True
+        except (ConnectionRefusedError, FileNotFoundError):
+            if own_server is None or own_server.done():
+                own_server = start_server()
+        for server in shared:
+            with contextlib.suppress(OSError):
+                await is_listed(int(server), port)
         await asyncio.sleep(SERVER_PAUSE_S)
 
 
@@ -500,8 +507,7 @@ async def main():
     listener.setsockopt(socket.IPPROTO_TCP, socket.TCP_NODELAY, 1)
     port = listener.getsockname()[1]
     server = await asyncio.start_server(serve, sock=listener, limit=MAX_DATA)
-    output("setprop", "service.adb.tcp.port", str(port))
-    spawn(register(output("getprop", "persist.sim.adb_servers").decode().split(), port))
+    spawn(keep_listed(port))
     await server.serve_forever()
 
 

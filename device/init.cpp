@@ -169,7 +169,6 @@ void StopAdbServer() {
 void OnAdbdExit(bool /* isCrash */) {
     StopAdbServer();
     __system_property_set(device::kAdbPortKey, "");
-    __system_property_set(device::kAdbRegisteredKey, "");
 }
 
 constexpr Service::Program kAdbd = {"adbd", "adbd.py", IsAdbdUp, OnAdbdExit};
@@ -179,7 +178,7 @@ class Services {
     // Starts the services of a device that has just booted.
     void Start() {
         FollowServiceEnable();
-        if (!device::GetProperty(device::kAdbServersKey).empty()) {
+        if (device::GetProperty(device::kUsbConfigKey) == "adb") {
             mAdbd.Start();
         }
     }

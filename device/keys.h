@@ -4,24 +4,20 @@
 namespace device {
 
 // The same as on a phone.
-constexpr char kAdbPortKey[] = "service.adb.tcp.port";  // of the running adbd, else empty
+constexpr char kAdbPortKey[] = "service.adb.tcp.port";  // empty unless adbd is up
 constexpr char kBootCompletedKey[] = "sys.boot_completed";
 constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
 constexpr char kIsUpdatingFirmwareKey[] = "odm.thp.is_updating_fw";
 constexpr char kPermissiveFlagKey[] = "odm.thp.debug.selinux.permissive";
 constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
+constexpr char kUsbConfigKey[] = "persist.sys.usb.config";  // with "adb", adbd starts at boot
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 
 // Requests to init, whose values are names of services: ctl.start, ctl.stop and ctl.restart.
 constexpr char kControlPrefix[] = "ctl.";
 // The state of a service is init.svc.NAME.
 constexpr char kServiceStatePrefix[] = "init.svc.";
-
-// The adb servers that adbd registers with, and those that show the device; see `adb`. If the first
-// is not empty, adbd starts at boot.
-constexpr char kAdbServersKey[] = "persist.sim.adb_servers";
-constexpr char kAdbRegisteredKey[] = "sim.adb_registered";
 
 // Control the simulated daemon: its startup delay in milliseconds, a firmware update ("true" while
 // in progress) and its fault (see faults.h).

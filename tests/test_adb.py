@@ -4,7 +4,6 @@ import contextlib
 import functools
 import os
 import pty
-import re
 import signal
 import socket
 import struct
@@ -24,8 +23,8 @@ class Adb:
 
     def __init__(self, device):
         self.device = device
-        server = re.search("ADB_SERVER_SOCKET=[^ ]*", device.output("device", "adb"))[0]
-        self.env = device.env | dict([server.split("=", 1)])
+        variables = device.output("bash", "-c", 'eval "$(device adb)"; env -0').split("\0")
+        self.env = dict(variable.split("=", 1) for variable in variables if variable)
 
     def start(self, *arguments, **options):
         command = ["adb", *arguments]
@@ -173,9 +172,10 @@ def test_device_is_listed_until_it_is_stopped(adb):
         wait_until(lambda: client.connect_ex(f"{adb.device.root}/adb.sock") != 0)
 
 
-def test_shared_server_lists_two_devices(device, build, tmp_path):
+def test_shared_server_lists_two_devices(device, build, tmp_path, request):
     second = Device(tmp_path, build, device.tool)
     second.start()
+    request.addfinalizer(lambda: second.output("device", "stop"))
     settings = {"ANDROID_ADB_SERVER_PORT": str(free_port())}
     shared = [
         each.output("device", "adb", "--shared", env=each.env | settings)
@@ -183,5 +183,4 @@ def test_shared_server_lists_two_devices(device, build, tmp_path):
     ]
     listed = device.output("adb", "devices", env=device.env | settings).splitlines()[1:-1]
     assert {f"{serial.strip()}\tdevice" for serial in shared} <= set(listed)
-    second.output("device", "stop")
     device.output("adb", "kill-server", env=device.env | settings)
