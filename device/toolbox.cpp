@@ -62,13 +62,13 @@ int Setprop(int /* argc */, char** argv) {
     return 1;
 }
 
-// `start NAME` and `stop NAME`. Without a name, they control a phone's user interface, which this
-// device lacks.
+// `start NAME` and `stop NAME`. Without a name, they control a phone's user interface. This device
+// has none, but programs wait for its start.
 int ControlService(int argc, char** argv) {
-    if (argc == 1) {
-        return 0;
-    }
     const std::string verb = program_invocation_short_name;
+    if (argc == 1) {
+        return verb == "stop" || __system_property_set(device::kBootCompletedKey, "1") == 0 ? 0 : 1;
+    }
     const std::string service = argv[1];
     const std::string state = device::GetProperty((device::kServiceStatePrefix + service).c_str());
     if (state.empty()) {
