@@ -445,7 +445,7 @@ def start_server():
 
     Returns a task that ends with the server.
     """
-    server = ["adb", "-L", f"localfilesystem:{SERVER_SOCKET}", "server", "nodaemon"]
+    server = ["/usr/bin/adb", "-L", f"localfilesystem:{SERVER_SOCKET}", "server", "nodaemon"]
     process = Popen(
         ["/usr/bin/setpriv", "--pdeathsig", "KILL", *server],
         env=os.environ | dict.fromkeys(["ADB_EMU", "ADB_MDNS", "ADB_USB"], "0"),
