@@ -1,10 +1,9 @@
 #!/usr/bin/python3 -I
 """adbd.py ROOT: the device's adb daemon; ROOT is a file descriptor of the device root
 
-Speaks the adb protocol on a TCP port of this machine, and lets in its own user and root. Runs an
-adb server, which lists only this device, at the socket adb.sock in the device root, and registers
-with the shared servers at the ports in persist.sim.adb_ports. When the device is listed, stores its
-port in service.adb.tcp.port.
+Speaks the adb protocol on a TCP port of this machine, and lets in its own user and root. Registers
+with the device's own adb server and with the shared ones at the ports in persist.sim.adb_ports.
+When its own server lists the device, stores its port in service.adb.tcp.port.
 """
 import asyncio
 import contextlib
@@ -17,7 +16,7 @@ import struct
 import sys
 import tempfile
 import termios
-from subprocess import DEVNULL, PIPE, STDOUT, Popen, run
+from subprocess import PIPE, STDOUT, Popen, run
 
 ROOT = int(sys.argv[1])
 DIRECTORY = os.path.dirname(os.path.abspath(__file__))  # in a build, that of the link
@@ -440,21 +439,6 @@ async def serve(reader, writer):
         await Connection(reader, writer).serve()
 
 
-def start_server():
-    """Starts an adb server that looks for no other device and ends with this process.
-
-    Returns a task that ends with the server.
-    """
-    server = ["/usr/bin/adb", "-L", f"localfilesystem:{SERVER_SOCKET}", "server", "nodaemon"]
-    process = Popen(
-        ["/usr/bin/setpriv", "--pdeathsig", "KILL", *server],
-        env=os.environ | dict.fromkeys(["ADB_EMU", "ADB_MDNS", "ADB_USB"], "0"),
-        pass_fds=[ROOT],
-        **dict.fromkeys(["stdin", "stdout", "stderr"], DEVNULL),
-    )
-    return spawn(reap(process))
-
-
 async def ask(server, request):
     """Returns the reply of the adb server at a port or, if it is None, of the device's own"""
     if server is None:
@@ -476,21 +460,16 @@ async def is_listed(server, port):
 
 
 async def keep_listed(port):
-    """Keeps the device's own server running, and the device in the lists of all servers"""
-    own_server = None
+    """Keeps the device in the lists of the adb servers, which may end and start at any time"""
     is_ready = False
-    shared = output("getprop", "persist.sim.adb_ports").split()
+    shared = map(int, output("getprop", "persist.sim.adb_ports").split())
+    servers = [None, *shared]
     while True:
-        try:
-            if await is_listed(None, port) and not is_ready:
-                output("setprop", "service.adb.tcp.port", str(port))
-                is_ready = True
-        except (ConnectionRefusedError, FileNotFoundError):
-            if own_server is None or own_server.done():
-                own_server = start_server()
-        for server in shared:
+        for server in servers:
             with contextlib.suppress(OSError):
-                await is_listed(int(server), port)
+                if await is_listed(server, port) and server is None and not is_ready:
+                    output("setprop", "service.adb.tcp.port", str(port))
+                    is_ready = True
         await asyncio.sleep(SERVER_PAUSE_S)
 
 

@@ -51,10 +51,7 @@ int Start(int argc, char** argv) {
     return 0;
 }
 
-int Reboot(int, char**) {
-    const int status = device::Stop();
-    return status != 0 ? status : Start(0, nullptr);
-}
+int Reboot(int, char**) { return device::Reboot(); }
 
 constexpr struct {
     const char* label;

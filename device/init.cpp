@@ -117,7 +117,7 @@ const char* Boot(const char* selinuxMode) {
 
 bool IsRequest(const std::string& property) {
     return property == device::kServiceEnableKey || property == device::kUpdatingFirmwareKey ||
-           property.rfind(device::kControlPrefix, 0) == 0;
+           property == device::kPowerControlKey || property.rfind(device::kControlPrefix, 0) == 0;
 }
 
 // Returns the properties that init acts on and that were written since the last call, in order.
@@ -156,7 +156,14 @@ constexpr Service::Program kDaemon = {"corvane_daemon", "corvane_daemon", device
 
 bool IsAdbdUp() { return !device::GetProperty(device::kAdbPortKey).empty(); }
 
-// Ends the adb server in the device root: adbd's own, or one that adb started in its absence.
+void OnAdbdExit(bool /* isCrash */) { __system_property_set(device::kAdbPortKey, ""); }
+
+void OnAdbServerExit(bool /* isCrash */) {}
+
+constexpr Service::Program kAdbd = {"adbd", "adbd.py", IsAdbdUp, OnAdbdExit};
+constexpr Service::Program kAdbServer = {"adb_server", "adb_server", IsAdbdUp, OnAdbServerExit};
+
+// Ends an adb server in the device root that adb started in the absence of the service.
 void StopAdbServer() {
     const UniqueFd root = host::OpenDirectory(".");
     const sockaddr_un address = host::Address(root, "adb.sock");
@@ -166,52 +173,61 @@ void StopAdbServer() {
     }
 }
 
-void OnAdbdExit(bool /* isCrash */) {
-    StopAdbServer();
-    __system_property_set(device::kAdbPortKey, "");
-}
-
-constexpr Service::Program kAdbd = {"adbd", "adbd.py", IsAdbdUp, OnAdbdExit};
-
 class Services {
   public:
     // Starts the services of a device that has just booted.
     void Start() {
+        for (const Service* const service : mAll) {
+            service->PublishState();
+        }
         FollowServiceEnable();
         if (device::GetProperty(device::kUsbConfigKey) == "adb") {
+            mAdbServer.Start();
             mAdbd.Start();
         }
     }
 
-    // Carries out the requests, including those that arrive in the meantime.
-    void Obey(const UniqueFd& watch) {
+    // Stops the services, except the adb server, which survives the reboot of a phone.
+    void StopForReboot() {
+        mDaemon.Stop();
+        mAdbd.Stop();
+    }
+
+    void Stop() {
+        StopForReboot();
+        mAdbServer.Stop();
+        StopAdbServer();
+    }
+
+    // Carries out the requests, including those that arrive in the meantime. Returns true if one of
+    // them is to reboot.
+    bool Obey(const UniqueFd& watch) {
+        bool isRebootRequested = false;
         std::vector<std::string> requests = ReadRequests(watch);
         for (; !requests.empty(); requests = ReadRequests(watch)) {
             for (const std::string& request : requests) {
-                if (request.rfind(device::kControlPrefix, 0) == 0) {
+                if (request == device::kPowerControlKey) {
+                    isRebootRequested |= device::GetProperty(request.c_str()) == "reboot";
+                } else if (request.rfind(device::kControlPrefix, 0) == 0) {
                     Control(request);
                 } else {
                     FollowServiceEnable();
                 }
             }
         }
+        return isRebootRequested;
     }
 
     // Reaps and starts processes. Returns the time in milliseconds until the next start, or -1.
     int Supervise() {
         int untilNextStartMs = -1;
-        for (Service* const service : {&mDaemon, &mAdbd}) {
+        for (Service* const service : mAll) {
             service->Reap();
             const int ms = service->StartIfDue();
             const bool isSooner = untilNextStartMs < 0 || ms < untilNextStartMs;
             untilNextStartMs = ms >= 0 && isSooner ? ms : untilNextStartMs;
         }
         return untilNextStartMs;
-    }
-
-    void Stop() {
-        mDaemon.Stop();
-        mAdbd.Stop();
     }
 
   private:
@@ -227,7 +243,7 @@ class Services {
     // Carries out a request, for example ctl.start$corvane_daemon, and removes it.
     void Control(const std::string& request) {
         const std::string verb = request.substr(0, request.find('$'));
-        for (Service* const service : {&mDaemon, &mAdbd}) {
+        for (Service* const service : mAll) {
             if (request != verb + "$" + service->name()) {
                 continue;
             }
@@ -243,6 +259,8 @@ class Services {
 
     Service mDaemon{kDaemon};
     Service mAdbd{kAdbd};
+    Service mAdbServer{kAdbServer};
+    Service* const mAll[3] = {&mDaemon, &mAdbd, &mAdbServer};
 };
 
 // Drops the caller's descriptors, signal handling, session and working directory.
@@ -302,22 +320,29 @@ void ReleaseStreams() {
     }
 }
 
-// Runs the services until init is told to exit.
+// Runs the services until init is told to exit, or a reboot fails.
 void RunServices(const UniqueFd& signals, const UniqueFd& watch) {
     Services services;
     services.Start();
     SetLock(device::InitLock::kBooted, F_WRLCK);
-    bool isBootCompleted = false;
+    const char* unwritable = nullptr;
     do {
         host::UpdateTracing();
-        services.Obey(watch);
+        if (services.Obey(watch)) {
+            SetLock(device::InitLock::kBooted, F_UNLCK);
+            services.StopForReboot();
+            unwritable = Boot("Enforcing");
+            services.Start();
+            SetLock(device::InitLock::kBooted, F_WRLCK);
+        }
         const int untilNextStartMs = services.Supervise();
+        const bool isBootCompleted = !device::GetProperty(device::kBootCompletedKey).empty();
         if (!isBootCompleted && device::IsDaemonAlive()) {
-            isBootCompleted = __system_property_set(device::kBootCompletedKey, "1") == 0;
+            __system_property_set(device::kBootCompletedKey, "1");
         }
         pollfd waits[] = {{signals.get(), POLLIN, 0}, {watch.get(), POLLIN, 0}};
         poll(waits, std::size(waits), untilNextStartMs);
-    } while (!ExitRequested(signals) && OwnsDevice() &&
+    } while (unwritable == nullptr && !ExitRequested(signals) && OwnsDevice() &&
              IsInPlace(host::PropertiesDirectory(), host::kPropertiesDirectory));
     SetLock(device::InitLock::kBooted, F_UNLCK);
     if (OwnsDevice()) {

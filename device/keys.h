@@ -10,6 +10,7 @@ constexpr char kDaemonAliveKey[] = "odm.thp.dae_alive";
 constexpr char kDaemonBinderKey[] = "odm.thp.binder";
 constexpr char kIsUpdatingFirmwareKey[] = "odm.thp.is_updating_fw";
 constexpr char kPermissiveFlagKey[] = "odm.thp.debug.selinux.permissive";
+constexpr char kPowerControlKey[] = "sys.powerctl";  // "reboot" makes init reboot the device
 constexpr char kRestartCountKey[] = "odm.thp.dae_reboot_times";
 constexpr char kUsbConfigKey[] = "persist.sys.usb.config";  // with "adb", adbd starts at boot
 constexpr char kServiceEnableKey[] = "odm.thp.service_enable";

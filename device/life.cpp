@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <sys/file.h>
+#include <sys/system_properties.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -192,6 +193,24 @@ int BringUp(const char* selinuxMode, Until until) {
         }
     }
     return FindInit().state == State::kRunning ? FailForDaemon() : Fail("the device does not boot");
+}
+
+int Reboot() {
+    const bool isAsked = FindInit().state == State::kRunning &&
+                         __system_property_set(kPowerControlKey, "reboot") == 0;
+    const auto deadline = Clock::now() + std::chrono::milliseconds(kStopLimitMs);
+    while (isAsked && !GetProperty(kPowerControlKey).empty() && Clock::now() < deadline) {
+        std::this_thread::sleep_for(kPollPause);
+    }
+    const bool isRebooting = isAsked && GetProperty(kPowerControlKey).empty();
+    if (!isRebooting && Stop() != 0) {
+        return kFailure;
+    }
+    const int status = BringUp("Enforcing", Until::kDaemonAlive);
+    if (status == 0) {
+        Inform("rebooted; SELinux is Enforcing");
+    }
+    return status;
 }
 
 int Stop() {

@@ -45,6 +45,10 @@ enum class Until { kBooted, kDaemonAlive };
 // Returns the exit status, after a message if it is not 0.
 int BringUp(const char* selinuxMode, Until until);
 
+// Reboots the device with SELinux enforcing; boots a stopped one. Returns the exit status, after a
+// message.
+int Reboot();
+
 // Stops the device with SIGTERM, then SIGKILL after a time-out. Returns the exit status, after a
 // message.
 int Stop();

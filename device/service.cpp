@@ -23,7 +23,7 @@ constexpr int kMaxPauseMs = 5000;
 
 }  // namespace
 
-Service::Service(const Program& program) : mProgram(program) { SetState("stopped"); }
+Service::Service(const Program& program) : mProgram(program) {}
 
 void Service::Start() {
     if (!mIsEnabled) {
@@ -43,7 +43,7 @@ void Service::Stop() {
     }
     if (mIsEnabled) {
         mIsEnabled = false;
-        SetState("stopped");
+        PublishState();
     }
 }
 
@@ -61,7 +61,11 @@ void Service::Reap() {
     mDue = Clock::now() + std::chrono::milliseconds(mPauseMs);
     mProcess = -1;
     mProgram.onExit(true);
-    SetState("restarting");
+    mIsEnabled = status != 0;
+    PublishState();
+    if (!mIsEnabled) {
+        return;
+    }
     host::Event("restart_pause").Add("service", name()).Add("ms", mPauseMs);
     if (mPauseMs == kMinPauseMs * 2) {
         __android_log_print(ANDROID_LOG_ERROR, nullptr,
@@ -86,7 +90,7 @@ int Service::StartIfDue() {
         return kMinPauseMs;
     }
     host::Event("service_start").Add("service", name()).Add("process", mProcess);
-    SetState("running");
+    PublishState();
     return -1;
 }
 
@@ -106,7 +110,8 @@ void Service::Run(pid_t init) const {
     _exit(127);
 }
 
-void Service::SetState(const char* state) const {
+void Service::PublishState() const {
+    const char* const state = mProcess > 0 ? "running" : mIsEnabled ? "restarting" : "stopped";
     __system_property_set((std::string(kServiceStatePrefix) + name()).c_str(), state);
 }
 

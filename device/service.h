@@ -30,8 +30,11 @@ class Service {
     void Stop();
 
     // If the process has exited by itself, makes the service due after a pause, which doubles each
-    // time the process exits before it is up.
+    // time the process exits before it is up. After exit status 0, the service is stopped.
     void Reap();
+
+    // Writes the state to the property; a boot clears the properties.
+    void PublishState() const;
 
     // Starts the process if it is due. Returns the time in milliseconds until it is due, or -1 if
     // it is running or stopped.
@@ -41,7 +44,6 @@ class Service {
     using Clock = std::chrono::steady_clock;
 
     [[noreturn]] void Run(pid_t init) const;
-    void SetState(const char* state) const;
 
     const Program mProgram;
     pid_t mProcess = -1;

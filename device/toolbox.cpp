@@ -198,7 +198,6 @@ int Whoami(int /* argc */, char** /* argv */) {
 }
 
 int Reboot(int /* argc */, char** /* argv */) {
-    signal(SIGHUP, SIG_IGN);  // a terminal of adb hangs up when the device stops
     const std::string device = device::PathBesideProgram("device");
     execl(device.c_str(), "device", "reboot", nullptr);
     return FailForErrno(device);

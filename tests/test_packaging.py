@@ -181,10 +181,20 @@ def replay(device, sessions, directory):
             wait_until(lambda: is_idle(device))
 
 
+@pytest.fixture
+def shared_port(installed_device):
+    """The port of an adb server that does not look for the devices of other tests"""
+    port = str(free_port())
+    env = installed_device.env | {"ANDROID_ADB_SERVER_PORT": port, "ADB_EMU": "0"}
+    installed_device.output("adb", "start-server", env=env)
+    yield port
+    installed_device.run("adb", "kill-server", env=env)
+
+
 @pytest.mark.parametrize("page", ["README.md", "docs/automation.md"])
-def test_replays_the_sessions_of_a_page(installed, installed_device, tmp_path, page):
+def test_replays_the_sessions_of_a_page(installed, installed_device, shared_port, tmp_path, page):
     text = source(page).replace("/usr/share/", f"{installed}/usr/share/")
-    text = text.replace("PORT=5038", f"PORT={free_port()}")
+    text = text.replace("PORT=5038", f"PORT={shared_port}")
     directory = SOURCE if page == "README.md" else tmp_path
     sessions = re.findall(r"^```\n(\$ .*?)^```", text, re.S | re.M)
     replay(installed_device, sessions, directory)
