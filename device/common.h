@@ -70,12 +70,6 @@ inline bool IsDaemonAlive() {
     return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";
 }
 
-// Returns true if the property tells init to keep the daemon running.
-inline bool IsDaemonEnabled() {
-    const std::string enable = GetProperty(kServiceEnableKey);
-    return enable == "1" || enable == "true";
-}
-
 // Returns the contents of a regular file in the device root, or nullopt if it cannot be read.
 inline std::optional<std::string> ReadFile(const std::string& path) {
     const host::UniqueFd file = host::OpenFile(path, O_RDONLY);

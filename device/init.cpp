@@ -84,7 +84,7 @@ bool SetLock(device::InitLock byte, short type) {
     lock.l_type = type;
     lock.l_start = static_cast<off_t>(byte);
     lock.l_len = 1;
-    return fcntl(Mark(), F_SETLK, &lock) == 0;
+    return Mark() >= 0 && fcntl(Mark(), F_SETLK, &lock) == 0;
 }
 
 // Writes the files directly: another process may have just set a "ro." property, which
@@ -231,12 +231,14 @@ class Services {
     }
 
   private:
-    // Always stops the daemon first: if "0" and "1" are written in quick succession, init reads
-    // only "1", but the daemon must still restart.
+    // Also restarts a running daemon: if "0" and "1" are written in quick succession, init reads
+    // only "1".
     void FollowServiceEnable() {
-        mDaemon.Stop();
-        if (device::IsDaemonEnabled()) {
-            mDaemon.Start();
+        const std::string enable = device::GetProperty(device::kServiceEnableKey);
+        if (enable == "1" || enable == "true") {
+            mDaemon.Restart();
+        } else {
+            mDaemon.Stop();
         }
     }
 
@@ -247,11 +249,12 @@ class Services {
             if (request != verb + "$" + service->name()) {
                 continue;
             }
-            if (verb != "ctl.start") {
-                service->Stop();
-            }
-            if (verb != "ctl.stop") {
+            if (verb == "ctl.start") {
                 service->Start();
+            } else if (verb == "ctl.stop") {
+                service->Stop();
+            } else if (verb == "ctl.restart") {
+                service->Restart();
             }
         }
         unlinkat(host::PropertiesDirectory(), request.c_str(), 0);

@@ -19,6 +19,7 @@ constexpr char kServiceEnableKey[] = "odm.thp.service_enable";
 constexpr char kControlPrefix[] = "ctl.";
 // The state of a service is init.svc.NAME.
 constexpr char kServiceStatePrefix[] = "init.svc.";
+constexpr char kDaemonStateKey[] = "init.svc.corvane_daemon";
 
 // Control the simulated daemon: its startup delay in milliseconds, a firmware update ("true" while
 // in progress) and its fault (see faults.h).

@@ -43,7 +43,7 @@ bool ReadLock(const UniqueFd& mark, InitLock byte, struct flock& holder) {
     holder.l_type = F_WRLCK;
     holder.l_start = static_cast<off_t>(byte);
     holder.l_len = 1;
-    return fcntl(mark.get(), F_GETLK, &holder) == 0;
+    return mark.ok() && fcntl(mark.get(), F_GETLK, &holder) == 0;
 }
 
 // Returns the state of a device whose init is this process. An exiting process loses its program
@@ -118,7 +118,7 @@ int FailForUnknown(const Init& init) {
 
 int FailForDaemon() {
     return Fail("the daemon is not alive; see " + Command("shell logcat -d") +
-                ", or start a stopped daemon with " + Command("shell tpd start"));
+                ", or start a stopped daemon with " + Command("shell start corvane_daemon"));
 }
 
 }  // namespace
@@ -180,14 +180,15 @@ int BringUp(const char* selinuxMode, Until until) {
                 break;
             case State::kRunning:
                 const bool isStartedHere = init.process == started;
-                const bool isUp = IsDaemonAlive() && GetProperty(kBootCompletedKey) == "1";
+                const bool isBootCompleted = GetProperty(kBootCompletedKey) == "1";
+                const bool isUp = IsDaemonAlive() && (isBootCompleted || !isStartedHere);
                 if (isUp && isStartedHere) {
                     Inform("started in " + host::DeviceRootPath() + ", SELinux is " + selinuxMode);
                 }
                 if (isUp || (until == Until::kBooted && !isStartedHere)) {
                     return 0;
                 }
-                if (!IsDaemonEnabled()) {
+                if (GetProperty(kDaemonStateKey) == "stopped") {
                     return FailForDaemon();
                 }
         }

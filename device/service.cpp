@@ -30,20 +30,31 @@ void Service::Start() {
         mIsEnabled = true;
         mPauseMs = 0;
         mDue = Clock::now();
+        PublishState();
     }
 }
 
 void Service::Stop() {
+    Kill();
+    if (mIsEnabled) {
+        mIsEnabled = false;
+        PublishState();
+    }
+}
+
+void Service::Restart() {
+    Kill();
+    mIsEnabled = false;
+    Start();
+}
+
+void Service::Kill() {
     if (mProcess > 0) {
         host::Event("service_stop").Add("service", name()).Add("process", mProcess);
         kill(mProcess, SIGKILL);
         waitpid(mProcess, nullptr, 0);
         mProcess = -1;
         mProgram.onExit(false);
-    }
-    if (mIsEnabled) {
-        mIsEnabled = false;
-        PublishState();
     }
 }
 

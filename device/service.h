@@ -29,6 +29,9 @@ class Service {
     // Kills the process, if any, and waits for it.
     void Stop();
 
+    // Like Stop() and Start().
+    void Restart();
+
     // If the process has exited by itself, makes the service due after a pause, which doubles each
     // time the process exits before it is up. After exit status 0, the service is stopped.
     void Reap();
@@ -44,6 +47,7 @@ class Service {
     using Clock = std::chrono::steady_clock;
 
     [[noreturn]] void Run(pid_t init) const;
+    void Kill();
 
     const Program mProgram;
     pid_t mProcess = -1;
