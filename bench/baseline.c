@@ -18,16 +18,14 @@
 
 #define COMMAND "THP_ResetBaseline"
 #define DESCRIPTOR u"android.CorvaneInterfaceServer.ICorvaneInterfaceService"
-#define DEBUG_RAW "thp.debug.raw"
-#define REBOOT_TIMES "odm.thp.dae_reboot_times"
+#define DEBUG_RAW "properties/thp.debug.raw"
+#define REBOOT_TIMES "properties/odm.thp.dae_reboot_times"
 #define REFUSAL "please exe 'adb shell setenforce 0' in g_tpdCmd to disable selinux\n\n"
 
 enum { kMaxValue = 91, kMaxLogText = 1023, kMaxLine = 8192, kBlock = 4096, kInfo = 4, kError = 6 };
 enum { kFile = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC };
-enum { kDirectory = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC };
 
 static int root;
-static int properties;
 static int logFile;
 static char value[kMaxValue + 1];
 static struct stat status;
@@ -62,36 +60,33 @@ static void Log(int priority, const char* tag, const char* text) {
     WriteAll(logFile, line, (size_t)(end - line));
 }
 
-// Opens the properties directory on first use.
-static void ReadProperty(const char* name) {
-    if (properties == 0) {
-        properties = openat(root, "properties", kDirectory);
-    }
-    const int file = openat(properties, name, O_RDONLY | kFile);
+static void ReadProperty(const char* path) {
+    const int file = openat(root, path, O_RDONLY | kFile);
     const ssize_t size = read(file, value, kMaxValue);
     if (size < 0) {
-        Fail(name);
+        Fail(path);
     }
     close(file);
     value[size] = '\0';
 }
 
-static void WriteProperty(const char* name, const char* text) {
+static void WriteProperty(const char* path, const char* text) {
     char temporary[64];
-    fstatat(properties, name, &status, AT_SYMLINK_NOFOLLOW);
-    snprintf(temporary, sizeof(temporary), "%d.0", getpid());
-    const int directory = openat(root, "tmp", kDirectory);
-    const int file = openat(directory, temporary, O_WRONLY | O_CREAT | O_TRUNC | kFile, 0600);
+    fstatat(root, path, &status, AT_SYMLINK_NOFOLLOW);
+    mkdirat(root, "tmp", 0700);
+    mkdirat(root, "properties", 0700);
+    snprintf(temporary, sizeof(temporary), "tmp/%d.0", getpid());
+    const int file = openat(root, temporary, O_WRONLY | O_CREAT | O_TRUNC | kFile, 0600);
     WriteAll(file, text, strlen(text));
     close(file);
-    if (renameat2(directory, temporary, properties, name, 0) != 0) {
-        Fail(name);
+    if (renameat2(root, temporary, root, path, 0) != 0) {
+        Fail(path);
     }
 }
 
 static void ReadKernelCommandLine(void) {
     char line[kBlock];
-    openat(root, "proc", kDirectory);  // does not exist
+    openat(root, "proc/cmdline", O_RDONLY | kFile);  // does not exist
     const int file = open("/proc/cmdline", O_RDONLY);
     fstat(file, &status);
     if (read(file, line, (size_t)status.st_blksize) < 0) {
@@ -108,7 +103,6 @@ static void Start(void) {
     geteuid();
     fstatat(root, ".tpd-device", &status, AT_SYMLINK_NOFOLLOW);
     logFile = openat(root, "log", O_WRONLY | O_APPEND | O_CREAT | kFile, 0600);
-    fstat(logFile, &status);
     openat(root, "trace", O_RDONLY | kFile);
     Log(kInfo, "corvane_daemon", "InitTpdCmds[120] +\n");
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[142] +\n");
@@ -127,32 +121,25 @@ static const struct {
              0};
 
 static int Connect(void) {
-    const int dev = openat(root, "dev", kDirectory);
-    const int driver = openat(dev, "vndbinder", kDirectory);
-    close(dev);
-    const int service =
-            openat(driver, "service.corvaneinterfaceservice", O_PATH | O_NOFOLLOW | O_CLOEXEC);
     struct sockaddr_un address = {AF_UNIX, ""};
-    snprintf(address.sun_path, sizeof(address.sun_path), "/proc/self/fd/%d", service);
-    const int connection = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    fcntl(connection, F_SETFL, O_NONBLOCK);
+    snprintf(address.sun_path, sizeof(address.sun_path),
+             "/proc/self/fd/%d/dev/vndbinder/service.corvaneinterfaceservice", root);
+    const int connection = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
     if (connect(connection, (struct sockaddr*)&address, sizeof(address)) != 0) {
         Fail("connect");
     }
     fcntl(connection, F_SETFL, 0);
-    close(service);
-    close(driver);
     return connection;
 }
 
 static char* Call(int connection) {
-    uint32_t reply[2];  // status and size
+    uint32_t reply[3];  // status, flags, size
     if (send(connection, &request, sizeof(request), MSG_NOSIGNAL) < 0 ||
         recv(connection, reply, sizeof(reply), MSG_WAITALL) != sizeof(reply)) {
         Fail("call");
     }
-    char* const text = malloc(reply[1]);
-    if (recv(connection, text, reply[1], MSG_WAITALL) != reply[1]) {
+    char* const text = malloc(reply[2]);
+    if (recv(connection, text, reply[2], MSG_WAITALL) != reply[2]) {
         Fail("reply");
     }
     return text;
@@ -190,13 +177,13 @@ static void Forward(void) {
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[150] -\n");
     Log(kInfo, "corvane_daemon", "corvane_daemon ThpDebugExecuteCmd[156] cmd " COMMAND "\n");
     ReadKernelCommandLine();
-    ReadProperty("odm.thp.debug.selinux.permissive");
+    ReadProperty("properties/odm.thp.debug.selinux.permissive");
     if (strcmp(value, "true") != 0) {
         Refuse();
         return;
     }
-    ReadProperty("odm.thp.dae_alive");
-    ReadProperty("odm.thp.binder");
+    ReadProperty("properties/odm.thp.dae_alive");
+    ReadProperty("properties/odm.thp.binder");
     ReadProperty(REBOOT_TIMES);
     Log(kInfo, "tpd", "ThpGetBinder");
     const int connection = Connect();
@@ -214,7 +201,7 @@ static void DebugRawEnable(void) {
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[145] Get cmd. debugRawEnable\n");
     ReadProperty(DEBUG_RAW);
     WriteProperty(DEBUG_RAW, "true");
-    Log(kError, "corvane_daemon", "retry:1, i = 0, " DEBUG_RAW ", [new]true, [old]false");
+    Log(kError, "corvane_daemon", "retry:1, i = 0, thp.debug.raw, [new]true, [old]false");
     usleep(100);
     ReadProperty(DEBUG_RAW);
     BeginOutput();

@@ -41,7 +41,7 @@ std::string CommandOf(const std::string& file) {
 }
 
 std::optional<std::string> ReadAnswer(const std::string& command) {
-    std::optional<std::string> answer = ReadFile(AnswerPath(command));
+    std::optional<std::string> answer = host::ReadFile(AnswerPath(command));
     if (answer.has_value()) {
         host::Event("recorded_answer").Add("command", command);
     }
@@ -52,7 +52,7 @@ std::optional<std::string> ReadAnswer(const std::string& command) {
 
 std::set<std::string> RecordedCommands() {
     std::set<std::string> commands;
-    for (const std::string& file : FilesIn(kDirectory)) {
+    for (const std::string& file : host::FilesIn(kDirectory)) {
         commands.insert(CommandOf(file));
     }
     return commands;

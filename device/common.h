@@ -1,10 +1,7 @@
 // Helpers shared by the programs of the virtual device.
 #pragma once
 
-#include <fcntl.h>
-#include <sys/stat.h>
 #include <sys/system_properties.h>
-#include <unistd.h>
 
 #include <cerrno>
 #include <cstdint>
@@ -12,8 +9,6 @@
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
-#include <optional>
-#include <set>
 #include <string>
 
 #include "keys.h"
@@ -70,33 +65,9 @@ inline bool IsDaemonAlive() {
     return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";
 }
 
-// Returns the contents of a regular file in the device root, or nullopt if it cannot be read.
-inline std::optional<std::string> ReadFile(const std::string& path) {
-    const host::UniqueFd file = host::OpenFile(path, O_RDONLY);
-    struct stat status = {};
-    if (!file.ok() || fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode)) {
-        return std::nullopt;
-    }
-    std::string text(static_cast<size_t>(status.st_size), '\0');
-    const ssize_t length = read(file.get(), text.data(), text.size());
-    text.resize(length > 0 ? static_cast<size_t>(length) : 0);
-    return text;
-}
-
 // Returns what `getenforce` prints: Enforcing, Permissive or Disabled.
-inline std::string SelinuxMode() { return ReadFile(host::kSelinuxFile).value_or("Enforcing"); }
-
-// Returns the names in a directory of the device root, or an empty set if it cannot be read.
-inline std::set<std::string> FilesIn(const std::string& path) {
-    const host::UniqueFd directory = host::OpenDirectory(path);
-    const std::string opened = "/proc/self/fd/" + std::to_string(directory.get());
-    std::set<std::string> names;
-    std::error_code error;
-    std::filesystem::directory_iterator file(opened, error);
-    for (; file != std::filesystem::directory_iterator(); file.increment(error)) {
-        names.insert(file->path().filename());
-    }
-    return names;
+inline std::string SelinuxMode() {
+    return host::ReadFile(host::kSelinuxFile).value_or("Enforcing");
 }
 
 // Returns the path of a file in the directory of the running executable. Without /proc, returns a

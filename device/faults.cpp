@@ -1,5 +1,6 @@
 #include "faults.h"
 
+#include <fcntl.h>
 #include <sys/file.h>
 #include <sys/system_properties.h>
 
@@ -35,7 +36,7 @@ std::string ParseNumber(const std::string& word, const Range& range, int64_t& nu
 // Locks the properties directory, so that only one process or thread at a time changes the fault.
 // Closing the descriptor releases the lock.
 host::UniqueFd LockFault() {
-    host::UniqueFd lock = host::OpenDirectory(host::kPropertiesDirectory);
+    host::UniqueFd lock = host::OpenFile(host::kPropertiesDirectory, O_RDONLY);
     if (lock.ok() && flock(lock.get(), LOCK_EX) != 0) {
         lock.reset();
     }

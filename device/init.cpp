@@ -3,8 +3,7 @@
 // ctl.restart do with the name of any service.
 //
 // init MODE: boots the device with SELinux in MODE. Prints errors to standard error until the
-// device has booted. Exits on SIGTERM or SIGINT, or when the mark or the properties directory is
-// removed.
+// device has booted. Exits on SIGTERM or SIGINT, or when the mark is removed.
 #include <android/log.h>
 #include <fcntl.h>
 #include <poll.h>
@@ -19,6 +18,7 @@
 #include <csignal>
 #include <cstdio>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "common.h"
@@ -27,6 +27,7 @@
 #include "platform/events.h"
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
+#include "platform/libc/properties.h"
 #include "platform/unique_fd.h"
 #include "service.h"
 
@@ -56,16 +57,16 @@ constexpr const char* kBootProperties[][2] = {{"ro.build.display.id", "VIRTUAL-1
                                               {device::kIsUpdatingFirmwareKey, "false"},
                                               {device::kServiceEnableKey, "1"}};
 
-// Removes the files in a directory, except those whose names begin with `keptPrefix`, if any.
+// Deletes the files in a directory, except those whose names begin with `keptPrefix`, if any.
 // Creates a missing directory. Returns false if the directory cannot be opened.
-bool Empty(const char* path, const char* keptPrefix = nullptr) {
-    const UniqueFd directory = host::OpenDirectory(path, host::IfMissing::kMake);
-    if (!directory.ok()) {
-        return false;
+bool DeleteFiles(const std::string& path, const char* keptPrefix = nullptr) {
+    host::MakeParents(path + "/");
+    if (!host::OpenFile(path, O_RDONLY | O_DIRECTORY).ok()) {
+        return false;  // for example, a symbolic link
     }
-    for (const std::string& name : device::FilesIn(path)) {
+    for (const std::string& name : host::FilesIn(path)) {
         if (keptPrefix == nullptr || name.rfind(keptPrefix, 0) != 0) {
-            unlinkat(directory.get(), name.c_str(), 0);
+            host::RemoveFile(path + "/" + name);
         }
     }
     return true;
@@ -90,23 +91,23 @@ bool SetLock(device::InitLock byte, short type) {
 // Writes the files directly: another process may have just set a "ro." property, which
 // __system_property_set() would not replace.
 bool SetBootProperties() {
-    return std::all_of(
-            std::begin(kBootProperties), std::end(kBootProperties), [](const auto& property) {
-                return host::ReplaceFileAt(host::PropertiesDirectory(), property[0], property[1]);
-            });
+    return std::all_of(std::begin(kBootProperties), std::end(kBootProperties),
+                       [](const auto& property) {
+                           return host::ReplaceFile(host::PropertyFile(property[0]), property[1]);
+                       });
 }
 
 // Resets the device's files to their state at power-on. Returns null, or the path that could not be
 // reset.
 const char* Boot(const char* selinuxMode) {
     const host::Event event("boot");
-    if (!Empty(host::kTemporaryDirectory)) {
+    if (!DeleteFiles(host::kTemporaryDirectory)) {
         return host::kTemporaryDirectory;
     }
-    if (!Empty(kDriverDirectory)) {
+    if (!DeleteFiles(kDriverDirectory)) {
         return kDriverDirectory;
     }
-    if (!Empty(host::kPropertiesDirectory, "persist.") || !SetBootProperties()) {
+    if (!DeleteFiles(host::kPropertiesDirectory, "persist.") || !SetBootProperties()) {
         return host::kPropertiesDirectory;
     }
     if (!host::OpenFile(host::kLogFile, O_WRONLY | O_CREAT | O_TRUNC).ok()) {
@@ -140,7 +141,7 @@ std::vector<std::string> ReadRequests(const UniqueFd& watch) {
 }
 
 void OnDaemonExit(bool isCrash) {
-    Empty(kDriverDirectory);
+    DeleteFiles(kDriverDirectory);
     __system_property_set(device::kDaemonAliveKey, "false");
     __system_property_set(device::kDaemonBinderKey, "0");
     __system_property_set(device::kIsUpdatingFirmwareKey, "false");
@@ -165,11 +166,11 @@ constexpr Service::Program kAdbServer = {"adb_server", "adb_server", IsAdbdUp, O
 
 // Ends an adb server in the device root that adb started in the absence of the service.
 void StopAdbServer() {
-    const UniqueFd root = host::OpenDirectory(".");
-    const sockaddr_un address = host::Address(root, "adb.sock");
-    const UniqueFd server = host::NewSocket();
+    constexpr std::string_view kRequest = "0009host:kill";
+    const sockaddr_un address = host::AddressOf("adb.sock");
+    const UniqueFd server(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
     if (connect(server.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) == 0) {
-        host::Send(server, "0009host:kill");
+        send(server.get(), kRequest.data(), kRequest.size(), MSG_NOSIGNAL);
     }
 }
 
@@ -257,7 +258,7 @@ class Services {
                 service->Restart();
             }
         }
-        unlinkat(host::PropertiesDirectory(), request.c_str(), 0);
+        host::RemoveFile(host::PropertyFile(request));
     }
 
     Service mDaemon{kDaemon};
@@ -287,15 +288,15 @@ UniqueFd OpenSignals() {
     return UniqueFd(signalfd(-1, &signals, SFD_CLOEXEC | SFD_NONBLOCK));
 }
 
-// Returns an inotify descriptor for writes to properties and the removal of their directory.
+// Returns an inotify descriptor for writes to properties and the removal of the mark.
 UniqueFd OpenWatch() {
     UniqueFd watch(inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
-    const auto add = [&watch](int directory, uint32_t events) {
-        const std::string path = "/proc/self/fd/" + std::to_string(directory);
+    const auto add = [&watch](const char* directory, uint32_t events) {
+        const std::string path = host::AbsolutePath(directory);
         return inotify_add_watch(watch.get(), path.c_str(), events) >= 0;
     };
-    const bool isWatching = watch.ok() && add(host::PropertiesDirectory(), IN_MOVED_TO) &&
-                            add(host::DeviceRoot(), IN_MOVED_FROM | IN_DELETE);
+    const bool isWatching = watch.ok() && add(host::kPropertiesDirectory, IN_MOVED_TO) &&
+                            add(".", IN_MOVED_FROM | IN_DELETE);
     return isWatching ? std::move(watch) : UniqueFd();
 }
 
@@ -325,6 +326,7 @@ void ReleaseStreams() {
 
 // Runs the services until init is told to exit, or a reboot fails.
 void RunServices(const UniqueFd& signals, const UniqueFd& watch) {
+    const UniqueFd properties = host::OpenFile(host::kPropertiesDirectory, O_RDONLY);
     Services services;
     services.Start();
     SetLock(device::InitLock::kBooted, F_WRLCK);
@@ -346,11 +348,11 @@ void RunServices(const UniqueFd& signals, const UniqueFd& watch) {
         pollfd waits[] = {{signals.get(), POLLIN, 0}, {watch.get(), POLLIN, 0}};
         poll(waits, std::size(waits), untilNextStartMs);
     } while (unwritable == nullptr && !ExitRequested(signals) && OwnsDevice() &&
-             IsInPlace(host::PropertiesDirectory(), host::kPropertiesDirectory));
+             IsInPlace(properties.get(), host::kPropertiesDirectory));
     SetLock(device::InitLock::kBooted, F_UNLCK);
     if (OwnsDevice()) {
         services.Stop();
-        Empty(host::kTemporaryDirectory);
+        DeleteFiles(host::kTemporaryDirectory);
     }
 }
 

@@ -61,7 +61,7 @@ State StateOf(pid_t init, bool isBooted) {
 // Locks the device root, so that one process at a time starts init. Closing the descriptor releases
 // the lock.
 UniqueFd TryToLockStart() {
-    UniqueFd root = host::OpenDirectory(".");
+    UniqueFd root = host::OpenFile(".", O_RDONLY);
     return flock(root.get(), LOCK_EX | LOCK_NB) == 0 ? std::move(root) : UniqueFd();
 }
 

@@ -29,8 +29,7 @@ using device::kUsageError;  // makes main() print the usage
 std::string WholeProperty(const std::string& name) {
     const std::string value = device::GetProperty(name.c_str());
     const bool isCut = value.length() == PROP_VALUE_MAX - 1;
-    return isCut ? device::ReadFile(std::string(host::kPropertiesDirectory) + "/" + name)
-                           .value_or("")
+    return isCut ? host::ReadFile(std::string(host::kPropertiesDirectory) + "/" + name).value_or("")
                  : value;
 }
 
@@ -41,7 +40,7 @@ int Getprop(int argc, char** argv) {
         puts(usesDefault ? argv[2] : value.c_str());
         return 0;
     }
-    for (const std::string& name : device::FilesIn(host::kPropertiesDirectory)) {
+    for (const std::string& name : host::FilesIn(host::kPropertiesDirectory)) {
         printf("[%s]: [%s]\n", name.c_str(), WholeProperty(name).c_str());
     }
     return 0;
@@ -98,8 +97,8 @@ int Setenforce(int /* argc */, char** argv) {
 }
 
 int ListSettings(const std::string& directory) {
-    for (const std::string& key : device::FilesIn(directory)) {
-        printf("%s=%s\n", key.c_str(), device::ReadFile(directory + key).value_or("null").c_str());
+    for (const std::string& key : host::FilesIn(directory)) {
+        printf("%s=%s\n", key.c_str(), host::ReadFile(directory + key).value_or("null").c_str());
     }
     return 0;
 }
@@ -121,7 +120,7 @@ int Settings(int argc, char** argv) {
     }
     const std::string path = directory + key;
     if (verb == "get" && argc == 4) {
-        puts(device::ReadFile(path).value_or("null").c_str());
+        puts(host::ReadFile(path).value_or("null").c_str());
         return 0;
     }
     if (verb == "delete" && argc == 4) {

@@ -77,17 +77,16 @@ def describe(event):
     fields["priority"] = LETTERS.get(event.get("priority"), "?")
     fields["end"] = f"signal {signaled}" if signaled else f"status {status}"
     fields["found"] = "found" if event.get("found") else "not found"
-    fields["size"] = len(event.get("request", "")) // 2
+    fields["size"] = len(event.get("request", ""))
     fields["way"] = "one-way" if event.get("flags", 0) & 1 else "two-way"
     return DESCRIPTIONS.get(event["what"], event["what"]).format_map(fields).rstrip()
 
 
 def hexdump(request):
-    for at in range(0, len(request), 32):
-        line = request[at : at + 32]
-        text = "".join(chr(c) if 32 <= c < 127 else "." for c in bytes.fromhex(line))
-        groups = " ".join(line[i : i + 4] for i in range(0, len(line), 4))
-        print(f"{'':19}{at // 2:08x}: {groups:39}  {text}")
+    for at in range(0, len(request), 16):
+        line = request[at : at + 16]
+        text = "".join(c if " " <= c <= "~" else "." for c in line)
+        print(f"{'':19}{at:08x}: {line.encode('latin-1').hex(' ', -2):39}  {text}")
 
 
 @contextlib.contextmanager

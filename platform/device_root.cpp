@@ -1,6 +1,5 @@
 #include "platform/device_root.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -17,8 +16,6 @@
 namespace host {
 
 namespace {
-
-bool IsSet(const char* value) { return value != nullptr && *value != '\0'; }
 
 int Refuse(const std::string& path, const char* why) {
     fprintf(stderr, "device root %s: %s\n", path.c_str(), why);
@@ -40,21 +37,10 @@ bool IsMarked(int root) {
     return fstatat(root, kMarkFile, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode);
 }
 
-// Marks an empty directory as a device root. Returns null, or the reason for the failure. Does not
-// need /proc, unlike std::filesystem with a file descriptor.
-const char* Mark(int root) {
-    const int opened = openat(root, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    DIR* const directory = opened < 0 ? nullptr : fdopendir(opened);
-    if (directory == nullptr) {
-        return strerror(errno);
-    }
-    int entries = 0;
-    while (readdir(directory) != nullptr) {
-        ++entries;
-    }
-    closedir(directory);
-    const bool isEmpty = entries == 2;  // "." and ".."
-    if (isEmpty) {
+// Marks an empty directory as a device root. Returns null, or the reason for the failure.
+const char* Mark(int root, const std::string& path) {
+    std::error_code error;
+    if (std::filesystem::is_empty(path, error)) {
         const UniqueFd mark(openat(root, kMarkFile, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600));
         return mark.ok() || errno == EEXIST ? nullptr : strerror(errno);
     }
@@ -64,7 +50,7 @@ const char* Mark(int root) {
 }
 
 // Returns null, or the reason why the directory cannot be the device root.
-const char* Check(int root) {
+const char* Check(int root, const std::string& path) {
     struct stat status = {};
     if (fstat(root, &status) != 0) {
         return strerror(errno);
@@ -75,7 +61,7 @@ const char* Check(int root) {
     if ((status.st_mode & 0077) != 0) {
         return "is open to other users; its mode must be 0700";
     }
-    return IsMarked(root) ? nullptr : Mark(root);
+    return IsMarked(root) ? nullptr : Mark(root, path);
 }
 
 int OpenRoot() {
@@ -98,20 +84,22 @@ int OpenRoot() {
     if (!root.ok()) {
         return Refuse(path, error ? strerror(error.value()) : strerror(errno));
     }
-    const char* const why = Check(root.get());
+    const char* const why = Check(root.get(), path);
     return why == nullptr ? root.release() : Refuse(path, why);
 }
 
 }  // namespace
 
 std::string DeviceRootPath() {
+    constexpr const char* kPlaces[][2] = {{"TPD_DEVICE_ROOT", ""},
+                                          {"XDG_STATE_HOME", "/tpd-device"},
+                                          {"HOME", "/.local/state/tpd-device"}};
     std::string path;
-    if (const char* const root = getenv("TPD_DEVICE_ROOT"); IsSet(root)) {
-        path = root;
-    } else if (const char* const state = getenv("XDG_STATE_HOME"); IsSet(state)) {
-        path = std::string(state) + "/tpd-device";
-    } else if (const char* const home = getenv("HOME"); IsSet(home)) {
-        path = std::string(home) + "/.local/state/tpd-device";
+    for (const auto& [variable, rest] : kPlaces) {
+        const char* const value = getenv(variable);
+        if (path.empty() && value != nullptr && *value != '\0') {
+            path = std::string(value) + rest;
+        }
     }
     // With a trailing slash, open() would follow a symbolic link despite O_NOFOLLOW.
     while (path.length() > 1 && path.back() == '/') {

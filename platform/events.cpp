@@ -17,14 +17,10 @@ namespace host {
 
 namespace {
 
-std::atomic<int> gTraced{-1};  // negative until the first check
-
-constexpr char kHexDigits[] = "0123456789abcdef";
-
 // Returns true if a recorder holds the lock on the trace file. Otherwise removes the file, unless
 // another process has already done so: the name may then belong to a new recorder.
 bool IsRecorded() {
-    const UniqueFd trace = OpenFileAt(DeviceRoot(), kTraceFile, O_RDONLY);
+    const UniqueFd trace = OpenFile(kTraceFile, O_RDONLY);
     if (!trace.ok()) {
         return false;
     }
@@ -33,32 +29,25 @@ bool IsRecorded() {
     }
     struct stat status = {};
     if (fstat(trace.get(), &status) == 0 && status.st_nlink > 0) {
-        unlinkat(DeviceRoot(), kTraceFile, 0);
+        RemoveFile(kTraceFile);
     }
     return false;
 }
 
+// Whether tracing was on at the last check.
+std::atomic<bool>& Tracing() {
+    static std::atomic<bool> tracing{IsRecorded()};
+    return tracing;
+}
+
 }  // namespace
 
-bool IsTraced() {
-    if (gTraced < 0) {
-        UpdateTracing();
-    }
-    return gTraced == 1;
-}
+bool IsTraced() { return Tracing(); }
 
-void UpdateTracing() {
-    const int error = errno;
-    gTraced = IsRecorded() ? 1 : 0;
-    errno = error;
-}
-
-int64_t MonotonicUs() {
-    return std::chrono::steady_clock::now().time_since_epoch() / std::chrono::microseconds(1);
-}
+void UpdateTracing() { Tracing() = IsRecorded(); }
 
 int WriteLog(int priority, std::string_view tag, std::string_view text) {
-    static const int log = OpenForAppending(kLogFile, O_CREAT);
+    static const int log = OpenFile(kLogFile, O_WRONLY | O_APPEND | O_CREAT).release();
     Event event("log", true);
     event.Add("priority", static_cast<uint8_t>(priority))
             .Add("tag", tag.substr(0, kMaxLogText))
@@ -81,10 +70,10 @@ Event::~Event() {
     }
     const int error = errno;
     // Reopened for every event, because the file may have been removed.
-    const UniqueFd trace(OpenForAppending(kTraceFile, 0));
+    const UniqueFd trace = OpenFile(kTraceFile, O_WRONLY | O_APPEND);
     if (AppendTo(trace.get()) < 0) {
         fchmod(trace.get(), S_IRUSR);
-        gTraced = 0;
+        Tracing() = false;
     }
     errno = error;
 }
@@ -111,6 +100,7 @@ Event& Event::Add(const char* name, std::string_view value) {
         } else if (c >= ' ' && c <= '~') {
             mLine += c;
         } else {
+            constexpr char kHexDigits[] = "0123456789abcdef";
             mLine.append("\\u00").append({kHexDigits[byte >> 4], kHexDigits[byte & 0xF]});
         }
     }
@@ -123,14 +113,6 @@ Event& Event::Add(const char* name, int64_t value) {
         mLine.append(",\"").append(name).append("\":").append(std::to_string(value));
     }
     return *this;
-}
-
-Event& Event::AddHex(const char* name, const uint8_t* bytes, size_t size) {
-    std::string digits;
-    for (size_t i = 0; i < size && !mLine.empty(); ++i) {
-        digits.append({kHexDigits[bytes[i] >> 4], kHexDigits[bytes[i] & 0xF]});
-    }
-    return Add(name, digits);
 }
 
 }  // namespace host

@@ -27,14 +27,11 @@ bool IsTraced();
 // recorder.
 void UpdateTracing();
 
-// CLOCK_MONOTONIC in microseconds, for durations.
-int64_t MonotonicUs();
-
 // Appends an event to the log. Returns the number of bytes written or a negative errno value.
 int WriteLog(int priority, std::string_view tag, std::string_view text);
 
-// An event, which the destructor appends to the trace. Does nothing while tracing is off. A process
-// that cannot append an event makes the trace read-only. Preserves errno.
+// An event, which the destructor appends to the trace without changing errno. Does nothing while
+// tracing is off. A process that cannot append an event makes the trace read-only.
 class Event {
   public:
     explicit Event(const char* what) : Event(what, false) {}
@@ -44,8 +41,6 @@ class Event {
 
     Event& Add(const char* name, std::string_view value);
     Event& Add(const char* name, int64_t value);
-    // Adds the bytes as hexadecimal digits.
-    Event& AddHex(const char* name, const uint8_t* bytes, size_t size);
 
   private:
     friend int WriteLog(int priority, std::string_view tag, std::string_view text);

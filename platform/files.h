@@ -1,8 +1,9 @@
-// The device's files. Paths are relative to the device root; symbolic links are not followed in any
-// component. Functions set errno on failure.
+// The device's files. Paths are relative to the device root. A file or directory that is a symbolic
+// link is not opened. Functions set errno on failure.
 #pragma once
 
-#include <filesystem>
+#include <optional>
+#include <set>
 #include <string>
 #include <string_view>
 
@@ -19,31 +20,26 @@ constexpr char kSelinuxFile[] = "selinux";
 constexpr char kTemporaryDirectory[] = "tmp";  // files are written here, then renamed
 constexpr char kTraceFile[] = "trace";
 
-enum class IfMissing { kFail, kMake };
+// Opens a file or a directory. `flags` are those of open().
+UniqueFd OpenFile(const std::string& path, int flags);
 
-// Opens a directory for reading and for the *at() calls. "." is the device root. The path may begin
-// with a slash.
-UniqueFd OpenDirectory(const std::filesystem::path& path, IfMissing ifMissing = IfMissing::kFail);
+// Creates the missing directories above a file.
+void MakeParents(const std::string& path);
 
-// Returns a descriptor of the properties directory, which stays open, or -1. Creates a missing
-// directory.
-int PropertiesDirectory();
+// Returns the contents of a regular file, or nullopt if it cannot be read.
+std::optional<std::string> ReadFile(const std::string& path);
 
-// Opens a file. `flags` are those of open().
-UniqueFd OpenFile(const std::filesystem::path& path, int flags);
-UniqueFd OpenFileAt(int directory, const std::string& name, int flags);
+// Replaces or creates a file atomically, in a directory that may be missing. `flags` are those of
+// renameat2().
+bool ReplaceFile(const std::string& path, std::string_view content, unsigned flags = 0);
 
-// Opens a regular file directly in the device root for appending. The caller closes the descriptor.
-// Rejects pipes: a write without a reader would kill the process. Creates a missing file if `flags`
-// contains O_CREAT.
-int OpenForAppending(const char* name, int flags);
+bool RemoveFile(const std::string& path);
 
-// Replaces or creates a file atomically. ReplaceFile() also creates missing directories. `flags`
-// are those of renameat2().
-bool ReplaceFile(const std::filesystem::path& path, std::string_view content);
-bool ReplaceFileAt(int directory, const std::string& name, std::string_view content,
-                   unsigned flags = 0);
+// Returns the names in a directory, or an empty set if it cannot be read.
+std::set<std::string> FilesIn(const std::string& path);
 
-bool RemoveFile(const std::filesystem::path& path);
+// Returns an absolute path of the file for functions that take no directory descriptor. It is valid
+// in this process only.
+std::string AbsolutePath(const std::string& path);
 
 }  // namespace host

@@ -47,7 +47,7 @@ def test_daemon_refuses_requests_to_another_interface(device):
     with socket.socket(socket.AF_UNIX) as client:
         client.connect(str(device.root / SERVICE))
         client.send(struct.pack("<III", 0, 0, 0))  # code, flags, size
-        status, size = struct.unpack("<iI", client.recv(8))
+        status, _, size = struct.unpack("<iII", client.recv(12))
     assert (status, size) == (-1, 0)
 
 

@@ -111,12 +111,11 @@ def test_starts_beside_a_killed_command(device, chance, repeats, verb):
         assert device.run("device", "status").returncode == 0
 
 
-@pytest.mark.parametrize("removed", [".tpd-device", "properties"])
-def test_init_exits_when_its_device_is_removed(device, removed):
+def test_init_exits_when_its_device_is_removed(device):
     device.start()
-    (device.root / removed).rename(device.root / "away")
+    (device.root / ".tpd-device").rename(device.root / "away")
     wait_until(lambda: not device.processes())
-    (device.root / "away").rename(device.root / removed)
+    (device.root / "away").rename(device.root / ".tpd-device")
 
 
 def test_start_applies_the_permissive_mode_to_a_running_device(device):

@@ -19,11 +19,13 @@ void Parcel::setDataPosition(size_t position) const {
     mPosition = std::min(position, mData.size());
 }
 
-uint8_t* Parcel::resize(size_t size) {
-    mData.resize(size);
+status_t Parcel::setData(const uint8_t* buffer, size_t size) {
+    mData.assign(buffer, buffer + size);
     mPosition = 0;
-    return mData.data();
+    return OK;
 }
+
+void Parcel::freeData() { setData(nullptr, 0); }
 
 // Consumes the next `size` bytes and their padding, which may be missing at the end. Returns the
 // bytes, or null if fewer are left.

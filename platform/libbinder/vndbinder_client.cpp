@@ -2,11 +2,12 @@
 #include <sys/socket.h>
 
 #include <algorithm>
+#include <chrono>
+#include <string_view>
 #include <utility>
 #include <vector>
 
 #include "platform/events.h"
-#include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 
 using android::IBinder;
@@ -18,6 +19,8 @@ using android::wp;
 namespace host {
 
 namespace {
+
+using Clock = std::chrono::steady_clock;
 
 // The platform's library adds this flag to every call: the client accepts file descriptors in the
 // reply.
@@ -33,15 +36,15 @@ class RemoteBinder : public IBinder {
         Event("call")
                 .Add("code", code)
                 .Add("flags", flags)
-                .AddHex("request", data.data(), data.dataSize());
-        const int64_t start = MonotonicUs();
+                .Add("request", {reinterpret_cast<const char*>(data.data()), data.dataSize()});
+        const auto start = Clock::now();
         Parcel discarded;
         Parcel& received = reply != nullptr ? *reply : discarded;
         const status_t status = Deliver(code, data, received, flags);
         Event("reply")
                 .Add("status", status)
                 .Add("bytes", static_cast<int64_t>(received.dataSize()))
-                .Add("us", MonotonicUs() - start);
+                .Add("us", (Clock::now() - start) / std::chrono::microseconds(1));
         return status;
     }
 
@@ -57,14 +60,12 @@ class RemoteBinder : public IBinder {
 
     status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void* /* cookie */,
                            uint32_t /* flags */, wp<DeathRecipient>* /* outRecipient */) override {
+        // If the owner is dead, there are no recipients.
+        status_t status = mConnection.ok() ? android::NAME_NOT_FOUND : android::DEAD_OBJECT;
         const auto found = std::find(mRecipients.begin(), mRecipients.end(), recipient);
-        status_t status = android::OK;
-        if (!mConnection.ok()) {
-            status = android::DEAD_OBJECT;  // OwnerDied() has removed all recipients
-        } else if (found == mRecipients.end()) {
-            status = android::NAME_NOT_FOUND;
-        } else {
+        if (found != mRecipients.end()) {
             mRecipients.erase(found);
+            status = android::OK;
         }
         Event("unlink_to_death").Add("status", status);
         return status;
@@ -76,19 +77,16 @@ class RemoteBinder : public IBinder {
             return android::DEAD_OBJECT;
         }
         const bool oneWay = (flags & FLAG_ONEWAY) != 0;
-        if (data.dataSize() > (oneWay ? kMaxOneWayBytes : kMaxTransactionBytes)) {
+        if (data.dataSize() > kMaxTransactionBytes / (oneWay ? 2 : 1)) {
             return android::FAILED_TRANSACTION;
         }
-        if (!SendMessage(mConnection, RequestHeader{code, flags, 0}, data)) {
-            return OwnerDied();
-        }
-        ReplyHeader header = {};
-        if (!oneWay && !ReceiveMessage(mConnection, &header, &reply)) {
-            reply.resize(0);
+        Header header = {static_cast<int32_t>(code), flags, 0};
+        if (!SendMessage(mConnection, header, data) ||
+            (!oneWay && !ReceiveMessage(mConnection, &header, &reply))) {
             return OwnerDied();
         }
         // A positive status counts as success, as on a device.
-        return std::min<status_t>(header.status, android::OK);
+        return oneWay ? android::OK : std::min<status_t>(header.code, android::OK);
     }
 
     // Notifies each recipient once, on this thread.
@@ -111,13 +109,10 @@ class RemoteBinder : public IBinder {
 
 }  // namespace
 
-sp<IBinder> ConnectService(const std::string& driver, const std::string& name) {
-    const UniqueFd directory = OpenDirectory(driver);
-    const UniqueFd service(openat(directory.get(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
-    const sockaddr_un address = Address(service);
-    UniqueFd connection = NewSocket();
+sp<IBinder> ConnectService(const std::string& path) {
     // Do not wait for a busy service; a later lookup may reach it.
-    fcntl(connection.get(), F_SETFL, O_NONBLOCK);
+    UniqueFd connection(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+    const sockaddr_un address = AddressOf(path);
     if (connect(connection.get(), reinterpret_cast<const sockaddr*>(&address), sizeof(address)) !=
         0) {
         return nullptr;

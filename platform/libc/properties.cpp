@@ -13,6 +13,7 @@
 #include <cstring>
 #include <string>
 
+#include "platform/device_root.h"
 #include "platform/events.h"
 #include "platform/files.h"
 #include "platform/libc/properties.h"
@@ -49,14 +50,15 @@ bool IsUtf8(const std::string& value) {
 // Returns true if the owner has no write permission. Then even root cannot write the property.
 bool IsWriteProtected(const std::string& name) {
     struct stat status = {};
-    return fstatat(host::PropertiesDirectory(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+    const std::string file = host::PropertyFile(name);
+    return fstatat(host::DeviceRoot(), file.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
            (status.st_mode & S_IWUSR) == 0;
 }
 
 int Get(const std::string& name, char* value) {
     ssize_t length = 0;
     if (IsLegalName(name)) {
-        const host::UniqueFd file = host::OpenFileAt(host::PropertiesDirectory(), name, O_RDONLY);
+        const host::UniqueFd file = host::OpenFile(host::PropertyFile(name), O_RDONLY);
         length = file.ok() ? read(file.get(), value, PROP_VALUE_MAX - 1) : 0;
     }
     value[length > 0 ? length : 0] = '\0';
@@ -69,10 +71,14 @@ bool Set(const std::string& name, const std::string& value) {
     }
     const unsigned flags = IsReadOnlyKey(name) ? RENAME_NOREPLACE : 0;
     const std::string file = IsRequestKey(name) ? name + "$" + value : name;
-    return host::ReplaceFileAt(host::PropertiesDirectory(), file, value, flags);
+    return host::ReplaceFile(host::PropertyFile(file), value, flags);
 }
 
 }  // namespace
+
+std::string host::PropertyFile(const std::string& name) {
+    return std::string(host::kPropertiesDirectory) + "/" + name;
+}
 
 const char* host::PropertyError(const std::string& name, const std::string& value) {
     if (!IsLegalName(name)) {

@@ -8,7 +8,7 @@ namespace android {
 class IServiceManager : public IInterface {
   public:
     // Returns the service's binder, or null if the service does not appear within 5 s. The
-    // environment variable TPD_GET_SERVICE_MS sets another limit in milliseconds, up to a day.
+    // environment variable TPD_GET_SERVICE_MS sets another limit in milliseconds.
     virtual sp<IBinder> getService(const String16& name) const = 0;
 
     // Publishes a binder of this process, replacing any earlier one of that name. Returns 0 or a

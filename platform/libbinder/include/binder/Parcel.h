@@ -19,12 +19,11 @@ class Parcel {
 
     const uint8_t* data() const { return mData.data(); }
     size_t dataSize() const { return mData.size(); }
-    size_t dataPosition() const { return mPosition; }
     void setDataPosition(size_t position) const;
 
-    // Resizes the content and returns it for the caller to fill. A host extension that saves the
-    // transport a copy.
-    uint8_t* resize(size_t size);
+    // Replaces the content with a copy of the buffer, to be read from the beginning. Returns 0.
+    status_t setData(const uint8_t* buffer, size_t size);
+    void freeData();
 
     // Writers return 0, or BAD_VALUE for a null string.
     status_t writeInterfaceToken(const String16& interface);
