@@ -4,7 +4,6 @@
 #include <cstdio>
 #include <cstdlib>
 
-#include "common.h"
 #include "platform/events.h"
 #include "platform/files.h"
 

@@ -1,5 +1,5 @@
 // The simulated touch daemon: publishes its service on the vendor binder and answers commands.
-// Properties make it fail; see keys.h and faults.h.
+// Properties make it fail; see properties.h and faults.h.
 #include <android/log.h>
 #include <sys/system_properties.h>
 #include <unistd.h>
@@ -20,16 +20,15 @@
 #include <binder/ProcessState.h>
 
 #include "answers.h"
-#include "common.h"
 #include "faults.h"
 #include "platform/events.h"
 #include "platform/libbinder/vndbinder.h"
+#include "properties.h"
 
 namespace {
 
 using device::FaultKind;
 using device::GetProperty;
-using device::GetPropertyNumber;
 using std::chrono::milliseconds;
 
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
@@ -134,7 +133,7 @@ class DaemonService : public android::BBinder {
 }  // namespace
 
 int main() {
-    std::this_thread::sleep_for(milliseconds(GetPropertyNumber(device::kBootDelayKey)));
+    std::this_thread::sleep_for(milliseconds(device::GetPropertyNumber(device::kBootDelayKey)));
     while (GetProperty(device::kUpdatingFirmwareKey) == "true") {
         __system_property_set(device::kIsUpdatingFirmwareKey, "true");
         pause();

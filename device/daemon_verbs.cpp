@@ -6,8 +6,8 @@
 #include <string>
 
 #include "answers.h"
-#include "common.h"
 #include "faults.h"
+#include "messages.h"
 
 namespace device {
 

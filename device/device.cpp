@@ -9,13 +9,14 @@
 #include <vector>
 
 #include "answers.h"
-#include "common.h"
 #include "daemon_verbs.h"
 #include "life.h"
+#include "messages.h"
 #include "platform/device_root.h"
 #include "platform/events.h"
 #include "platform/files.h"
-#include "shell.h"
+#include "programs.h"
+#include "properties.h"
 
 namespace {
 
@@ -46,7 +47,7 @@ int Start(int argc, char** argv) {
         return FailForErrno("cannot set the SELinux mode");
     }
     if (device::FindInit().process == init) {
-        device::Inform("already running; SELinux is " + device::SelinuxMode());
+        device::PrintMessage("already running; SELinux is " + device::SelinuxMode());
     }
     return 0;
 }
@@ -93,16 +94,13 @@ int Root(int, char**) {
     return 0;
 }
 
-int Shell(int argc, char** argv) { return device::ExpectRunning() ? device::Shell(argc, argv) : 1; }
-
-int ExecSibling(const char* name, std::vector<const char*> arguments) {
-    arguments.insert(arguments.begin(), name);
-    return device::Exec(device::PathBesideProgram(name), std::move(arguments));
+int Shell(int argc, char** argv) {
+    return device::ExpectRunning() ? device::ExecShell(argc, argv) : 1;
 }
 
 int Run(int argc, char** argv) {
     const int status = device::BringUp("Permissive", device::Until::kBooted);
-    return status != 0 ? status : ExecSibling("bin/tpd", {argv, argv + argc});
+    return status != 0 ? status : device::ExecSibling("bin/tpd", {argv, argv + argc});
 }
 
 int Adb(int argc, char** argv) {
@@ -111,7 +109,7 @@ int Adb(int argc, char** argv) {
     }
     std::vector<const char*> arguments = {program_invocation_short_name};
     arguments.insert(arguments.end(), argv, argv + argc);
-    return ExecSibling("connect_adb", arguments);
+    return device::ExecSibling("connect_adb", arguments);
 }
 
 // The first arguments of trace.py are a file descriptor of the device root and this program's name.
@@ -123,7 +121,7 @@ int Trace(int argc, char** argv) {
     const std::string root = std::to_string(dup(host::DeviceRoot()));
     std::vector<const char*> arguments = {root.c_str(), program_invocation_short_name};
     arguments.insert(arguments.end(), argv, argv + argc);
-    return ExecSibling("trace.py", arguments);
+    return device::ExecSibling("trace.py", arguments);
 }
 
 int Fault(int argc, char** argv) {

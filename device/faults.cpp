@@ -9,10 +9,10 @@
 #include <iterator>
 #include <sstream>
 
-#include "common.h"
 #include "platform/events.h"
 #include "platform/files.h"
 #include "platform/unique_fd.h"
+#include "properties.h"
 
 namespace device {
 

@@ -21,14 +21,15 @@
 #include <string_view>
 #include <vector>
 
-#include "common.h"
 #include "life.h"
+#include "messages.h"
 #include "platform/device_root.h"
 #include "platform/events.h"
 #include "platform/files.h"
 #include "platform/libbinder/vndbinder.h"
 #include "platform/libc/properties.h"
 #include "platform/unique_fd.h"
+#include "properties.h"
 #include "service.h"
 
 namespace {

@@ -15,11 +15,12 @@
 #include <thread>
 #include <utility>
 
-#include "common.h"
+#include "messages.h"
 #include "platform/device_root.h"
 #include "platform/files.h"
 #include "platform/unique_fd.h"
-#include "shell.h"
+#include "programs.h"
+#include "properties.h"
 
 // The C library's header lacks extern "C".
 extern "C" {
@@ -171,7 +172,7 @@ int BringUp(const char* selinuxMode, Until until) {
                 }
                 break;
             case State::kOtherBuild:
-                Inform("the device runs another build; rebooting it");
+                PrintMessage("the device runs another build; rebooting it");
                 if (Stop() != 0) {
                     return kFailure;
                 }
@@ -183,7 +184,8 @@ int BringUp(const char* selinuxMode, Until until) {
                 const bool isBootCompleted = GetProperty(kBootCompletedKey) == "1";
                 const bool isUp = IsDaemonAlive() && (isBootCompleted || !isStartedHere);
                 if (isUp && isStartedHere) {
-                    Inform("started in " + host::DeviceRootPath() + ", SELinux is " + selinuxMode);
+                    PrintMessage("started in " + host::DeviceRootPath() + ", SELinux is " +
+                                 selinuxMode);
                 }
                 if (isUp || (until == Until::kBooted && !isStartedHere)) {
                     return 0;
@@ -209,7 +211,7 @@ int Reboot() {
     }
     const int status = BringUp("Enforcing", Until::kDaemonAlive);
     if (status == 0) {
-        Inform("rebooted; SELinux is Enforcing");
+        PrintMessage("rebooted; SELinux is Enforcing");
     }
     return status;
 }
@@ -221,7 +223,7 @@ int Stop() {
             return FailForUnknown(init);
         }
         if (init.state == State::kStopped) {
-            Inform("already stopped");
+            PrintMessage("already stopped");
             return 0;
         }
         // The process ID may have been reused before pidfd_open().
@@ -232,7 +234,7 @@ int Stop() {
         if (!Terminate(process)) {
             return Fail("process " + std::to_string(init.process) + " does not exit");
         }
-        Inform("stopped");
+        PrintMessage("stopped");
         return 0;
     }
 }

@@ -10,9 +10,10 @@
 #include <csignal>
 #include <cstdlib>
 
-#include "common.h"
 #include "platform/device_root.h"
 #include "platform/events.h"
+#include "programs.h"
+#include "properties.h"
 
 namespace device {
 

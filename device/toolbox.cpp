@@ -14,11 +14,13 @@
 #include <string>
 #include <vector>
 
-#include "common.h"
+#include "messages.h"
 #include "platform/device_root.h"
 #include "platform/events.h"
 #include "platform/files.h"
 #include "platform/libc/properties.h"
+#include "programs.h"
+#include "properties.h"
 
 namespace {
 
@@ -27,10 +29,9 @@ using device::kUsageError;  // makes main() print the usage
 
 // Returns the whole value; __system_property_get() truncates a long one.
 std::string WholeProperty(const std::string& name) {
-    const std::string value = device::GetProperty(name.c_str());
+    const std::string value = device::GetProperty(name);
     const bool isCut = value.length() == PROP_VALUE_MAX - 1;
-    return isCut ? host::ReadFile(std::string(host::kPropertiesDirectory) + "/" + name).value_or("")
-                 : value;
+    return isCut ? host::ReadFile(host::PropertyFile(name)).value_or("") : value;
 }
 
 int Getprop(int argc, char** argv) {
@@ -46,7 +47,7 @@ int Getprop(int argc, char** argv) {
     return 0;
 }
 
-int Setprop(int /* argc */, char** argv) {
+int Setprop(int, char** argv) {
     const char* const name = argv[1];
     const std::string value = argv[2];
     // Do not write an unchanged value: init acts on every write.
@@ -69,8 +70,7 @@ int ControlService(int argc, char** argv) {
         return verb == "stop" || __system_property_set(device::kBootCompletedKey, "1") == 0 ? 0 : 1;
     }
     const std::string service = argv[1];
-    const std::string state = device::GetProperty((device::kServiceStatePrefix + service).c_str());
-    if (state.empty()) {
+    if (device::GetProperty(device::kServiceStatePrefix + service).empty()) {
         return device::Fail("unknown service '" + service + "'");
     }
     const std::string request = device::kControlPrefix + verb;
@@ -79,12 +79,12 @@ int ControlService(int argc, char** argv) {
                    : FailForErrno("cannot ask init");
 }
 
-int Getenforce(int /* argc */, char** /* argv */) {
+int Getenforce(int, char**) {
     puts(device::SelinuxMode().c_str());
     return 0;
 }
 
-int Setenforce(int /* argc */, char** argv) {
+int Setenforce(int, char** argv) {
     const std::string mode = argv[1];
     const bool isPermissive = mode == "0" || strcasecmp(mode.c_str(), "permissive") == 0;
     const bool isEnforcing = mode == "1" || strcasecmp(mode.c_str(), "enforcing") == 0;
@@ -96,29 +96,23 @@ int Setenforce(int /* argc */, char** argv) {
                    : FailForErrno("cannot set the SELinux mode");
 }
 
-int ListSettings(const std::string& directory) {
-    for (const std::string& key : host::FilesIn(directory)) {
-        printf("%s=%s\n", key.c_str(), host::ReadFile(directory + key).value_or("null").c_str());
-    }
-    return 0;
-}
-
 int Settings(int argc, char** argv) {
     const std::string verb = argv[1];
     const std::string space = argv[2];
+    const std::string key = argc > 3 ? argv[3] : "";
     const std::string directory = "settings/" + space + "/";
-    if (space != "system" && space != "secure" && space != "global") {
+    const std::string path = directory + key;
+    const bool isSpace = space == "system" || space == "secure" || space == "global";
+    if (!isSpace || key[0] == '.' || key.find('/') != std::string::npos) {
         return kUsageError;
     }
     if (verb == "list" && argc == 3) {
-        return ListSettings(directory);
+        for (const std::string& name : host::FilesIn(directory)) {
+            const std::string value = host::ReadFile(directory + name).value_or("null");
+            printf("%s=%s\n", name.c_str(), value.c_str());
+        }
+        return 0;
     }
-    const std::string key = argc > 3 ? argv[3] : "";
-    const bool isFileName = !key.empty() && key[0] != '.' && key.find('/') == std::string::npos;
-    if (!isFileName) {
-        return kUsageError;
-    }
-    const std::string path = directory + key;
     if (verb == "get" && argc == 4) {
         puts(host::ReadFile(path).value_or("null").c_str());
         return 0;
@@ -133,20 +127,14 @@ int Settings(int argc, char** argv) {
     return kUsageError;
 }
 
-// Returns the log priority for the letter, or -1 if it is unknown.
-int PriorityOf(const std::string& letter) {
-    const size_t found = std::string("VDIWEFS").find(static_cast<char>(toupper(letter[0])));
-    const bool valid = letter.length() == 1 && found != std::string::npos;
-    return valid ? static_cast<int>(found) + ANDROID_LOG_VERBOSE : -1;
-}
-
 int Log(int argc, char** argv) {
-    int priority = ANDROID_LOG_INFO;
+    const std::string letters = "VDIWEFS";  // from ANDROID_LOG_VERBOSE on
+    size_t priority = letters.find('I');
     const char* tag = "log";
     for (int name = 0; (name = getopt(argc, argv, "+p:t:")) != -1;) {
         switch (name) {
             case 'p':
-                priority = PriorityOf(optarg);
+                priority = letters.find(static_cast<char>(toupper(optarg[0])));
                 break;
             case 't':
                 tag = optarg;
@@ -155,52 +143,39 @@ int Log(int argc, char** argv) {
                 return kUsageError;
         }
     }
-    if (priority < 0 || optind == argc) {
+    if (priority >= letters.length() || optind == argc) {
         return kUsageError;
     }
     const std::string text = device::Join(argc - optind, argv + optind);
-    const int result = host::WriteLog(priority, tag, text);
+    const int result = host::WriteLog(ANDROID_LOG_VERBOSE + static_cast<int>(priority), tag, text);
     return result >= 0 ? 0 : device::Fail(std::string("cannot log: ") + strerror(-result));
 }
 
 // The first argument of logcat.py is a file descriptor of the device root.
 int Logcat(int argc, char** argv) {
-    const std::string script = device::PathBesideProgram("logcat.py");
     const std::string root = std::to_string(dup(host::DeviceRoot()));
-    std::vector<const char*> arguments = {script.c_str(), root.c_str()};
-    arguments.insert(arguments.end(), argv + 1, argv + argc + 1);  // with the final null pointer
-    execv(script.c_str(), const_cast<char* const*>(arguments.data()));
-    return FailForErrno(script);
+    std::vector<const char*> arguments = {root.c_str()};
+    arguments.insert(arguments.end(), argv + 1, argv + argc);
+    return device::ExecSibling("logcat.py", arguments);
 }
 
 // The device's user is root, whoever runs the device.
 int Id(int argc, char** argv) {
-    bool isOneId = false;
-    bool isName = false;
-    for (int name = 0; (name = getopt(argc, argv, "Ggnru")) != -1;) {
-        if (name == '?') {
-            return kUsageError;
-        }
-        isOneId |= strchr("Ggu", name) != nullptr;
-        isName |= name == 'n';
-    }
-    if (optind < argc) {
+    const std::string options = argc > 1 ? device::Join(argc - 1, argv + 1) : "";
+    if (options.find_first_not_of("-Ggnru ") != std::string::npos) {
         return kUsageError;
     }
-    puts(!isOneId ? "uid=0(root) gid=0(root) groups=0(root)" : isName ? "root" : "0");
+    const bool isName = options.find('n') != std::string::npos;
+    puts(options.empty() ? "uid=0(root) gid=0(root) groups=0(root)" : isName ? "root" : "0");
     return 0;
 }
 
-int Whoami(int /* argc */, char** /* argv */) {
+int Whoami(int, char**) {
     puts("root");
     return 0;
 }
 
-int Reboot(int /* argc */, char** /* argv */) {
-    const std::string device = device::PathBesideProgram("device");
-    execl(device.c_str(), "device", "reboot", nullptr);
-    return FailForErrno(device);
-}
+int Reboot(int, char**) { return device::ExecSibling("device", {"reboot"}); }
 
 constexpr struct {
     const char* name;

@@ -1,5 +1,13 @@
-// The property keys shared by the programs of the device.
+// The device's state, as its programs share it: properties and the SELinux mode.
 #pragma once
+
+#include <sys/system_properties.h>
+
+#include <cstdint>
+#include <cstdlib>
+#include <string>
+
+#include "platform/files.h"
 
 namespace device {
 
@@ -26,5 +34,27 @@ constexpr char kDaemonStateKey[] = "init.svc.corvane_daemon";
 constexpr char kBootDelayKey[] = "sim.boot_delay_ms";
 constexpr char kUpdatingFirmwareKey[] = "sim.updating_fw";
 constexpr char kFaultKey[] = "sim.fault";
+
+// Returns the property's value, or an empty string if it is not set.
+inline std::string GetProperty(const std::string& key) {
+    char value[PROP_VALUE_MAX];
+    __system_property_get(key.c_str(), value);
+    return value;
+}
+
+// Returns the decimal number at the start of the property's value, or 0 if it has none.
+inline int64_t GetPropertyNumber(const char* key) {
+    return strtoll(GetProperty(key).c_str(), nullptr, 10);
+}
+
+// Returns true if the daemon reports that it is alive and has published its service.
+inline bool IsDaemonAlive() {
+    return GetProperty(kDaemonAliveKey) == "true" && GetProperty(kDaemonBinderKey) == "1";
+}
+
+// Returns what `getenforce` prints: Enforcing, Permissive or Disabled.
+inline std::string SelinuxMode() {
+    return host::ReadFile(host::kSelinuxFile).value_or("Enforcing");
+}
 
 }  // namespace device
