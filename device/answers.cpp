@@ -1,8 +1,6 @@
 #include "answers.h"
 
-#include <cctype>
-#include <cstdio>
-#include <cstdlib>
+#include <algorithm>
 
 #include "platform/events.h"
 #include "platform/files.h"
@@ -13,30 +11,14 @@ namespace {
 
 constexpr char kDirectory[] = "answers";
 
-// Returns the path of the command's answer. Bytes other than letters, digits and '_' are written as
-// %XX. CommandOf() is the inverse.
-std::string AnswerPath(const std::string& command) {
-    std::string path = std::string(kDirectory) + "/";
-    for (const char c : command) {
-        char escaped[4];
-        snprintf(escaped, sizeof(escaped), "%%%02X", static_cast<unsigned char>(c));
-        const bool isPlain = isalnum(static_cast<unsigned char>(c)) != 0 || c == '_';
-        path += isPlain ? std::string(1, c) : escaped;
-    }
-    return path;
+// A file name cannot contain a slash, and a command contains no newline.
+std::string WithReplaced(std::string text, char from, char to) {
+    std::replace(text.begin(), text.end(), from, to);
+    return text;
 }
 
-std::string CommandOf(const std::string& file) {
-    std::string command;
-    for (size_t i = 0; i < file.length(); ++i) {
-        if (file[i] == '%') {
-            command += static_cast<char>(strtol(file.substr(i + 1, 2).c_str(), nullptr, 16));
-            i += 2;
-        } else {
-            command += file[i];
-        }
-    }
-    return command;
+std::string AnswerPath(const std::string& command) {
+    return std::string(kDirectory) + "/" + WithReplaced(command, '/', '\n');
 }
 
 std::optional<std::string> ReadAnswer(const std::string& command) {
@@ -52,7 +34,7 @@ std::optional<std::string> ReadAnswer(const std::string& command) {
 std::set<std::string> RecordedCommands() {
     std::set<std::string> commands;
     for (const std::string& file : host::FilesIn(kDirectory)) {
-        commands.insert(CommandOf(file));
+        commands.insert(WithReplaced(file, '\n', '/'));
     }
     return commands;
 }

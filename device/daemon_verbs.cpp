@@ -8,20 +8,14 @@
 #include "answers.h"
 #include "faults.h"
 #include "messages.h"
+#include "platform/libbinder/vndbinder.h"
 
 namespace device {
 
 namespace {
 
 // The longest answer that, with its terminator, fits in a reply.
-constexpr size_t kMaxAnswerBytes = (1 << 20) - 2 * 4096 - 1;
-
-int ListAnswers() {
-    for (const std::string& command : RecordedCommands()) {
-        puts(command.c_str());
-    }
-    return 0;
-}
+constexpr size_t kMaxAnswerBytes = host::kMaxTransactionBytes - 1;
 
 int Record(const std::string& command, const std::string& answer) {
     if (answer.length() > kMaxAnswerBytes) {
@@ -31,11 +25,7 @@ int Record(const std::string& command, const std::string& answer) {
     if (answer.find('\0') != std::string::npos) {
         return Fail("answer: the text contains a NUL byte");
     }
-    if (RecordAnswer(command, answer)) {
-        return 0;
-    }
-    return errno == ENAMETOOLONG ? Fail("answer: the command is too long; see tpd-device(1)")
-                                 : FailForErrno("answer '" + command + "'");
+    return RecordAnswer(command, answer) ? 0 : FailForErrno("answer '" + command + "'");
 }
 
 // Records standard input without its final newline, because the tool appends one to an answer.
@@ -54,21 +44,11 @@ int RecordInput(const std::string& command) {
     return Record(command, text);
 }
 
-int Remove(const std::string& command) {
-    if (RemoveAnswer(command)) {
-        return 0;
-    }
-    return errno == ENOENT ? Fail("no recorded answer for '" + command + "'; " + Command("answer") +
-                                  " lists them")
-                           : FailForErrno("answer '" + command + "'");
-}
-
 int ListFaults() {
     for (const FaultType& type : kFaultTypes) {
         printf("%-16s the daemon %s", type.name, type.effect);
-        if (type.argument.name != nullptr) {
-            printf("; %s: %jd to %jd", type.argument.name, intmax_t{type.argument.min},
-                   intmax_t{type.argument.max});
+        if (type.argument != nullptr) {
+            printf("; %s: %jd to %jd", type.argument, intmax_t{type.min}, intmax_t{type.max});
         }
         puts("");
     }
@@ -79,21 +59,20 @@ int ListFaults() {
 
 int ManageAnswers(int argc, char** argv) {
     if (argc == 0) {
-        return ListAnswers();
+        for (const std::string& command : RecordedCommands()) {
+            puts(command.c_str());
+        }
+        return 0;
     }
     const std::string command = argv[0];
-    if (argc == 1) {
-        return Fail("answer: missing argument after '" + command + "'", kUsageError);
-    }
-    if (argc > 2) {
-        return Fail("answer: unexpected argument '" + std::string(argv[2]) +
-                            "'; quote the command and its parameters",
+    if (argc != 2) {
+        return Fail("answer: expected two arguments; quote the command with its parameters",
                     kUsageError);
     }
     if (command == "--remove") {
-        return Remove(argv[1]);
+        return RemoveAnswer(argv[1]) ? 0 : FailForErrno(std::string("answer '") + argv[1] + "'");
     }
-    if (command.empty() || command.front() == '-') {
+    if (command.empty() || command[0] == '-' || command.find('\n') != std::string::npos) {
         return Fail("answer: invalid command '" + command + "'", kUsageError);
     }
     return strcmp(argv[1], "-") == 0 ? RecordInput(command) : Record(command, argv[1]);
@@ -104,9 +83,8 @@ int ManageFaults(int argc, char** argv) {
         return ListFaults();
     }
     const std::string text = Join(argc, argv);
-    Fault fault;
-    if (const std::string error = ParseFault(text, fault); !error.empty()) {
-        return Fail(error + "; see " + Command("fault"), kUsageError);
+    if (!ParseFault(text).has_value()) {
+        return Fail("fault: invalid fault '" + text + "'; see " + Command("fault"), kUsageError);
     }
     return SetFault(text) ? 0 : FailForErrno("cannot set the fault");
 }

@@ -5,7 +5,6 @@
 #include <sys/system_properties.h>
 
 #include <algorithm>
-#include <cstdlib>
 #include <iterator>
 #include <sstream>
 
@@ -18,76 +17,52 @@ namespace device {
 
 namespace {
 
-constexpr Range kCount = {"COUNT", 1, INT32_MAX};
-
-// Stores the value of `word` in `number`. Returns an empty string, or an error message if the word
-// is invalid.
-std::string ParseNumber(const std::string& word, const Range& range, int64_t& number) {
-    char* end = nullptr;
-    number = strtoll(word.c_str(), &end, 10);
-    if (!word.empty() && *end == '\0' && number >= range.min && number <= range.max) {
-        return "";
-    }
-    const std::string name = range.name;
-    return (word.empty() ? "missing " + name : "invalid " + name + " '" + word + "'") + "; use " +
-           std::to_string(range.min) + " to " + std::to_string(range.max);
+bool ReadNumber(std::istream& words, int64_t min, int64_t max, int64_t& number) {
+    return words >> number && number >= min && number <= max;
 }
 
 // Locks the properties directory, so that only one process or thread at a time changes the fault.
 // Closing the descriptor releases the lock.
 host::UniqueFd LockFault() {
     host::UniqueFd lock = host::OpenFile(host::kPropertiesDirectory, O_RDONLY);
-    if (lock.ok() && flock(lock.get(), LOCK_EX) != 0) {
-        lock.reset();
-    }
+    flock(lock.get(), LOCK_EX);
     return lock;
 }
 
 }  // namespace
 
-std::string ParseFault(const std::string& text, Fault& fault) {
+std::optional<Fault> ParseFault(const std::string& text) {
     std::istringstream words(text);
-    const auto nextWord = [&words] {
-        std::string word;
-        words >> word;
-        return word;
-    };
-    const std::string name = nextWord();
+    std::string name;
+    words >> name;
     const auto* const type =
             std::find_if(std::begin(kFaultTypes), std::end(kFaultTypes),
                          [&name](const FaultType& known) { return name == known.name; });
     if (type == std::end(kFaultTypes)) {
-        return "unknown fault '" + name + "'";
+        return std::nullopt;
     }
-    fault.kind = type->kind;
-    std::string error;
-    std::string word = nextWord();
-    if (type->argument.name != nullptr) {
-        error = ParseNumber(word, type->argument, fault.argument);
-        word = nextWord();
+    Fault fault = {type->kind};
+    const bool hasArgument = type->argument != nullptr;
+    if (hasArgument && !ReadNumber(words, type->min, type->max, fault.argument)) {
+        return std::nullopt;
     }
-    if (error.empty() && !word.empty() && type->kind != FaultKind::kNone) {
-        error = ParseNumber(word, kCount, fault.count);
-        word = nextWord();
+    if (!(words >> std::ws).eof() && !ReadNumber(words, 1, INT32_MAX, fault.count)) {
+        return std::nullopt;
     }
-    if (error.empty() && !word.empty()) {
-        error = "unexpected argument '" + word + "'";
-    }
-    return error.empty() ? "" : "fault " + name + ": " + error;
+    return (words >> std::ws).eof() ? std::optional(fault) : std::nullopt;
 }
 
 bool SetFault(const std::string& text) {
     const host::UniqueFd lock = LockFault();
-    return lock.ok() && __system_property_set(kFaultKey, text.c_str()) == 0;
+    return __system_property_set(kFaultKey, text.c_str()) == 0;
 }
 
 Fault TakeFault() {
     const host::UniqueFd lock = LockFault();
     const std::string text = GetProperty(kFaultKey);
-    Fault fault;
-    const bool isValid = lock.ok() && ParseFault(text, fault).empty();
-    if (!isValid || fault.kind == FaultKind::kNone) {
-        return {};
+    const Fault fault = ParseFault(text).value_or(Fault());
+    if (fault.kind == FaultKind::kNone) {
+        return fault;
     }
     if (fault.count > 0) {
         const std::string left = std::to_string(fault.count - 1);

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 #include <string>
 
 namespace device {
@@ -18,26 +19,22 @@ enum class FaultKind {
     kHuge,
 };
 
-struct Range {
-    const char* name;  // null if there is no number
-    int64_t min;
-    int64_t max;
-};
-
 constexpr struct FaultType {
     FaultKind kind;
     const char* name;
-    const char* effect;  // what the daemon does
-    Range argument = {nullptr, 0, 0};
+    const char* effect;              // what the daemon does
+    const char* argument = nullptr;  // its name, or null if there is none
+    int64_t min = 0;
+    int64_t max = 0;
 } kFaultTypes[] = {
         {FaultKind::kNone, "none", "works normally"},
         {FaultKind::kDieBefore, "die_before", "dies before it processes the command"},
         {FaultKind::kDieDuring, "die_during", "processes the command, then dies before it replies"},
         {FaultKind::kDieAfter, "die_after", "replies, then dies"},
-        {FaultKind::kHang, "hang", "replies late", {"MILLISECONDS", 0, 1'000'000'000}},
-        {FaultKind::kStatus, "status", "replies with a status", {"STATUS", INT32_MIN, INT32_MAX}},
+        {FaultKind::kHang, "hang", "replies late", "MILLISECONDS", 0, 1'000'000'000},
+        {FaultKind::kStatus, "status", "replies with a status", "STATUS", INT32_MIN, INT32_MAX},
         {FaultKind::kNoText, "no_text", "replies without a text"},
-        {FaultKind::kHuge, "huge", "replies with a long text", {"BYTES", 0, 64 << 20}},
+        {FaultKind::kHuge, "huge", "replies with a long text", "BYTES", 0, 64 << 20},
 };
 
 struct Fault {
@@ -46,9 +43,8 @@ struct Fault {
     int64_t count = 0;     // number of calls that the fault affects, 0 for all
 };
 
-// Parses NAME [ARGUMENT] [COUNT]. Returns an empty string, or an error message that names the
-// invalid word.
-std::string ParseFault(const std::string& text, Fault& fault);
+// Parses NAME [ARGUMENT] [COUNT]. Returns nullopt if it is invalid.
+std::optional<Fault> ParseFault(const std::string& text);
 
 // Sets the fault, given in valid form. Returns false and sets errno on failure.
 bool SetFault(const std::string& text);
