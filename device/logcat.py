@@ -14,7 +14,6 @@ import time
 
 from events import LETTERS, EventReader
 
-BUFFERS = {"all", "crash", "default", "events", "kernel", "main", "radio", "system"}
 LEVELS = {letter: priority for priority, letter in LETTERS.items()} | {"S": 99}
 # With -B: the size of what follows, the header's size, process, thread, time, buffer and user.
 BINARY_HEADER = struct.Struct("<HHiIIIII")
@@ -30,22 +29,10 @@ FORMATS = {
 FOLLOW_PAUSE_MS = 50
 
 
-def buffers(names):
-    """Rejects an unknown buffer name; all buffers share one log, so the names have no effect"""
-    if not BUFFERS.issuperset(names.split(",")):
-        raise ValueError
-
-
-def positive(text):
-    if not 1 <= int(text) <= sys.maxsize:
-        raise ValueError
-    return int(text)
-
-
 def start(text):
     """Returns the number of entries or None, and the time of the first one in seconds or 0"""
     if text.isdecimal():
-        return positive(text), 0
+        return min(int(text), sys.maxsize), 0
     if re.fullmatch(r"\d+\.\d+", text):
         return None, float(text)
     date = text if text.count("-") == 2 else f"{time.localtime().tm_year}-{text}"
@@ -71,12 +58,11 @@ def parse(arguments):
     description = "Prints the log. TIME is [YYYY-]MM-DD hh:mm:ss.mmm or sssss.mmm (in seconds)."
     parser = argparse.ArgumentParser(prog="logcat", description=description)
     parser.add_argument("-B", dest="binary", action="store_true", help="print binary entries")
-    parser.add_argument("-b", type=buffers, metavar="BUFFER,...", help="ignored: there is one log")
+    parser.add_argument("-b", metavar="BUFFER,...", help="ignored: there is one log")
     parser.add_argument("-c", dest="clear", action="store_true", help="clear the log")
     parser.add_argument("-d", dest="dump", action="store_true", help="print the log and exit")
     parser.add_argument("-e", "--regex", type=pattern, help="show only matching texts")
-    parser.add_argument("-f", dest="file", help="append the output to a file")
-    parser.add_argument("--pid", type=positive, help="show only entries of this process")
+    parser.add_argument("--pid", type=int, help="show only entries of this process")
     parser.add_argument("-s", dest="silent", action="store_true", help="same as the filter *:S")
     parser.add_argument("-T", type=start, metavar="COUNT|TIME", help="same as -t, then follow")
     parser.add_argument("-t", type=start, metavar="COUNT|TIME", help="show only the last entries")
@@ -138,15 +124,13 @@ def main():
     if options.clear:
         os.truncate(log, 0)
         return
-    if options.file:
-        sys.stdout = open(options.file.encode("latin-1"), "a")
     sys.stdout.reconfigure(encoding="latin-1")
     closed = select.poll()  # ready when the reader closes the pipe
     closed.register(sys.stdout, 0)
     reader, count = EventReader(log), options.count
     while True:
         entries = (entry for entry in reader.read_new() if is_shown(entry, options))
-        if count:
+        if count is not None:
             entries, count = collections.deque(entries, maxlen=count), None
         for entry in entries:
             sys.stdout.write(formatted(entry, options))

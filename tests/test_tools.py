@@ -109,7 +109,7 @@ USAGE_ERRORS = {
     "device fault hangg": "invalid fault 'hangg'",
     "device fault no_text 0": "invalid fault 'no_text 0'",
     "log -p q text": "usage: log",
-    "logcat -d -b none": "'none'",
+    "logcat -d -v none": "'none'",
     "setprop .a 1": "The name is illegal",
 }
 
@@ -154,7 +154,7 @@ def test_shell_sees_only_processes_of_its_device(device):
     assert device.shell("pgrep '^(corvane|python)'") == f"{daemon}\n"
     assert "python" not in device.shell("ps -ef")
     columns = "USER PID PPID VSZ RSS WCHAN ADDR S NAME"
-    assert device.shell("ps --help && ps").splitlines()[1].split() == columns.split()
+    assert device.shell("ps --help >/dev/null && ps").splitlines()[0].split() == columns.split()
     device.shell("pkill -9 corvane_daemon")
     wait_until(lambda: device.restarts() == 1)
 
