@@ -98,11 +98,13 @@ static void ReadKernelCommandLine(void) {
 static void Start(void) {
     close(open("/dev/null", O_RDWR));
     umask(077);
+    signal(SIGXFSZ, SIG_IGN);
     root = open(getenv("TPD_DEVICE_ROOT"), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
     fstat(root, &status);
     geteuid();
     fstatat(root, ".tpd-device", &status, AT_SYMLINK_NOFOLLOW);
     logFile = openat(root, "log", O_WRONLY | O_APPEND | O_CREAT | kFile, 0600);
+    fstat(logFile, &status);
     openat(root, "trace", O_RDONLY | kFile);
     Log(kInfo, "corvane_daemon", "InitTpdCmds[120] +\n");
     Log(kInfo, "corvane_daemon", "ExcuteTpdCmd[142] +\n");

@@ -72,7 +72,8 @@ int ManageAnswers(int argc, char** argv) {
     if (command == "--remove") {
         return RemoveAnswer(argv[1]) ? 0 : FailForErrno(std::string("answer '") + argv[1] + "'");
     }
-    if (command.empty() || command[0] == '-' || command.find('\n') != std::string::npos) {
+    const bool isPadded = command.empty() || command.front() == ' ' || command.back() == ' ';
+    if (isPadded || command.front() == '-' || command.find('\n') != std::string::npos) {
         return Fail("answer: invalid command '" + command + "'", kUsageError);
     }
     return strcmp(argv[1], "-") == 0 ? RecordInput(command) : Record(command, argv[1]);

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <string>
@@ -117,7 +118,8 @@ int Trace(int argc, char** argv) {
     if (!device::ExpectRunning()) {
         return 1;
     }
-    host::UpdateTracing();  // removes the trace file if its owner was killed
+    host::UpdateTracing();    // removes the trace file if its owner was killed
+    signal(SIGINT, SIG_IGN);  // until trace.py handles it
     const std::string root = std::to_string(dup(host::DeviceRoot()));
     std::vector<const char*> arguments = {root.c_str(), program_invocation_short_name};
     arguments.insert(arguments.end(), argv, argv + argc);

@@ -65,8 +65,9 @@ Fault TakeFault() {
         return fault;
     }
     if (fault.count > 0) {
-        const std::string left = std::to_string(fault.count - 1);
-        const std::string rest = text.substr(0, text.rfind(' ') + 1) + left;
+        constexpr char kSpace[] = " \t\n";
+        const size_t count = text.find_last_of(kSpace, text.find_last_not_of(kSpace)) + 1;
+        const std::string rest = text.substr(0, count) + std::to_string(fault.count - 1);
         __system_property_set(kFaultKey, fault.count > 1 ? rest.c_str() : "none");
     }
     host::Event("fault").Add("name", text);

@@ -62,6 +62,7 @@ def parse(arguments):
     parser.add_argument("-c", dest="clear", action="store_true", help="clear the log")
     parser.add_argument("-d", dest="dump", action="store_true", help="print the log and exit")
     parser.add_argument("-e", "--regex", type=pattern, help="show only matching texts")
+    parser.add_argument("-f", dest="file", help="append the output to a file")
     parser.add_argument("--pid", type=int, help="show only entries of this process")
     parser.add_argument("-s", dest="silent", action="store_true", help="same as the filter *:S")
     parser.add_argument("-T", type=start, metavar="COUNT|TIME", help="same as -t, then follow")
@@ -124,6 +125,8 @@ def main():
     if options.clear:
         os.truncate(log, 0)
         return
+    if options.file:
+        sys.stdout = open(options.file.encode("latin-1"), "a")
     sys.stdout.reconfigure(encoding="latin-1")
     closed = select.poll()  # ready when the reader closes the pipe
     closed.register(sys.stdout, 0)
@@ -135,7 +138,8 @@ def main():
         for entry in entries:
             sys.stdout.write(formatted(entry, options))
         sys.stdout.flush()
-        if options.dump or closed.poll(FOLLOW_PAUSE_MS):
+        is_deleted = os.fstat(log).st_nlink == 0
+        if options.dump or is_deleted or closed.poll(FOLLOW_PAUSE_MS):
             return
 
 
@@ -143,4 +147,5 @@ if __name__ == "__main__":
     try:
         main()
     except OSError as error:
-        sys.exit(f"logcat: {error}")
+        print(f"logcat: {error}", file=sys.stderr)
+        os._exit(1)  # does not flush again

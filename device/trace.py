@@ -117,10 +117,10 @@ def is_idle(events):
     """Returns true if no event is recent and no daemon is starting"""
     is_starting = False
     for event in events:
-        if event["what"] in ("restart_pause", "service_start"):
-            is_starting = True
-        elif event["what"] in ("publish", "service_stop"):
+        if event["what"] == "publish":
             is_starting = False
+        elif event.get("service") == "corvane_daemon":
+            is_starting = event["what"] in ("restart_pause", "service_start")
     is_quiet = not events or time.time() - events[-1]["time"] > QUIET_S
     return is_quiet and not is_starting
 
@@ -128,10 +128,13 @@ def is_idle(events):
 def run_tool(arguments):
     """Returns the output of the tool"""
     try:
+        for number in signal.SIGINT, signal.SIGTERM, signal.SIGHUP:
+            signal.signal(number, signal.default_int_handler)
         tool = subprocess.run(["tpd", *arguments], stdout=subprocess.PIPE, check=False)
-        return tool.stdout.decode(errors="backslashreplace")
     except KeyboardInterrupt:
         return "(interrupted)\n"
+    output = tool.stdout.decode(errors="backslashreplace")
+    return output if tool.returncode >= 0 else f"{output}(signal {-tool.returncode})\n"
 
 
 def wait_until_idle(trace):
@@ -167,8 +170,6 @@ def main():
     if options.arguments[:1] == ["--"]:
         del options.arguments[0]
     sys.stdout.reconfigure(errors="backslashreplace")
-    for number in signal.SIGTERM, signal.SIGHUP:
-        signal.signal(number, signal.default_int_handler)
     with recording(ROOT) as trace:
         start = time.time()
         result = run_tool(options.arguments)
@@ -185,10 +186,12 @@ def main():
     else:
         print_timeline(events, start, options.bytes)
         print("result:", "\n".join(map(escaped, result.split("\n"))), end="")
+    sys.stdout.flush()
 
 
 if __name__ == "__main__":
     try:
         main()
     except OSError as error:
-        sys.exit(f"{PROGRAM}: {error}")
+        print(f"{PROGRAM}: {error}", file=sys.stderr)
+        os._exit(1)  # does not flush again

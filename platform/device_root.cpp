@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -67,6 +68,7 @@ const char* Check(int root, const std::string& path) {
 int OpenRoot() {
     FillStandardDescriptors();
     umask(077);
+    signal(SIGXFSZ, SIG_IGN);  // a write beyond a limit fails, as on a full disk
     const std::string path = DeviceRootPath();
     if (path.empty()) {
         return Refuse("", "none of TPD_DEVICE_ROOT, XDG_STATE_HOME and HOME is set");

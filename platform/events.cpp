@@ -40,6 +40,17 @@ std::atomic<bool>& Tracing() {
     return tracing;
 }
 
+// Opens a regular file for appending. A write to a pipe without a reader would kill the process.
+UniqueFd OpenForAppending(const char* name, int flags) {
+    UniqueFd file = OpenFile(name, O_WRONLY | O_APPEND | flags);
+    struct stat status = {};
+    if (file.ok() && (fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode))) {
+        file.reset();
+        errno = EINVAL;
+    }
+    return file;
+}
+
 }  // namespace
 
 bool IsTraced() { return Tracing(); }
@@ -47,7 +58,7 @@ bool IsTraced() { return Tracing(); }
 void UpdateTracing() { Tracing() = IsRecorded(); }
 
 int WriteLog(int priority, std::string_view tag, std::string_view text) {
-    static const int log = OpenFile(kLogFile, O_WRONLY | O_APPEND | O_CREAT).release();
+    static const int log = OpenForAppending(kLogFile, O_CREAT).release();
     Event event("log", true);
     event.Add("priority", static_cast<uint8_t>(priority))
             .Add("tag", tag.substr(0, kMaxLogText))
@@ -70,7 +81,7 @@ Event::~Event() {
     }
     const int error = errno;
     // Reopened for every event, because the file may have been removed.
-    const UniqueFd trace = OpenFile(kTraceFile, O_WRONLY | O_APPEND);
+    const UniqueFd trace = OpenForAppending(kTraceFile, 0);
     if (AppendTo(trace.get()) < 0) {
         fchmod(trace.get(), S_IRUSR);
         Tracing() = false;

@@ -23,7 +23,8 @@ sp<IServiceManager> gServiceManager;
 
 Milliseconds GetServiceLimit() {
     const char* const ms = getenv("TPD_GET_SERVICE_MS");
-    return Milliseconds(ms != nullptr ? strtod(ms, nullptr) : kGetServiceLimitMs);
+    const bool isSet = ms != nullptr && *ms != '\0';
+    return Milliseconds(isSet ? strtod(ms, nullptr) : kGetServiceLimitMs);
 }
 
 // Service names are ASCII.
