@@ -38,9 +38,18 @@ def test_every_fault_has_a_row(stopped_device):
 
 
 def test_oversized_reply_fails_the_call_but_keeps_the_connection(device):
-    device.fault("huge 1040384 1")
-    assert device.tpd("captest") == PASS
+    device.fault("huge 1040384 2")
+    assert device.tpd("captest") == TIMEOUT
     assert device.events("binder_died") == []
+    assert device.tpd("captest") == PASS
+
+
+def test_delays_are_in_milliseconds(device):
+    device.shell("setprop sim.boot_delay_ms 300; setprop sim.fault 'hang 300'; tpd reboot")
+    device.tpd("captest")
+    for begin, end in ("service_start", "publish"), ("fault", "answer"):
+        delay = device.events(end)[-1]["time"] - device.events(begin)[-1]["time"]
+        assert 0.3 <= delay < 30
 
 
 def test_daemon_refuses_requests_to_another_interface(device):
@@ -74,3 +83,5 @@ def test_sends_the_command_even_if_output_fails(device, redirection):
     script = f'exec {redirection}; "$@"'
     device.output("bash", "-c", script, "bash", *device.tool, "captest")
     assert len(device.events("command")) == 1
+    files = [path.read_bytes() for path in device.root.rglob("*") if path.is_file()]
+    assert PASS.strip().encode() not in b"\n".join(files).splitlines()

@@ -2,45 +2,41 @@
 import concurrent.futures
 import os
 import shutil
+import signal
 import subprocess
 import time
 
 import pytest
 
-from virtual_device import PASS, PERMISSIVE, Device, wait_until
+from virtual_device import PASS, SERVICE, Device, wait_until
 
 
-@pytest.fixture
-def device(stopped_device):
-    """A stopped device; these tests start it themselves."""
-    return stopped_device
-
-
-def in_parallel(device, commands):
-    """Runs `device COMMAND` for all commands concurrently."""
-    runs = [["device", *command.split()] for command in commands]
-    with concurrent.futures.ThreadPoolExecutor(len(runs)) as pool:
-        return list(pool.map(lambda run: device.run(*run), runs))
+def run_at_once(device, verbs):
+    """Runs `device VERB` for all verbs concurrently. Returns pairs of verb and exit status."""
+    with concurrent.futures.ThreadPoolExecutor(len(verbs)) as pool:
+        runs = pool.map(lambda verb: device.run("device", verb), verbs)
+        return {(verb, run.returncode) for verb, run in zip(verbs, runs)}
 
 
 @pytest.mark.parametrize("repeats", [3, pytest.param(100, marks=pytest.mark.soak)])
-def test_concurrent_commands_leave_at_most_one_init(device, chance, repeats):
+def test_concurrent_commands_succeed_and_leave_at_most_one_init(stopped_device, chance, repeats):
+    assert run_at_once(stopped_device, ["start"] * 8) == {("start", 0)}
+    expected = {("start", 0), ("stop", 0), ("status", 0), ("status", 3)}
     for _ in range(repeats):
-        in_parallel(device, chance.choices(["start", "stop", "status"], k=20))
-        assert len(device.processes("/init")) <= 1
-    device.start()
-    assert device.is_up()
+        verbs = chance.choices(["start", "stop", "status"], k=20)
+        assert run_at_once(stopped_device, verbs) - expected == set()
+        assert len(stopped_device.processes("/init")) <= 1
+    stopped_device.start()
+    assert stopped_device.is_up()
 
 
-def test_restarts_the_daemon_when_the_caller_ignored_sigchld(device):
-    device.output("env", "--ignore-signal=CHLD", "device", "start")
-    device.kill("corvane_daemon")
-    wait_until(lambda: device.restarts() == 1 and device.is_up())
+def test_restarts_the_daemon_when_the_caller_ignored_sigchld(stopped_device):
+    stopped_device.output("env", "--ignore-signal=CHLD", "device", "start")
+    stopped_device.kill("corvane_daemon")
+    wait_until(lambda: stopped_device.restarts() == 1 and stopped_device.is_up())
 
 
 def test_waits_longer_before_each_restart_of_a_daemon_that_cannot_start(device):
-    device.start_tracing()
-    device.start()
     (device.root / "dev").rename(device.root / "away")
     (device.root / "dev").write_text("not a directory")
     device.kill("corvane_daemon")
@@ -50,42 +46,36 @@ def test_waits_longer_before_each_restart_of_a_daemon_that_cannot_start(device):
     assert len(device.events("log", who="init")) == 1
 
 
-def test_init_is_detached_from_its_caller(device, tmp_path):
+def test_init_is_detached_from_its_caller(stopped_device, tmp_path):
     with open(tmp_path / "file", "w") as file:
-        device.start(cwd=tmp_path, pass_fds=[file.fileno()])
-    (init,) = device.processes("/init")
-    kept = device.output("ls", "-l", f"/proc/{init}", f"/proc/{init}/fd")
+        stopped_device.start(cwd=tmp_path, pass_fds=[file.fileno()])
+    (init,) = stopped_device.processes("/init")
+    kept = stopped_device.output("ls", "-l", f"/proc/{init}", f"/proc/{init}/fd")
     assert str(tmp_path) not in kept
     assert os.getsid(init) == init
 
 
-def test_boots_after_an_unclean_stop(device):
-    device.start()
-    device.kill("/init")
+def test_boot_after_a_stuck_init_keeps_only_what_a_phone_keeps(device):
+    device.shell("setprop persist.a 1; setprop b 1; settings put system c 1; setenforce 0; log d")
+    device.kill("/init", signal.SIGSTOP)
+    device.output("device", "stop")
     wait_until(lambda: not device.processes())
     (device.root / "tmp/left").write_text("")
+    (device.root / SERVICE).with_name("left").write_text("")
     device.start()
-    assert os.listdir(device.root / "tmp") == []
+    kept = device.shell("getprop persist.a; getprop b; settings get system c; getenforce")
+    assert kept == "1\n\n1\nEnforcing\n"
+    assert os.listdir(device.root / "tmp") == device.shell("logcat -d -s log").split() == []
+    assert os.listdir((device.root / SERVICE).parent) == [os.path.basename(SERVICE)]
 
 
-def test_files_are_private_under_any_umask(device):
-    device.output("sh", "-c", "umask 0777; exec device start")
-    device.output("device", "reboot")
-    assert (device.root / "properties").stat().st_mode & 0o777 == 0o700
-
-
-def test_reboot_keeps_persistent_properties_only(device):
-    device.start()
-    device.setprop("persist.a", "1")
-    device.setprop("b", "1")
-    device.output("setenforce", "0")
-    device.shell("reboot")
-    assert (device.getprop("persist.a"), device.getprop("b")) == ("1", "")
-    assert device.output("getenforce") == "Enforcing\n"
+def test_files_are_private_under_any_umask(stopped_device):
+    stopped_device.output("sh", "-c", "umask 0777; exec device start")
+    stopped_device.shell("reboot")
+    assert (stopped_device.root / "properties").stat().st_mode & 0o777 == 0o700
 
 
 def test_device_keeps_running_when_its_root_is_renamed(device, build, tmp_path):
-    device.start()
     moved = Device(tmp_path, build, device.tool)
     device.root.rename(moved.root)
     letter = device.root / "dev/vndbinder/letter"
@@ -93,7 +83,6 @@ def test_device_keeps_running_when_its_root_is_renamed(device, build, tmp_path):
     letter.write_text("Dear")
     moved.kill("corvane_daemon")
     wait_until(lambda: moved.restarts() == 1 and moved.is_up())
-    moved.setprop(PERMISSIVE, "true")
     assert moved.tpd("captest") == PASS
     moved.output("device", "stop")
     assert letter.read_text() == "Dear"
@@ -111,21 +100,14 @@ def test_starts_beside_a_killed_command(device, chance, repeats, verb):
         assert device.run("device", "status").returncode == 0
 
 
-def test_init_exits_when_its_device_is_removed(device):
-    device.start()
-    (device.root / ".tpd-device").rename(device.root / "away")
+@pytest.mark.parametrize("removed", [".tpd-device", "properties"])
+def test_init_exits_when_its_device_is_removed(device, removed):
+    (device.root / removed).rename(device.root / "away")
     wait_until(lambda: not device.processes())
-    (device.root / "away").rename(device.root / ".tpd-device")
-
-
-def test_start_applies_the_permissive_mode_to_a_running_device(device):
-    device.start()
-    device.output("device", "start", "--permissive")
-    assert device.output("getenforce") == "Permissive\n"
+    (device.root / "away").rename(device.root / removed)
 
 
 def test_services_are_controlled_by_name(device):
-    device.start()
     device.shell("stop corvane_daemon")
     wait_until(lambda: device.getprop("init.svc.corvane_daemon") == "stopped")
     assert device.processes("corvane_daemon") == []
@@ -139,19 +121,24 @@ def test_services_are_controlled_by_name(device):
     assert device.restarts() == 0
 
 
-def test_reports_a_stopped_device(device):
-    device.output("device", "root")
-    assert "device is stopped" in device.run("device", "shell", "true").stderr
-    assert device.run("device", "status").returncode == 3
-    device.start()
-    assert device.run("device", "status").returncode == 0
+def test_reports_a_stopped_device(stopped_device):
+    stopped_device.output("device", "root")
+    assert "device is stopped" in stopped_device.run("device", "shell", "true").stderr
+    assert stopped_device.run("device", "status").returncode == 3
+    stopped_device.start()
+    assert stopped_device.run("device", "status").returncode == 0
 
 
-def test_restarts_a_device_of_another_build(device, build, tmp_path):
+def test_start_applies_the_permissive_mode_to_a_running_device(device):
+    device.output("device", "start", "--permissive")
+    assert device.output("getenforce") == "Permissive\n"
+
+
+def test_restarts_a_device_of_another_build(stopped_device, build, tmp_path):
     shutil.copytree(build / "device", tmp_path / "device", symlinks=True)
-    device.output(tmp_path / "device/device", "start")
-    (old,) = device.processes("/init")
-    device.start()
-    (new,) = device.processes("/init")
+    stopped_device.output(tmp_path / "device/device", "start")
+    (old,) = stopped_device.processes("/init")
+    stopped_device.start()
+    (new,) = stopped_device.processes("/init")
     assert new != old
-    assert device.is_up()
+    assert stopped_device.is_up()

@@ -6,7 +6,7 @@ import subprocess
 
 import pytest
 
-from virtual_device import SOURCE, free_port, wait_until
+from virtual_device import NO_SERVICE, PASS, RESTART, SOURCE, free_port, wait_until
 
 COMPLETIONS = {
     "bash": """
@@ -71,8 +71,9 @@ def complete(request, installed, installed_device):
 
 
 def test_completes_the_commands_in_the_help(device, complete):
-    commands = re.findall(r"^\w+$", device.tpd("help"), re.M)
-    assert sorted(complete("tpd", "")) == sorted(commands)
+    commands = set(re.findall(r"^\w+$", device.tpd("help"), re.M))
+    assert set(complete("tpd", "")) == commands
+    assert set(complete("tpd", "TSA_ExecuteCommand", "")) < commands
 
 
 def test_completes_parameters(complete):
@@ -80,14 +81,15 @@ def test_completes_parameters(complete):
     assert complete("tpd", "captest", "") == modes
     assert complete("tpd-device", "run", "TSA_ExecuteCommand", "captest", "") == modes
     assert complete("tpd-device", "trace", "--bytes", "captest", "") == modes
-    assert "THP_SetAccData" in complete("tpd", "TSA_ExecuteCommand", "")
     assert complete("tpd", "stop", "") == []
 
 
-def test_completes_tpd_device(complete):
-    assert {"start", "trace", "answer"}.issubset(complete("tpd-device", ""))
+def test_completes_tpd_device(device, complete):
+    verbs = re.findall(r"^ +device (\w+)", device.output("device", "--help"), re.M)
+    assert set(complete("tpd-device", "")) == set(verbs)
     assert complete("tpd-device", "start", "") == ["--permissive"]
-    assert "die_during" in complete("tpd-device", "fault", "")
+    faults = re.findall(r"^\w+", device.output("device", "fault"), re.M)
+    assert set(complete("tpd-device", "fault", "")) == set(faults)
 
 
 INTERACTIVE = {
@@ -129,24 +131,24 @@ def described(page, section):
     assert (shown.returncode, shown.stderr) == (0, "")
     pattern = rf"^{section}\n.*?\n\n(.*?)^[A-Z]"
     entries = re.search(pattern, shown.stdout, re.M | re.S)[1]
-    return re.findall(r"^ {7}(\w+)", entries, re.M)
+    return set(re.findall(r"^ {7}(\w+)", entries, re.M))
 
 
 def test_manual_describes_the_local_commands(device, build):
     listed = device.tpd("help").split("//aaa special gTpdCmds\n")[1].split()
-    assert sorted(described(build / "docs/tpd.1", "LOCAL COMMANDS")) == listed
+    assert described(build / "docs/tpd.1", "LOCAL COMMANDS") == set(listed)
 
 
 def test_manual_describes_the_faults(stopped_device, build):
     listed = re.findall(r"^\w+", stopped_device.output("device", "fault"), re.M)
-    assert set(listed).issubset(described(build / "docs/tpd-device.1", "FAULTS"))
+    assert set(listed) - described(build / "docs/tpd-device.1", "FAULTS") == set()
 
 
 def test_android_bp_lists_the_sources_of_the_product():
     directories = "binder bounded_libc cmdline daemon log main property".split()
     listed = re.findall(r'"(\w+/\w+\.cpp)"', source("Android.bp"))
     paths = [path for name in directories for path in (SOURCE / name).glob("*.cpp")]
-    assert sorted(listed) == sorted(str(path.relative_to(SOURCE)) for path in paths)
+    assert set(listed) == {str(path.relative_to(SOURCE)) for path in paths}
 
 
 def is_idle(device):
@@ -200,16 +202,36 @@ def test_replays_the_sessions_of_a_page(installed, installed_device, shared_port
     replay(installed_device, sessions, directory)
 
 
-@pytest.mark.parametrize("page", ["tpd.1", "tpd-device.1"])
+# For each example, a command to run after it, and what one of them prints
+EXAMPLES = {
+    "tpd.1": [
+        ("getenforce", "Permissive"),
+        ("", "THP_SetFoldState: done (1)\n"),
+        ("", "THP_SetFoldState: done (1)\n"),
+        ("", "\ntrue\n"),
+        ("", "THP_Log_Commander: done (level 4)\n"),
+    ],
+    "tpd-device.1": [
+        ("tpd captest", "0P_1P; bypass"),
+        ("tpd captest", PASS),
+        ("TPD_GET_SERVICE_MS=300 tpd captest", NO_SERVICE),
+        ("tpd THP_SetFoldState 1", "folded\n"),
+    ],
+}
+
+
+@pytest.mark.parametrize("page", EXAMPLES)
 def test_runs_the_examples_of_a_manual(installed, installed_device, build, page):
     text = (build / "docs" / page).read_text().replace(r"\-", "-")
     text = text.replace("/usr/", f"{installed}/usr/")
     blocks = re.findall(r"^\.nf\n(?:\.RS\n)?(.*?)^\.(?:RE|fi)", text, re.S | re.M)
     examples = [block for block in blocks if re.match("adb|export|tpd-device", block)]
-    assert len(examples) > 3
-    for example in examples:
+    for example, (check, expected) in zip(examples, EXAMPLES[page], strict=True):
         installed_device.output("tpd-device", "reboot")
-        installed_device.output("bash", "-ec", f'eval "$(tpd-device adb)"\n{example}')
+        installed_device.output("setenforce", "0")
+        script = f'eval "$(tpd-device adb)"\n{example}'
+        shown = installed_device.output("bash", "-ec", script)
+        wait_until(lambda: expected in shown + installed_device.output("bash", "-c", check))
 
 
 def test_runs_the_ci_example(installed, installed_device):
@@ -219,10 +241,22 @@ def test_runs_the_ci_example(installed, installed_device):
     assert done.returncode == 0, done.stderr
 
 
+CLIENT = """
+. client/tpd.sh
+printf '%s\\n' 1 2 | while read -r x; do tpd_send captest "$x"; echo "$TPD_RESULT"; done
+tpd_send captest "$1"; echo "$TPD_OUTCOME: $TPD_RESULT"
+device fault hang 60000
+TPD_LIMIT=1; tpd_send captest; echo "$TPD_OUTCOME, $?"
+tpd_wait 60; setprop odm.thp.binder 0; tpd_wait 1; echo "$?"
+ADB=false; tpd_send captest; echo "$TPD_OUTCOME"
+"""
+
+
 @pytest.mark.parametrize("shell", ["dash", "bash", "mksh", "zsh"])
-def test_client_passes_any_argument_unchanged(device, shell):
+def test_client_reports_outcomes(device, shell):
     argument = "it's  $HOME\n`x`"
-    script = '. client/tpd.sh; tpd_send captest "$1"; printf %s "$TPD_RESULT"'
     device.env["ADB"] = "env device"
-    answer = device.output(shell, "-c", script, "sh", argument, cwd=SOURCE)
-    assert answer == f"captest {argument}: PASS"
+    shown = device.output(shell, "-c", CLIENT, "sh", argument, cwd=SOURCE)
+    sent = f"captest 1: PASS\ncaptest 2: PASS\nanswered: captest {argument}: PASS\n"
+    assert shown == sent + "late, 1\n1\nbroken\n"
+    assert set(RESTART) - set(device.written()) == set()

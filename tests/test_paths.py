@@ -1,4 +1,6 @@
 """Every path that a command can take through the tool"""
+from concurrent.futures import ThreadPoolExecutor
+
 from virtual_device import NO_SERVICE, PASS, PERMISSIVE, RESTART, SERVICE, wait_until
 
 
@@ -46,3 +48,16 @@ def test_restarts_a_daemon_without_a_service(device):
     answer = device.tpd("captest", env=device.env | {"TPD_GET_SERVICE_MS": "300"})
     assert answer == NO_SERVICE
     assert device.written() == RESTART
+    times = [lookup["us"] for lookup in device.events("lookup")]
+    assert 200000 <= min(times) <= max(times) < 5000000
+
+
+def test_finds_a_service_that_appears_during_the_lookup(device):
+    service = device.root / SERVICE
+    service.rename(device.root / "away")
+    with ThreadPoolExecutor() as pool:
+        answer = pool.submit(device.tpd, "captest")
+        wait_until(lambda: device.events("log", who="tpd")[-1:])
+        (device.root / "away").rename(service)
+    assert answer.result() == PASS
+    assert len(device.events("lookup")) == 1

@@ -20,9 +20,11 @@ def assert_in_order(shown, *parts):
     assert re.search(".*".join(map(re.escape, parts)), shown, re.S), shown
 
 
-def test_shows_the_steps_of_a_command(trace):
+def test_shows_the_steps_of_a_command(trace, stopped_device):
+    stopped_device.fault("die_after 1")
+    shown = trace("captest", '"a\\b\33[2J')
     assert_in_order(
-        trace("captest", '"a\\b\33[2J'),
+        shown,
         "tool runs getenforce",
         'tool writes odm.thp.debug.selinux.permissive: "null" -> "true"',
         "tool looks up service.corvaneinterfaceservice: found",
@@ -31,6 +33,16 @@ def test_shows_the_steps_of_a_command(trace):
         "daemon answers",
         "tool receives the reply",
         r'result: captest "a\b\x1b[2J: PASS',
+    )
+    assert_in_order(
+        shown,
+        "daemon answers",
+        "init reaps corvane_daemon",
+        "signal 9",
+        "init waits 50 ms",
+        "init starts corvane_daemon",
+        "daemon publishes service.corvaneinterfaceservice",
+        "result:",
     )
 
 
@@ -62,15 +74,18 @@ def test_recorder_exits_when_its_terminal_closes(trace, stopped_device):
     assert not (stopped_device.root / "trace").exists()
 
 
-def test_prints_the_events_when_interrupted(trace, stopped_device):
+def test_prints_the_events_and_that_some_were_lost_when_interrupted(trace, stopped_device):
     stopped_device.setprop("sim.boot_delay_ms", "60000")
     command = ["device", "trace", "reboot"]
-    with subprocess.Popen(command, env=stopped_device.env, stdout=subprocess.PIPE) as recorder:
+    pipes = {"stdout": subprocess.PIPE, "stderr": subprocess.PIPE, "text": True}
+    with subprocess.Popen(command, env=stopped_device.env, **pipes) as recorder:
         wait_until((stopped_device.root / "trace").exists)
         wait_until(lambda: stopped_device.events("service_start"))
         wait_until(lambda: not stopped_device.processes("/tpd"))
+        (stopped_device.root / "trace").chmod(0o400)
         recorder.send_signal(signal.SIGINT)
-        assert_in_order(recorder.stdout.read().decode(), "init starts corvane_daemon", "result:")
+        assert_in_order(recorder.stdout.read(), "init starts corvane_daemon", "result:")
+        assert "events were lost" in recorder.stderr.read()
 
 
 def test_scripts_ignore_the_callers_python(trace, stopped_device, tmp_path):

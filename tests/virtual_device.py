@@ -4,6 +4,7 @@ import fcntl
 import json
 import os
 import pathlib
+import signal
 import socket
 import subprocess
 import time
@@ -64,8 +65,8 @@ class Device:
     def tpd(self, *arguments, **options):
         return self.output(*self.tool, *arguments, **options)
 
-    def shell(self, command):
-        return self.output("device", "shell", command)
+    def shell(self, command, **options):
+        return self.output("device", "shell", command, **options)
 
     def fault(self, text):
         self.output("device", "fault", *text.split())
@@ -117,7 +118,7 @@ class Device:
                     found.append(int(process.name))
         return found
 
-    def kill(self, program):
+    def kill(self, program, number=signal.SIGKILL):
         for process in self.processes(program):
             with contextlib.suppress(ProcessLookupError):
-                os.kill(process, 9)
+                os.kill(process, number)
