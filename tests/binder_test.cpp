@@ -3,7 +3,6 @@
 
 #include <algorithm>
 
-#include "binder/ICorvaneInterfaceClient.h"
 #include "binder/corvane_sys_binder_client.h"
 #include "cmdline/StringPairParser.h"
 #include "tests/unit_test.h"
@@ -19,46 +18,17 @@ const Call kNotFound = UntaggedLog(ERROR, "ThpGetBinder, failed to get binder se
 const Call kNewRecipient = UntaggedLog(ERROR, "enter");
 const Call kLinked = UntaggedLog(ERROR, "ThpGetBinder ret = 0");
 
-// These functions return the bytes of a value in a parcel.
-std::string Padded(std::string bytes) {
-    bytes.resize((bytes.size() + 3) / 4 * 4);
-    return bytes;
-}
-std::string Int32(int32_t value) { return {reinterpret_cast<const char*>(&value), sizeof(value)}; }
-std::string CString(const std::string& text) { return Padded(text + '\0'); }
-std::string Utf16(const std::u16string& text) {
-    const size_t bytes = (text.size() + 1) * sizeof(char16_t);
-    return Padded({reinterpret_cast<const char*>(text.c_str()), bytes});
-}
-
-TEST_F(BinderTest, EncodesTheRequestForTheDaemon) {
-    RunCmdParms("[TPD]TSA_ExecuteCommand", "captest");
-    const std::string strictMode = Int32(INT32_MIN);
-    const std::string workSource = Int32(-1);
-    const std::string descriptor =
-            Int32(55) + Utf16(u"android.CorvaneInterfaceServer.ICorvaneInterfaceService");
-    const std::string command = CString("TSA_ExecuteCommand");
-    const std::string parameters = Int32(1) + CString("captest");
-    EXPECT_EQ(device.request, strictMode + workSource + "RDNV" + descriptor + command + parameters);
-}
-
 TEST_F(BinderTest, SendsOnlyUnmarkedListedCommandsOneWay) {
-    const struct {
-        const char* command;
-        const char* parameters;
-        Call call;
-        const char* result;
-    } kRows[] = {
+    const Rows<std::string, const char*, Call, std::string> rows = {
             {"[TPD]c", "THP_SetFoldState", Transact("c, THP_SetFoldState"), "answer"},
             {"x[TPD]aftouch[TPD]z", "", Transact("aftouch[TPD]z"), "answer"},
             {"THP_SetAccData", "aftouch", Transact("THP_SetAccData, aftouch"), "answer"},
             {"an aftouches", "", TransactOneWay("an aftouches"), "OK"},
             {"[TPD", "THP_SetAccData7", TransactOneWay("[TPD, THP_SetAccData7"), "OK"},
     };
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.command);
-        EXPECT_EQ(RunCmdParms(row.command, row.parameters), row.result);
-        EXPECT_EQ(device.calls().back(), row.call);
+    for (const auto& [command, parameters, call, result] : rows) {
+        EXPECT_EQ(RunCmdParms(command, parameters), result);
+        EXPECT_EQ(device.calls().back(), call);
     }
     EXPECT_EQ(device.calls({kLog}).back(), UntaggedLog(ERROR, "Async"));
 }

@@ -35,49 +35,41 @@ TEST(StringPairParserTest, IgnoresInvalidPairs) {
 
 TEST(StringPairParserTest, AcceptsOnlyNumbersWithinTheRangeOfInt) {
     constexpr int kBefore = 99;
-    const struct {
-        const char* text;
-        bool found;
-        int number;
-    } kRows[] = {{"12abc", true, 12},
-                 {"\t-7", true, -7},
-                 {"true", false, kBefore},
-                 {"2147483647", true, INT_MAX},
-                 {"2147483648", false, kBefore},
-                 {"-2147483648", true, INT_MIN},
-                 {"-2147483649", false, kBefore}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.text);
+    const Rows<std::string, bool, int> rows = {{"12abc", true, 12},
+                                               {"\t-7", true, -7},
+                                               {"true", false, kBefore},
+                                               {"2147483647", true, INT_MAX},
+                                               {"2147483648", false, kBefore},
+                                               {"-2147483648", true, INT_MIN},
+                                               {"-2147483649", false, kBefore}};
+    for (const auto& [text, found, expected] : rows) {
+        SCOPED_TRACE(text);
         StringPairParser pairs;
-        pairs.Init(std::string("key=") + row.text, " ", "=");
+        pairs.Init("key=" + text, " ", "=");
         int number = kBefore;
-        EXPECT_EQ(pairs.GetIntValue("key", number), row.found);
-        EXPECT_EQ(number, row.number);
+        EXPECT_EQ(pairs.GetIntValue("key", number), found);
+        EXPECT_EQ(number, expected);
         bool flag = true;
-        EXPECT_EQ(pairs.GetBoolValue("key", flag), row.found);
-        EXPECT_EQ(flag, row.number != 0);
+        EXPECT_EQ(pairs.GetBoolValue("key", flag), found);
+        EXPECT_EQ(flag, expected != 0);
     }
 }
 
 using CmdLineTest = DeviceTest;
 
 TEST_F(CmdLineTest, ReportsTheBootMode) {
-    const struct {
-        const char* line;
-        bool upgradeMode;
-        bool factoryVersion;
-    } kRows[] = {{"", false, false},
-                 {"quiet enter_recovery=-1 ro", true, false},
-                 {"enter_recovery=0 enter_erecovery=1", true, false},
-                 {"enter_recovery=1 enter_erecovery=0", true, false},
-                 {"enter_recovery=0 enter_recovery=1", false, false},
-                 {"androidboot.swtype=a-factory_test enter_recovery=1", true, true},
-                 {"androidboot.swtype=Factory", false, false}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.line);
-        device.kernelCommandLine = row.line;
-        EXPECT_EQ(CmdLine().IsUpgradeMode(), row.upgradeMode);
-        EXPECT_EQ(CmdLine().IsFactoryVersion(), row.factoryVersion);
+    const Rows<const char*, bool, bool> rows = {
+            {"", false, false},
+            {"quiet enter_recovery=-1 ro", true, false},
+            {"enter_recovery=0 enter_erecovery=1", true, false},
+            {"enter_recovery=1 enter_erecovery=0", true, false},
+            {"enter_recovery=0 enter_recovery=1", false, false},
+            {"androidboot.swtype=a-factory_test enter_recovery=1", true, true},
+            {"androidboot.swtype=Factory", false, false}};
+    for (const auto& [line, upgradeMode, factoryVersion] : rows) {
+        device.kernelCommandLine = line;
+        EXPECT_EQ(CmdLine().IsUpgradeMode(), upgradeMode) << line;
+        EXPECT_EQ(CmdLine().IsFactoryVersion(), factoryVersion) << line;
     }
 }
 

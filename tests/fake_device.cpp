@@ -41,7 +41,6 @@ class FakeService : public IBinder {
     explicit FakeService(int number) : mNumber(number) {}
 
     status_t transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
-        gDevice->request.assign(reinterpret_cast<const char*>(data.data()), data.dataSize());
         data.setDataPosition(0);
         const bool known = data.enforceInterface(ICorvaneInterfaceClient::descriptor) && code == 0;
         std::string request = known ? data.readCString() : "not of this interface";

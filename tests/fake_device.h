@@ -86,7 +86,6 @@ class FakeDevice {
 
     // Returns the recorded calls of these functions, or all calls if none is named.
     std::vector<Call> calls(const std::set<std::string>& functions = {}) const;
-    std::string request;          // the bytes of the last call's parcel
     std::set<FILE*> openStreams;  // the kernel command line and getenforce
 
     // Used by the redirected functions.

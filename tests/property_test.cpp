@@ -1,7 +1,6 @@
 #include "property/Property.h"
 
 #include <climits>
-#include <cstring>
 
 #include "tests/unit_test.h"
 
@@ -51,11 +50,7 @@ TEST_F(PropertyTest, FindsItemsByExactAlias) {
 // A getter stores its default in an unset property. The callers' tests cover setters and flag
 // getters.
 TEST_F(PropertyTest, TextGettersUseTheirOwnProperty) {
-    const struct {
-        const char* key;
-        const char* defaultValue;
-        int (Property::*get)(std::string&);
-    } kRows[] = {
+    const Rows<const char*, const char*, int (Property::*)(std::string&)> rows = {
             {kThplogKey, "", &Property::GetThplogEnable},
             {"odm.thp.service_enable", "false", &Property::GetServiceEnable},
             {"odm.thp.dae_alive", "false", &Property::GetDaeAlive},
@@ -64,43 +59,34 @@ TEST_F(PropertyTest, TextGettersUseTheirOwnProperty) {
             {"odm.thp.is_updating_fw", "false", &Property::GetUpdateFW},
             {kPermissiveKey, "null", &Property::GetPermissive},
     };
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.key);
+    for (const auto& [key, defaultValue, get] : rows) {
         device.properties.clear();
-        (property.*row.get)(value);
-        EXPECT_EQ(value, row.defaultValue);
-        EXPECT_THAT(device.properties, ElementsAre(Pair(row.key, row.defaultValue)));
+        (property.*get)(value);
+        EXPECT_EQ(value, defaultValue) << key;
+        EXPECT_THAT(device.properties, ElementsAre(Pair(key, defaultValue)));
     }
 }
 
 TEST_F(PropertyTest, OnlyTrueAndOneSetAFlag) {
-    for (const char* text : {"true", "1"}) {
+    for (const std::string text : {"true", "1", "false", "0", "2", "11", "TRUE", " true"}) {
         device.properties["odm.thp.binder"] = text;
-        EXPECT_TRUE(property.GetBinder()) << text;
-    }
-    for (const char* text : {"false", "0", "2", "11", "TRUE", " true"}) {
-        device.properties["odm.thp.binder"] = text;
-        EXPECT_FALSE(property.GetBinder()) << text;
+        EXPECT_EQ(property.GetBinder(), text == "true" || text == "1") << text;
     }
 }
 
 TEST_F(PropertyTest, AcceptsOnlyUserTypesWithinTheRangeOfInt) {
     constexpr int kBefore = 99;
-    const struct {
-        const char* text;
-        int type;
-    } kRows[] = {{" -5x", -5},
-                 {"", kBefore},
-                 {"2147483647", INT_MAX},
-                 {"2147483648", kBefore},
-                 {"-2147483648", INT_MIN},
-                 {"-2147483649", kBefore}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.text);
-        device.properties["ro.logsystem.usertype"] = row.text;
+    const Rows<std::string, int> rows = {{" -5x", -5},
+                                         {"", kBefore},
+                                         {"2147483647", INT_MAX},
+                                         {"2147483648", kBefore},
+                                         {"-2147483648", INT_MIN},
+                                         {"-2147483649", kBefore}};
+    for (const auto& [text, expected] : rows) {
+        device.properties["ro.logsystem.usertype"] = text;
         int type = kBefore;
-        EXPECT_EQ(property.GetUserType(type), static_cast<int>(strlen(row.text)));
-        EXPECT_EQ(type, row.type);
+        EXPECT_EQ(property.GetUserType(type), static_cast<int>(text.size()));
+        EXPECT_EQ(type, expected) << text;
     }
 }
 

@@ -216,6 +216,8 @@ EXAMPLES = {
         ("tpd captest", PASS),
         ("TPD_GET_SERVICE_MS=300 tpd captest", NO_SERVICE),
         ("tpd THP_SetFoldState 1", "folded\n"),
+        ("", "//aaa special gTpdCmds"),
+        ("", "init reaps corvane_daemon"),
     ],
 }
 

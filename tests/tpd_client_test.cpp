@@ -13,11 +13,8 @@ class TpdClientTest : public DeviceTest {
     TpdClient client;
 };
 
-TEST_F(TpdClientTest, TreatsTheDaemonAsUnavailableBeforeTheFirstWait) {
-    EXPECT_EQ(client.daemonUnavailable, 1);
-}
-
 TEST_F(TpdClientTest, ChecksALivingDaemonOncePerProcess) {
+    EXPECT_EQ(client.daemonUnavailable, 1);
     EXPECT_EQ(client.WaitDaemonAlive(11), "check_time: 0.thp.dae_alive : 1. thp.binder: 1");
     EXPECT_EQ(client.daemonUnavailable, 0);
     TpdClient another;
@@ -68,15 +65,12 @@ TEST_F(TpdClientTest, ForgetsFailedWaitsWhenTheDaemonIsAlive) {
 }
 
 TEST_F(TpdClientTest, TrustsTheDaemonUntilAnAnswerReportsAFailure) {
-    const struct {
-        const char* answer;
-        bool trusted;
-    } kRows[] = {{"an ERROR", false}, {"an error", true}, {"x0F_1F; y", false}, {"0f_1F", true}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.answer);
-        device.answers = {{android::OK, row.answer}};
-        EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", "p"), row.answer);
-        EXPECT_EQ(aliveConfirmed, row.trusted);
+    const Rows<const char*, bool> rows = {
+            {"an ERROR", false}, {"an error", true}, {"x0F_1F; y", false}, {"0f_1F", true}};
+    for (const auto& [answer, trusted] : rows) {
+        device.answers = {{android::OK, answer}};
+        EXPECT_EQ(client.ThpExecuteCmdParams("[TPD]c", "p"), answer);
+        EXPECT_EQ(aliveConfirmed, trusted) << answer;
     }
 }
 
@@ -88,7 +82,7 @@ TEST_F(TpdClientTest, LogsTheServiceSwitchWhenTheServiceIsMissing) {
               Log(ERROR, "RunCmd, failed to Get binder service. thp.service_enable: 1\n"));
 }
 
-constexpr char kCaptestFailure[] =
+const std::string kCaptestFailure =
         "captest fail due to corvane_daemon is not alive or unexpected reboot. ";
 
 TEST(IsCaptestInRtTest, AcceptsAnySubstringOfTheModeNames) {
@@ -102,17 +96,15 @@ TEST(IsCaptestInRtTest, AcceptsAnySubstringOfTheModeNames) {
 
 TEST_F(TpdClientTest, ReportsThatTheDaemonDiedDuringACapacityTest) {
     device.properties[kAliveKey] = "false";
-    EXPECT_EQ(client.RunCmd("captest", "running_test"), "answerthp.dae_alive : 0. thp.binder: 1" +
-                                                                std::string(kCaptestFailure) +
-                                                                "before: 0, after: 0");
+    EXPECT_EQ(client.RunCmd("captest", "running_test"),
+              "answerthp.dae_alive : 0. thp.binder: 1" + kCaptestFailure + "before: 0, after: 0");
     EXPECT_EQ(client.RunCmd("captest", "other"), "answer");
 }
 
 TEST_F(TpdClientTest, ReportsThatTheDaemonRestartedDuringACapacityTest) {
     device.changes[Transact("captest, running_test")] = {kRebootTimesKey, "1"};
-    EXPECT_EQ(client.RunCmd("captest", "running_test"), "answerthp.dae_alive : 1. thp.binder: 1" +
-                                                                std::string(kCaptestFailure) +
-                                                                "before: 0, after: 1");
+    EXPECT_EQ(client.RunCmd("captest", "running_test"),
+              "answerthp.dae_alive : 1. thp.binder: 1" + kCaptestFailure + "before: 0, after: 1");
     EXPECT_EQ(client.RunCmd("captest", "running_test"), "answer");
     EXPECT_EQ(client.daemonUnavailable, 0);
 }

@@ -7,16 +7,12 @@ namespace test {
 using TpdCmdTest = DeviceTest;
 
 TEST_F(TpdCmdTest, ReportsWhetherTheThplogIsOn) {
-    const struct {
-        const char* thplog;
-        const char* userType;
-        bool on;
-    } kRows[] = {{"untrue", "", true}, {"truefalse", "3", false}, {"1", "3", true},
-                 {"", "5", true},      {"", "4", false},          {"", "", false}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(std::string(row.thplog) + "/" + row.userType);
-        device.properties = {{kThplogKey, row.thplog}, {"ro.logsystem.usertype", row.userType}};
-        EXPECT_EQ(TpdCmd::IsThplogEnable(), row.on);
+    const Rows<std::string, std::string, bool> rows = {
+            {"untrue", "", true}, {"truefalse", "3", false}, {"1", "3", true},
+            {"", "5", true},      {"", "4", false},          {"", "", false}};
+    for (const auto& [thplog, userType, on] : rows) {
+        device.properties = {{kThplogKey, thplog}, {"ro.logsystem.usertype", userType}};
+        EXPECT_EQ(TpdCmd::IsThplogEnable(), on) << thplog << "/" << userType;
     }
 }
 
@@ -60,25 +56,20 @@ TEST_F(TpdCmdTest, ChecksTheStoredFlagBeforeTheBootMode) {
 
 TEST_F(TpdCmdTest, AllowsCommandsOnlyIfGetenforcePrintsPermissive) {
     const std::string longest = "Permissive" + std::string(189, 'x');  // 200 bytes with the NUL
-    const struct {
-        const char* name;
-        std::optional<std::string> output;
-        int status;
-        bool allowed;
-    } kRows[] = {{"enforcing", "Enforcing\n", 0, false},
-                 {"within a word", "xPermissive\n", 0, false},
-                 {"no output", " \n", 0, false},
-                 {"cannot be run", std::nullopt, 0, false},
-                 {"cannot be closed", "Permissive\n", -1, false},
-                 {"fails afterwards", "Permissive\n", 256, true},
-                 {"longest word", longest, 0, true},
-                 {"word too long", longest + "x", 0, false}};
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(row.name);
+    const Rows<const char*, std::optional<std::string>, int, bool> rows = {
+            {"enforcing", "Enforcing\n", 0, false},
+            {"within a word", "xPermissive\n", 0, false},
+            {"no output", " \n", 0, false},
+            {"cannot be run", std::nullopt, 0, false},
+            {"cannot be closed", "Permissive\n", -1, false},
+            {"fails afterwards", "Permissive\n", 256, true},
+            {"longest word", longest, 0, true},
+            {"word too long", longest + "x", 0, false}};
+    for (const auto& [name, output, status, allowed] : rows) {
         device.properties.clear();
-        device.getenforce = row.output;
-        device.getenforceStatus = row.status;
-        EXPECT_EQ(TpdCmd().IsSelinuxPermissive(), row.allowed);
+        device.getenforce = output;
+        device.getenforceStatus = status;
+        EXPECT_EQ(TpdCmd().IsSelinuxPermissive(), allowed) << name;
         EXPECT_THAT(device.openStreams, IsEmpty());
     }
 }

@@ -7,25 +7,19 @@ int tpd_main(int argc, char** argv);
 
 namespace test {
 
-const Call kDebugOff = Write("persist.sys.zelmor.debug.on", "false");
-const Call kStoreVersion = Write("persist.odm.thp.ver_dae", "true");
-const Call kSetVersion = Write("odm.thp.ver_dae", "true");
-const Call kLogOff = Write(kThplogKey, "false");
-const Call kLogOn = Write(kThplogKey, "true");
-const Call kAfeLogOff = Write("odm.thp.debug.afelog", "false");
-const Call kAfeLogOn = Write("odm.thp.debug.afelog", "true");
-
 Call PutSetting(const std::string& arguments) { return Shell("settings put system " + arguments); }
 
 // All local commands, with the calls that change the device.
 const std::map<std::string, std::vector<Call>> kLocalCommands = {
         {"debugDifEnable", {Write("thp.debug.raw", "false")}},
         {"debugRawEnable", {Write("thp.debug.raw", "true")}},
-        {"log_afe_disable", {kAfeLogOff, kStop, kSetBootFlag, kStart}},
-        {"log_afe_enable", {kAfeLogOn, kStop, kSetBootFlag, kStart}},
+        {"log_afe_disable", {Write("odm.thp.debug.afelog", "false"), kStop, kSetBootFlag, kStart}},
+        {"log_afe_enable", {Write("odm.thp.debug.afelog", "true"), kStop, kSetBootFlag, kStart}},
         {"log_disable",
-         {kDebugOff, kStoreVersion, kSetVersion, kLogOff, kStop, kSetBootFlag, kStart}},
-        {"log_enable", {kLogOn, kStop, kSetBootFlag, kStart}},
+         {Write("persist.sys.zelmor.debug.on", "false"), Write("persist.odm.thp.ver_dae", "true"),
+          Write("odm.thp.ver_dae", "true"), Write(kThplogKey, "false"), kStop, kSetBootFlag,
+          kStart}},
+        {"log_enable", {Write(kThplogKey, "true"), kStop, kSetBootFlag, kStart}},
         {"reboot", {kStop, kSetBootFlag, kStart}},
         {"showtouch", {PutSetting("show_touches 1"), PutSetting("pointer_location 1")}},
         {"showtouch_close", {PutSetting("show_touches 0"), PutSetting("pointer_location 0")}},
@@ -53,11 +47,7 @@ std::string RunTool(std::vector<std::string> arguments) {
 }
 
 TEST(TpdMainTest, MarksForwardedCommandsAsTwoWay) {
-    const struct {
-        std::vector<std::string> arguments;
-        Call call;
-        std::string help;
-    } kRows[] = {
+    const Rows<std::vector<std::string>, Call, std::string> rows = {
             {{"tpd"}, Transact("help"), HelpText()},
             {{"tpd", "help"}, Transact("help"), HelpText()},
             {{"tpd", "help", ""}, Transact("help"), ""},
@@ -66,12 +56,12 @@ TEST(TpdMainTest, MarksForwardedCommandsAsTwoWay) {
             {{"tpd", "start", "x"}, Transact("start, x"), ""},
             {{"tpd", "TSA_ExecuteCommand", "a", "b"}, Transact("TSA_ExecuteCommand, a b"), ""},
     };
-    for (const auto& row : kRows) {
-        SCOPED_TRACE(testing::PrintToString(row.arguments));
+    for (const auto& [arguments, call, help] : rows) {
+        SCOPED_TRACE(testing::PrintToString(arguments));
         FakeDevice device;
         device.getenforce = "Permissive\n";
-        EXPECT_EQ(RunTool(row.arguments), "answer" + row.help + "\n");
-        EXPECT_THAT(device.calls({kTransact}), ElementsAre(row.call));
+        EXPECT_EQ(RunTool(arguments), "answer" + help + "\n");
+        EXPECT_THAT(device.calls({kTransact}), ElementsAre(call));
     }
 }
 
@@ -97,13 +87,9 @@ TEST(TpdMainTest, ExecutesLocalCommands) {
         device.properties[kThplogKey] = command == "log_disable" ? "true" : "";
         EXPECT_EQ(RunTool({"tpd", command}), "\n");
         EXPECT_THAT(device.calls({kWrite, kShell}), ElementsAreArray(calls));
+        EXPECT_THAT(device.calls(),
+                    Contains(Log(INFO, "ExcuteTpdCmd[145] Get cmd. " + command + "\n")));
     }
-}
-
-TEST(TpdMainTest, LogsALocalCommand) {
-    FakeDevice device;
-    RunTool({"tpd", "showtouch"});
-    EXPECT_EQ(device.calls({kLog}).back(), Log(INFO, "ExcuteTpdCmd[145] Get cmd. showtouch\n"));
 }
 
 TEST(TpdMainTest, LogsAForwardedCommand) {

@@ -3,16 +3,24 @@
 
 #include <gmock/gmock.h>
 
+#include <tuple>
+#include <vector>
+
 #include "tests/fake_device.h"
 
 namespace test {
 
 using namespace std::chrono_literals;
+using testing::Contains;
 using testing::ElementsAre;
 using testing::ElementsAreArray;
 using testing::IsEmpty;
 using testing::Pair;
 using testing::SizeIs;
+
+// The rows of a table, which a test reads with a structured binding.
+template <typename... Columns>
+using Rows = std::vector<std::tuple<Columns...>>;
 
 class DeviceTest : public testing::Test {
   protected:
