@@ -10,6 +10,7 @@ import contextlib
 import itertools
 import os
 import re
+import signal
 import socket
 import stat
 import struct
@@ -460,11 +461,15 @@ async def is_listed(server, port):
 
 
 async def keep_listed(port):
-    """Keeps the device in the lists of the adb servers, which may end and start at any time"""
+    """Keeps the device in the lists of the adb servers. SIGHUP announces another shared server."""
+    reload = asyncio.Event()
+    reload.set()
+    asyncio.get_running_loop().add_signal_handler(signal.SIGHUP, reload.set)
     is_ready = False
-    shared = map(int, output("getprop", "persist.sim.adb_ports").split())
-    servers = [None, *shared]
     while True:
+        if reload.is_set():
+            reload.clear()
+            servers = [None, *map(int, output("getprop", "persist.sim.adb_ports").split())]
         for server in servers:
             with contextlib.suppress(OSError):
                 if await is_listed(server, port) and server is None and not is_ready:

@@ -249,7 +249,9 @@ printf '%s\\n' 1 2 | while read -r x; do tpd_send captest "$x"; echo "$TPD_RESUL
 tpd_send captest "$1"; echo "$TPD_OUTCOME: $TPD_RESULT"
 device fault hang 60000
 TPD_LIMIT=1; tpd_send captest; echo "$TPD_OUTCOME, $?"
-tpd_wait 60; setprop odm.thp.binder 0; tpd_wait 1; echo "$?"
+stop corvane_daemon
+until [ "$(getprop init.svc.corvane_daemon)" = stopped ]; do sleep 0.1; done
+tpd_wait 1; echo "$?"
 ADB=false; tpd_send captest; echo "$TPD_OUTCOME"
 """
 
