@@ -11,10 +11,10 @@
 // The prefix of a result if the service is not found.
 constexpr char kNoServicePrefix[] = "0F_1F; ";
 
-// Sends `cmd` with `params` to the daemon and returns its answer, "OK" for a one-way call. Blocks
-// until the daemon answers; there is no time-out. Retries a failed call once, after a new service
-// lookup. On failure, restarts the daemon and returns a text that begins with kNoServicePrefix if
-// the service is not found, or contains "ERROR" if both calls fail.
+// Sends `cmd` with `params` to the daemon and returns its answer, or "OK" for a one-way call.
+// Blocks until the daemon answers; there is no time-out. Retries a failed call once, after a new
+// service lookup. On failure, restarts the daemon and returns a text that begins with
+// kNoServicePrefix if the service is not found, or contains "ERROR" if both calls fail.
 std::string RunCmdParms(std::string cmd, std::string params);
 
 // Restarts the daemon by setting its service property to "0" and then to "1".

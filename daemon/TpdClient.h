@@ -25,9 +25,10 @@ class TpdClient {
     // to `info`.
     static bool IsDaemonAlive(std::string& info);
 
-    // Checks up to `checks` times, 200 ms apart, whether the daemon is alive. Gives up early during
-    // a firmware update. Sets daemonUnavailable and returns a report. Once the daemon has been seen
-    // alive, skips the check until a command fails.
+    // Checks up to `checks` times whether the daemon is alive, with a pause of 200 ms after each
+    // failed check but the first. Gives up early during a firmware update. Sets daemonUnavailable
+    // and returns a report. Once the daemon has been seen alive, skips the check until a command
+    // fails.
     std::string WaitDaemonAlive(int checks);
 
     int32_t daemonUnavailable;  // 0 if the last wait or command found the daemon, otherwise 1

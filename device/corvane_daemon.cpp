@@ -31,6 +31,7 @@ using device::FaultKind;
 using device::GetProperty;
 using std::chrono::milliseconds;
 
+// The daemon's side of the interface. It shares no code with the tool, as on a phone.
 constexpr char kServiceName[] = "service.corvaneinterfaceservice";
 constexpr uint32_t kExecuteCommandCode = 0;
 // The phone's commands. The spaces around each name let strstr() find whole names only.

@@ -12,8 +12,7 @@ enum LogLevel : int {
     LOG_DEBUG = 4,  // logged with the priority of LOG_INFO
 };
 
-// Thread-safe. A derived class can override GetLogLevel() to change the threshold and Append() to
-// keep texts in memory.
+// Thread-safe. A derived class can override GetLogLevel() to change the threshold.
 class LogBase {
   public:
     explicit LogBase(std::string name);
@@ -28,7 +27,8 @@ class LogBase {
     // message longer than 2047 bytes and logs an extra line that says so.
     virtual void Printf(LogLevel level, std::string function, int line, ...);
 
-    // Hook for keeping `text` in mLog, guarded by mMutex. Does nothing by default.
+    // Does nothing; no function of this class calls it. A derived class can override it to keep
+    // `text` in mLog, guarded by mMutex, for its own callers.
     virtual void Append(std::string text) const;
 
     // Return the text kept in memory. GetLogClear() also clears it.

@@ -1,5 +1,5 @@
 // The device's files. Paths are relative to the device root. A file or directory that is a symbolic
-// link is not opened. Functions set errno on failure.
+// link is not opened. A function that fails sets errno and returns an invalid descriptor or false.
 #pragma once
 
 #include <optional>

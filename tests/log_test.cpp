@@ -6,7 +6,7 @@ namespace test {
 
 using LogTest = DeviceTest;
 
-// A log that also writes debug lines and keeps messages in memory.
+// A log that also writes debug lines and keeps appended texts in memory.
 class DebugLog : public LogBase {
   public:
     DebugLog() : LogBase("debug") {}

@@ -1,4 +1,4 @@
-"""Every path that a command can take through the tool"""
+"""The main paths of a command through the tool"""
 from concurrent.futures import ThreadPoolExecutor
 
 from virtual_device import NO_SERVICE, PASS, PERMISSIVE, RESTART, SERVICE, wait_until
