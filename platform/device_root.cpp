@@ -71,7 +71,7 @@ int OpenRoot() {
     signal(SIGXFSZ, SIG_IGN);  // a write beyond a limit fails, as on a full disk
     const std::string path = DeviceRootPath();
     if (path.empty()) {
-        return Refuse("", "none of TPD_DEVICE_ROOT, XDG_STATE_HOME and HOME is set");
+        return Refuse("is unknown", "none of TPD_DEVICE_ROOT, XDG_STATE_HOME and HOME is set");
     }
     if (path.front() != '/') {
         return Refuse(path, "is not an absolute path");
