@@ -108,7 +108,7 @@ int Adb(int argc, char** argv) {
     if (!device::ExpectRunning()) {
         return 1;
     }
-    std::vector<const char*> arguments = {program_invocation_short_name};
+    std::vector<const char*> arguments = {program_invocation_name};
     arguments.insert(arguments.end(), argv, argv + argc);
     return device::ExecSibling("connect_adb", arguments);
 }
@@ -121,7 +121,7 @@ int Trace(int argc, char** argv) {
     host::UpdateTracing();    // removes the trace file if its owner was killed
     signal(SIGINT, SIG_IGN);  // until trace.py handles it
     const std::string root = std::to_string(dup(host::DeviceRoot()));
-    std::vector<const char*> arguments = {root.c_str(), program_invocation_short_name};
+    std::vector<const char*> arguments = {root.c_str(), program_invocation_name};
     arguments.insert(arguments.end(), argv, argv + argc);
     return device::ExecSibling("trace.py", arguments);
 }
@@ -163,8 +163,8 @@ constexpr struct Verb {
          INT_MAX, device::ManageAnswers}};
 
 void PrintUsage(FILE* stream, const Verb& verb) {
-    fprintf(stream, "    %s %s%s\n        %s\n", program_invocation_short_name, verb.name,
-            verb.arguments, verb.effect);
+    fprintf(stream, "    %s %s%s\n        %s\n", program_invocation_name, verb.name, verb.arguments,
+            verb.effect);
 }
 
 bool AsksForHelp(const char* word) {

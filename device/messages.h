@@ -27,7 +27,7 @@ inline int FailForErrno(const std::string& what) { return Fail(what + ": " + str
 
 // Returns the command that the user would type to run this program with these arguments, quoted.
 inline std::string Command(const std::string& arguments) {
-    return std::string("'") + program_invocation_short_name + " " + arguments + "'";
+    return std::string("'") + program_invocation_name + " " + arguments + "'";
 }
 
 // Returns the arguments, at least one, separated by spaces.
