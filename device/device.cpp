@@ -172,15 +172,21 @@ bool AsksForHelp(const char* word) {
 }
 
 int RunVerb(int argc, char** argv) {
-    if (argc < 2 || AsksForHelp(argv[1])) {
+    const std::string name = argc > 1 ? argv[1] : "";
+    if (name == "--version") {
+        puts("tpd-device " TPD_VERSION);
+        return 0;
+    }
+    if (argc < 2 || name == "help" || AsksForHelp(argv[1])) {
         FILE* const stream = argc < 2 ? stderr : stdout;
         fputs("usage:\n", stream);
         for (const Verb& verb : kVerbs) {
             PrintUsage(stream, verb);
         }
+        fprintf(stream, "    %s help | --version\n        prints this text or the version\n",
+                program_invocation_name);
         return argc < 2 ? device::kUsageError : 0;
     }
-    const std::string name = argv[1];
     for (const Verb& verb : kVerbs) {
         if (name != verb.name) {
             continue;

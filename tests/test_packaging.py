@@ -58,6 +58,12 @@ def test_file_modes_do_not_depend_on_the_umask(installed):
     assert modes == {"drwxr-xr-x", "-rw-r--r--", "-rwxr-xr-x", "lrwxrwxrwx"}
 
 
+def test_version_is_that_of_the_package(installed, installed_device):
+    (package,) = installed.parent.glob("tpd-device_*.deb")
+    version = package.name.split("_")[1]
+    assert installed_device.output("tpd-device", "--version") == f"tpd-device {version}\n"
+
+
 @pytest.fixture(params=COMPLETIONS)
 def complete(request, installed, installed_device):
     """Returns the shell's completions of the last word"""
