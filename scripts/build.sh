@@ -1,5 +1,6 @@
 # shellcheck shell=bash disable=SC2034
 # Functions for the other scripts: usage messages and builds.
+set -o pipefail
 tree=$(CDPATH='' cd -- "$(dirname -- "$(readlink -f -- "${BASH_SOURCE[0]}")")/.." && pwd)
 script=$(readlink -f -- "$0")
 export TPD_BUILD_DIR
@@ -34,10 +35,17 @@ locked() {
     ) 9>"$TPD_BUILD_DIR/lock"
 }
 
-# quietly COMMAND...: runs the command with its output in TPD_BUILD_DIR/build.log. If the command
-# fails, prints the output and exits.
+# quietly COMMAND...: runs the command with its output in TPD_BUILD_DIR/build.log, and prints a line
+# of it every 20 s. If the command fails, prints the output and exits.
 quietly() {
-    if ! "$@" >"$TPD_BUILD_DIR/build.log" 2>&1; then
+    local line next=$((SECONDS + 20))
+    if ! "$@" 2>&1 | while IFS= read -r line; do
+        printf '%s\n' "$line"
+        if ((SECONDS >= next)); then
+            printf '%s\n' "$line" >&2
+            next=$((SECONDS + 20))
+        fi
+    done >"$TPD_BUILD_DIR/build.log"; then
         cat "$TPD_BUILD_DIR/build.log" >&2
         exit 1
     fi
