@@ -135,6 +135,7 @@ def described(page, section):
     groff = "groff -man -Tascii -P-cbou -ww -rLL=80n".split()
     shown = subprocess.run([*groff, page], capture_output=True, text=True)
     assert (shown.returncode, shown.stderr) == (0, "")
+    assert max(map(len, shown.stdout.splitlines())) <= 80
     pattern = rf"^{section}\n.*?\n\n(.*?)^[A-Z]"
     entries = re.search(pattern, shown.stdout, re.M | re.S)[1]
     return set(re.findall(r"^ {7}(\w+)", entries, re.M))
