@@ -12,13 +12,6 @@
 
 int tpd_main(int argc, char** argv);
 
-// Aborts if the condition is false; libFuzzer then saves the input.
-static void Check(bool condition) {
-    if (!condition) {
-        abort();
-    }
-}
-
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     static const bool silent = freopen("/dev/null", "w", stdout) != nullptr;
     if (size < 2) {
@@ -50,9 +43,10 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     }
     device.kernelCommandLine = arguments.back();
 
-    Check(silent && tpd_main(static_cast<int>(argv.size()), argv.data()) == 0);
-    Check(device.calls({test::kTransact}).size() <= 2);
-    Check(device.openStreams.empty());
+    const bool succeeded = silent && tpd_main(static_cast<int>(argv.size()), argv.data()) == 0;
+    if (!succeeded || device.calls({test::kTransact}).size() > 2 || !device.openStreams.empty()) {
+        abort();  // libFuzzer saves the input
+    }
     // The tool marks every command as two-way. RunCmd() without the mark reaches the one-way calls
     // and the check of a capacity test.
     if (argv.size() == 3) {

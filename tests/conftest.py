@@ -4,6 +4,7 @@ TPD_BUILD_DIR is the build to test. TPD_COMMAND overrides the command that runs 
 example "qemu-aarch64-static build-arm64/tpd". TPD_SOAK adds the long tests. TPD_SEED repeats the
 choices of a random test, which prints its seed when it fails.
 """
+import fcntl
 import os
 import pathlib
 import random
@@ -47,7 +48,9 @@ def stopped_device(build):
 @pytest.fixture
 def device(stopped_device):
     """A running device that forwards commands, with tracing on."""
-    stopped_device.start_tracing()
-    stopped_device.start()
-    stopped_device.setprop(PERMISSIVE, "true")
-    return stopped_device
+    stopped_device.output("device", "root")
+    with open(stopped_device.root / "trace", "w") as trace:
+        fcntl.flock(trace, fcntl.LOCK_EX)  # turns tracing on
+        stopped_device.start()
+        stopped_device.setprop(PERMISSIVE, "true")
+        yield stopped_device

@@ -29,7 +29,7 @@ OUTPUTS = {
     f"{LOG} -v raw -t 1 -b main,crash one two": "second\n",
     f"{LOG} -v raw *:E": "first\n",
     f"{LOG} -v raw --pid $! one two": "second\n",
-    f"{LOG} -v raw -f file one; cat file": "first\n",
+    f"{LOG} -v raw -f file one; logcat -d -v raw -f file -s two; cat file": "first\nsecond\n",
     "tpd captest >file; logcat -d -v raw -s tpd:E": "enter\nThpGetBinder ret = 0\n",
     "getprop unset default; getprop ro.product.model": "default\nvirtual\n",
     "setenforce 0; getenforce; setenforce 1; getenforce": "Permissive\nEnforcing\n",
@@ -90,7 +90,7 @@ def test_daemon_returns_recorded_answers(device):
     device.setprop(PERMISSIVE, "true")
     assert device.tpd("THP_GetVersion", "x") == "v%d\n"
     assert device.tpd("THP_SetFoldState", "1") == "\xff\n\n"
-    for unknown in "THP_SetFoldState 1", "THP_Set":
+    for unknown in "THP_SetFoldState 1", "THP_Set", "SetFoldState":
         assert "unknown command" in device.tpd(unknown)
     device.answer("--remove", "THP_SetFoldState 1")
     assert device.tpd("THP_SetFoldState", "1") == "other\n"

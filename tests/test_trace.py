@@ -21,7 +21,7 @@ def assert_in_order(shown, *parts):
 
 
 def test_shows_the_steps_of_a_command_and_of_a_restart(trace, stopped_device):
-    stopped_device.fault("die_after")
+    stopped_device.shell("setprop sim.boot_delay_ms 300; setprop sim.fault die_after")
     shown = trace("captest", '"a\\b\33[2J')
     assert_in_order(
         shown,

@@ -1,6 +1,5 @@
 """Helpers for tests that use a virtual device"""
 import contextlib
-import fcntl
 import json
 import os
 import pathlib
@@ -86,12 +85,6 @@ class Device:
 
     def restarts(self):
         return int(self.getprop("odm.thp.dae_reboot_times"))
-
-    def start_tracing(self):
-        """Turns tracing on by locking the trace file."""
-        self.output("device", "root")
-        self.recorder = open(self.root / "trace", "w")
-        fcntl.flock(self.recorder, fcntl.LOCK_EX)
 
     def events(self, what, who=""):
         """Returns the recorded events of one kind, from one program or from all."""
