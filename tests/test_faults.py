@@ -27,6 +27,8 @@ def test_fault_has_its_documented_result(device, fault, text, dies):
     device.fault(fault)
     assert device.tpd("captest") == text
     assert device.events("fault")[0]["name"] == fault
+    logged = [event["text"] for event in device.events("log", who="tpd")]
+    assert logged.count("binder died") == len(device.events("binder_died"))
     wait_until(lambda: bool(device.events("service_exit")) == dies)
 
 

@@ -71,7 +71,7 @@ def test_boot_after_a_stuck_init_keeps_only_what_a_phone_keeps(device):
 
 def test_files_are_private_under_any_umask(stopped_device):
     stopped_device.output("sh", "-c", "umask 0777; exec device start")
-    stopped_device.shell("reboot")
+    assert stopped_device.shell("setprop a 1; reboot; getprop a") == "\n"
     assert (stopped_device.root / "properties").stat().st_mode & 0o777 == 0o700
 
 
