@@ -67,7 +67,7 @@ bool DeleteFiles(const std::string& path, const char* keptPrefix = nullptr) {
     }
     for (const std::string& name : host::FilesIn(path)) {
         if (keptPrefix == nullptr || name.rfind(keptPrefix, 0) != 0) {
-            host::RemoveFile(path + "/" + name);
+            host::RemoveFile(std::string(path).append("/").append(name));
         }
     }
     return true;
@@ -209,7 +209,7 @@ class Services {
         for (; !requests.empty(); requests = ReadRequests(watch)) {
             for (const std::string& request : requests) {
                 if (request == device::kPowerControlKey) {
-                    isRebootRequested |= device::GetProperty(request.c_str()) == "reboot";
+                    isRebootRequested |= device::GetProperty(request) == "reboot";
                 } else if (request.rfind(device::kControlPrefix, 0) == 0) {
                     Control(request);
                 } else {
