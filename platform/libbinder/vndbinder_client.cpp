@@ -1,3 +1,4 @@
+#include <binder/IInterface.h>
 #include <fcntl.h>
 #include <sys/socket.h>
 
@@ -124,3 +125,9 @@ sp<IBinder> ConnectService(const std::string& path) {
 sp<IBinder> NewProxy(UniqueFd connection) { return new RemoteBinder(std::move(connection)); }
 
 }  // namespace host
+
+// Here, because the header of the platform's own sp<> needs the whole type.
+android::sp<android::IInterface> IBinder::queryLocalInterface(
+        const android::String16& /* descriptor */) {
+    return nullptr;
+}

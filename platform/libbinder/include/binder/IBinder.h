@@ -23,7 +23,7 @@ class IBinder : public virtual RefBase {
     };
 
     // Returns the implementation if it is in this process, otherwise null.
-    virtual sp<IInterface> queryLocalInterface(const String16& /* descriptor */) { return {}; }
+    virtual sp<IInterface> queryLocalInterface(const String16& descriptor);
 
     // Sends the request and waits for the reply. With FLAG_ONEWAY, does not wait and leaves the
     // reply empty. Returns 0 or a negative status from the owner or the driver.
