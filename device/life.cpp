@@ -113,6 +113,8 @@ bool Terminate(const UniqueFd& process) {
     return false;
 }
 
+bool IsDaemonStopped() { return GetProperty(kDaemonStateKey) == "stopped"; }
+
 int FailForUnknown(const Init& init) {
     return Fail("cannot tell whether the device is running: " + init.reason);
 }
@@ -159,6 +161,8 @@ int BringUp(const char* selinuxMode, Until until) {
         if (!lock.ok()) {
             lock = TryToLockStart();
         }
+        // Asked before and after the locks are read, because the device may stop or boot meanwhile.
+        const bool wasDaemonStopped = IsDaemonStopped();
         const Init init = FindInit();
         if (init.state != State::kStopped) {
             lock.reset();
@@ -190,7 +194,7 @@ int BringUp(const char* selinuxMode, Until until) {
                 if (isUp || (until == Until::kBooted && !isStartedHere)) {
                     return 0;
                 }
-                if (GetProperty(kDaemonStateKey) == "stopped") {
+                if (wasDaemonStopped && IsDaemonStopped()) {
                     return FailForDaemon();
                 }
         }
