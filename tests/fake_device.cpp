@@ -47,6 +47,7 @@ class FakeService : public IBinder {
         if (data.readInt32() != 0) {
             request += std::string(", ") + data.readCString();
         }
+        request += data.readCString() == nullptr ? "" : ", and more";
         gDevice->Record({flags == FLAG_ONEWAY ? kTransactOneWay : kTransact, request});
         const Answer answer = TakeFirst(gDevice->answers, {});
         const sp<DeathRecipient> recipient = mRecipient.promote();
