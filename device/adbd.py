@@ -282,7 +282,7 @@ class Shell:
             return Popen(arguments, stdin=file, stdout=file, stderr=file, env=self.env)
 
     async def forward(self, kind, file):
-        """Sends an output to the peer until its end, which a terminal reports as an error."""
+        """Sends an output to the peer until end of file, which a terminal reports as an error."""
         with file, contextlib.suppress(OSError):
             while True:
                 await until_readable(file)
